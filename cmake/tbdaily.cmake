@@ -1,0 +1,33 @@
+# What every target of the project is built with, and the two kinds of target that a folder declares.
+
+add_library(tbdaily_options INTERFACE)
+target_compile_options(tbdaily_options INTERFACE
+  -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wsign-conversion -Wold-style-cast -Wnon-virtual-dtor -Woverloaded-virtual
+  -Wformat=2 -Wcast-align -Wundef $<$<BOOL:${TBDAILY_WERROR}>:-Werror>)
+target_include_directories(tbdaily_options INTERFACE ${PROJECT_SOURCE_DIR})
+if(TBDAILY_SANITIZE)
+  add_compile_options(-fsanitize=${TBDAILY_SANITIZE} -fno-sanitize-recover=all -fno-omit-frame-pointer)
+  add_link_options(-fsanitize=${TBDAILY_SANITIZE})
+endif()
+
+# tbdaily_library(NAME SOURCES ... DEPENDS ...): one folder, one library. DEPENDS says which other folders it may include.
+function(tbdaily_library name)
+  cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
+  add_library(${name} STATIC ${ARG_SOURCES})
+  target_link_libraries(${name} PUBLIC ${ARG_DEPENDS} PRIVATE tbdaily_options)
+  target_include_directories(${name} PUBLIC ${PROJECT_SOURCE_DIR})
+endfunction()
+
+# tbdaily_test(NAME SOURCES ... DEPENDS ...): a unit-test program that links the library under test, those below it, the fakes
+# where it names them, and nothing else.
+function(tbdaily_test name)
+  if(NOT TBDAILY_TESTS)
+    return()
+  endif()
+  cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
+  find_package(GTest REQUIRED)
+  add_executable(${name} ${ARG_SOURCES})
+  target_link_libraries(${name} PRIVATE ${ARG_DEPENDS} GTest::gmock GTest::gtest_main tbdaily_options)
+  add_test(NAME ${name} COMMAND ${name})
+  set_tests_properties(${name} PROPERTIES TIMEOUT 300)
+endfunction()

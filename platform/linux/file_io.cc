@@ -1,0 +1,146 @@
+#include "platform/linux/file_io.h"
+
+#include <fcntl.h>
+#include <sys/file.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <chrono>
+#include <cstdio>
+#include <cstdlib>
+#include <thread>
+
+namespace tbdaily {
+
+namespace fs = std::filesystem;
+
+void FileDescriptor::reset() {
+  if (fd_ >= 0) ::close(fd_);
+  fd_ = -1;
+}
+
+FileIdentity FileIdentity::of(const struct stat& status) {
+  return {status.st_dev,         status.st_ino,          status.st_size,        status.st_mtim.tv_sec,
+          status.st_mtim.tv_nsec, status.st_ctim.tv_sec, status.st_ctim.tv_nsec};
+}
+
+std::optional<FileIdentity> fileIdentity(const fs::path& path) {
+  struct stat status {};
+  if (::stat(path.c_str(), &status) != 0) return std::nullopt;
+  return FileIdentity::of(status);
+}
+
+int readRegularFile(const fs::path& path, FileContents& contents) {
+  const FileDescriptor fd(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+  if (!fd.isOpen()) return errno;
+  struct stat status {};
+  if (::fstat(fd.get(), &status) != 0) return errno;
+  if (!S_ISREG(status.st_mode)) return EINVAL;
+  contents.identity = FileIdentity::of(status);
+  contents.bytes.resize(static_cast<std::size_t>(status.st_size));
+  std::size_t filled = 0;
+  while (true) {
+    // One byte more than the file had tells whether it grew since.
+    if (filled == contents.bytes.size()) contents.bytes.resize(filled + std::max<std::size_t>(filled / 8, 1));
+    const ssize_t count = ::read(fd.get(), contents.bytes.data() + filled, contents.bytes.size() - filled);
+    if (count < 0 && errno == EINTR) continue;
+    if (count < 0) return errno;
+    if (count == 0) break;
+    filled += static_cast<std::size_t>(count);
+  }
+  contents.bytes.resize(filled);
+  return 0;
+}
+
+int makeFolders(const fs::path& folder) {
+  if (::mkdir(folder.c_str(), 0700) == 0) return 0;
+  const int error = errno;
+  if (error == EEXIST) {
+    struct stat status {};
+    if (::stat(folder.c_str(), &status) != 0) return errno;
+    return S_ISDIR(status.st_mode) ? 0 : ENOTDIR;
+  }
+  if (error != ENOENT || !folder.has_relative_path()) return error;
+  const int parentError = makeFolders(folder.parent_path());
+  if (parentError != 0) return parentError;
+  return ::mkdir(folder.c_str(), 0700) == 0 || errno == EEXIST ? 0 : errno;
+}
+
+int writeAll(int fd, std::span<const std::byte> bytes) {
+  while (!bytes.empty()) {
+    const ssize_t count = ::write(fd, bytes.data(), bytes.size());
+    if (count < 0 && errno == EINTR) continue;
+    if (count < 0) return errno;
+    bytes = bytes.subspan(static_cast<std::size_t>(count));
+  }
+  return 0;
+}
+
+int writeAll(int fd, std::string_view text) { return writeAll(fd, std::as_bytes(std::span(text))); }
+
+int syncFolder(const fs::path& folder) {
+  const FileDescriptor fd(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!fd.isOpen()) return errno;
+  return ::fsync(fd.get()) == 0 ? 0 : errno;
+}
+
+TemporaryFile::~TemporaryFile() {
+  if (!path_.empty()) ::unlink(path_.c_str());
+}
+
+int TemporaryFile::create(const fs::path& folder) {
+  std::string name = (folder / (std::string(kNamePrefix) + "XXXXXX")).native();
+  fd_ = FileDescriptor(::mkostemp(name.data(), O_CLOEXEC));
+  if (!fd_.isOpen()) return errno;
+  path_ = name;
+  return 0;
+}
+
+int TemporaryFile::sync() { return ::fsync(fd_.get()) == 0 ? 0 : errno; }
+
+int TemporaryFile::replace(const fs::path& place) {
+  if (const int error = sync(); error != 0) return error;
+  if (::rename(path_.c_str(), place.c_str()) != 0) return errno;
+  path_.clear();
+  return 0;
+}
+
+int TemporaryFile::placeNew(const fs::path& place) {
+  if (const int error = sync(); error != 0) return error;
+  if (::link(path_.c_str(), place.c_str()) != 0) return errno;
+  ::unlink(path_.c_str());
+  path_.clear();
+  return 0;
+}
+
+int replaceFile(const fs::path& place, std::string_view contents) {
+  if (const int error = makeFolders(place.parent_path()); error != 0) return error;
+  TemporaryFile file;
+  if (const int error = file.create(place.parent_path()); error != 0) return error;
+  if (const int error = writeAll(file.fd(), contents); error != 0) return error;
+  return file.replace(place);
+}
+
+int FileLock::acquire(const fs::path& lockFile, double timeoutSeconds) {
+  fd_ = FileDescriptor(::open(lockFile.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
+  if (!fd_.isOpen()) return errno;
+  const auto deadline = std::chrono::steady_clock::now() + std::chrono::duration<double>(timeoutSeconds);
+  while (::flock(fd_.get(), LOCK_EX | LOCK_NB) != 0) {
+    const int error = errno;
+    if (error != EWOULDBLOCK && error != EINTR) return error;
+    if (std::chrono::steady_clock::now() >= deadline) return EWOULDBLOCK;
+    std::this_thread::sleep_for(std::chrono::milliseconds(5));
+  }
+  return 0;
+}
+
+bool isSafeName(std::string_view name) {
+  constexpr std::size_t kMaximumLength = 200;
+  if (name.empty() || name.size() > kMaximumLength || name.front() == '.') return false;
+  return std::all_of(name.begin(), name.end(), [](char c) {
+    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.' || c == '-' || c == '_';
+  });
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,57 @@
+#include "platform/linux/host.h"
+
+#include <errno.h>  // program_invocation_short_name
+#include <unistd.h>
+
+#include <cstdlib>
+#include <cstring>
+#include <utility>
+
+namespace tbdaily {
+
+namespace fs = std::filesystem;
+
+namespace {
+fs::path below(const fs::path& base, std::string_view absolutePath) {
+  return base / (fs::path("/") / absolutePath).lexically_normal().relative_path();
+}
+}  // namespace
+
+Host::Host(fs::path root, bool live, fs::path liveRoot)
+    : root_(std::move(root)), live_(live), liveRoot_(std::move(liveRoot)) {}
+
+Host Host::fromEnvironment() {
+  const char* root = std::getenv("TBDAILY_ROOT");
+  const char* live = std::getenv("TBDAILY_LIVE");
+  std::error_code ignored;
+  fs::path path = root != nullptr && *root != '\0' ? fs::absolute(root, ignored) : fs::path("/");
+  return {std::move(path), live == nullptr || std::string_view(live) != "0"};
+}
+
+fs::path Host::devicePath(std::string_view absolutePath) const { return below(root_, absolutePath); }
+fs::path Host::livePath(std::string_view absolutePath) const { return below(liveRoot_, absolutePath); }
+
+void Host::noteOnce(const std::string& line) {
+  static std::mutex mutex;
+  static std::set<std::string> written;
+  const std::lock_guard lock(mutex);
+  if (!written.insert(line).second) return;
+  std::string text(program_invocation_short_name);
+  text.append(": ").append(line);
+  for (char& c : text) {
+    if (c == '\n' || c == '\r') c = ' ';
+  }
+  text += '\n';
+  // A standard error that cannot be written leaves nobody to tell.
+  [[maybe_unused]] const ssize_t count = ::write(STDERR_FILENO, text.data(), text.size());
+}
+
+std::string errorText(int error) {
+  std::string text = std::generic_category().message(error);
+  if (!text.empty() && text[0] >= 'A' && text[0] <= 'Z' && text.size() > 1 && text[1] >= 'a') {
+    text[0] = static_cast<char>(text[0] - 'A' + 'a');
+  }
+  return text;
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,58 @@
+#include "platform/number_text.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <cstring>
+#include <limits>
+#include <random>
+
+namespace tbdaily {
+namespace {
+
+TEST(RealText, IsShortAndPositionalWherePeopleReadIt) {
+  const std::pair<double, const char*> cases[] = {
+      {0.0, "0"},     {-0.0, "-0"},         {10.0, "10"},     {2.5, "2.5"},     {0.1, "0.1"},       {100000.0, "100000"},
+      {0.0001, "0.0001"}, {0.00001, "0.00001"}, {1e-6, "1e-06"}, {-150.25, "-150.25"}, {1e15, "1000000000000000"}, {1e16, "1e+16"},
+      {1.7976931348623157e308, "1.7976931348623157e+308"}, {std::numeric_limits<double>::infinity(), "inf"},
+      {-std::numeric_limits<double>::infinity(), "-inf"}};
+  for (const auto& [value, text] : cases) EXPECT_EQ(realText(value), text);
+  EXPECT_EQ(realText(0.1F), "0.1");
+  EXPECT_EQ(realText(static_cast<double>(0.1F)), "0.10000000149011612");
+}
+
+TEST(RealText, ReadsBackToTheSameValue) {
+  std::mt19937_64 random(7);
+  for (int i = 0; i < 20000; ++i) {
+    const std::uint64_t bits = random();
+    double value = 0;
+    static_assert(sizeof value == sizeof bits);
+    std::memcpy(&value, &bits, sizeof value);
+    if (value != value) continue;
+    ASSERT_EQ(std::strtod(realText(value).c_str(), nullptr), value);
+  }
+}
+
+TEST(DateText, IsUtcWithTheFractionOnlyWhereAsked) {
+  const PlistDate noon = PlistDate::fromUnixSeconds(1795597624);
+  EXPECT_EQ(dateText(PlistDate{}, DateFraction::Keep), "2001-01-01T00:00:00Z");
+  EXPECT_EQ(dateText(PlistDate::fromUnixSeconds(0), DateFraction::Keep), "1970-01-01T00:00:00Z");
+  EXPECT_EQ(dateText(PlistDate::fromUnixSeconds(-0.75), DateFraction::Keep), "1969-12-31T23:59:59.25Z");
+  EXPECT_EQ(dateText(PlistDate::fromUnixSeconds(951782400), DateFraction::Keep), "2000-02-29T00:00:00Z");
+  EXPECT_EQ(dateText(PlistDate{noon.secondsSinceReference + 0.5}, DateFraction::Drop),
+            dateText(noon, DateFraction::Keep));
+  EXPECT_EQ(dateText(PlistDate::fromUnixSeconds(2147483647.0 * 86400), DateFraction::Keep), "+5881580-07-11T00:00:00Z");
+  EXPECT_EQ(dateText(PlistDate::fromUnixSeconds(-2147483648.0 * 86400), DateFraction::Keep), "-5877641-06-23T00:00:00Z");
+}
+
+TEST(CivilTime, IsTheInverseOfItself) {
+  std::mt19937_64 random(11);
+  std::uniform_real_distribution<double> seconds(-1e11, 1e11);
+  for (int i = 0; i < 20000; ++i) {
+    const PlistDate date{seconds(random)};
+    ASSERT_EQ(dateOfCivilTime(civilTime(date)), date);
+  }
+}
+
+}  // namespace
+}  // namespace tbdaily

@@ -1,0 +1,191 @@
+#include "platform/plist_value.h"
+
+#include <bit>
+#include <cmath>
+#include <functional>
+#include <limits>
+
+namespace tbdaily {
+
+std::int64_t saturatingInt64(double value) {
+  constexpr double kTwoTo63 = 9223372036854775808.0;
+  if (std::isnan(value)) return 0;
+  if (value >= kTwoTo63) return std::numeric_limits<std::int64_t>::max();
+  if (value < -kTwoTo63) return std::numeric_limits<std::int64_t>::min();
+  return static_cast<std::int64_t>(value);
+}
+
+std::int64_t PlistNumber::toInt64() const { return isReal() ? saturatingInt64(real_) : integer_; }
+
+std::uint64_t PlistNumber::toUInt64() const {
+  constexpr double kTwoTo63 = 9223372036854775808.0;
+  if (!isReal() || !(real_ >= kTwoTo63)) return static_cast<std::uint64_t>(toInt64());
+  if (real_ >= 2 * kTwoTo63) return std::numeric_limits<std::uint64_t>::max();
+  return static_cast<std::uint64_t>(real_);
+}
+
+bool operator==(const PlistNumber& a, const PlistNumber& b) {
+  if (a.kind_ != b.kind_) return false;
+  if (!a.isReal()) return a.integer_ == b.integer_;
+  if (std::isnan(a.real_) || std::isnan(b.real_)) return std::isnan(a.real_) && std::isnan(b.real_);
+  return std::bit_cast<std::uint64_t>(a.real_) == std::bit_cast<std::uint64_t>(b.real_);
+}
+
+PlistValue PlistValue::boolean(bool v) {
+  PlistValue value;
+  value.value_ = v;
+  return value;
+}
+
+PlistValue PlistValue::string(std::string text) {
+  PlistValue value;
+  value.value_ = std::make_shared<const std::string>(std::move(text));
+  return value;
+}
+
+PlistValue PlistValue::data(PlistData bytes) {
+  PlistValue value;
+  value.value_ = std::make_shared<const PlistData>(std::move(bytes));
+  return value;
+}
+
+PlistValue PlistValue::array(PlistArray elements) {
+  PlistValue value;
+  value.value_ = std::make_shared<const PlistArray>(std::move(elements));
+  return value;
+}
+
+PlistValue PlistValue::dictionary(PlistDictionary entries) {
+  PlistValue value;
+  value.value_ = std::make_shared<const PlistDictionary>(std::move(entries));
+  return value;
+}
+
+namespace {
+template <typename T, typename Variant>
+std::optional<T> scalarOf(const Variant& value) {
+  const T* held = std::get_if<T>(&value);
+  return held != nullptr ? std::optional<T>(*held) : std::nullopt;
+}
+}  // namespace
+
+std::optional<bool> PlistValue::asBoolean() const { return scalarOf<bool>(value_); }
+std::optional<PlistNumber> PlistValue::asNumber() const { return scalarOf<PlistNumber>(value_); }
+std::optional<PlistDate> PlistValue::asDate() const { return scalarOf<PlistDate>(value_); }
+
+std::optional<std::int64_t> PlistValue::asInteger() const {
+  const auto* number = std::get_if<PlistNumber>(&value_);
+  if (number == nullptr || number->isReal()) return std::nullopt;
+  return number->toInt64();
+}
+
+std::optional<std::string_view> PlistValue::asString() const {
+  const Text* text = std::get_if<Text>(&value_);
+  return text != nullptr ? std::optional<std::string_view>(**text) : std::nullopt;
+}
+
+std::optional<std::span<const std::byte>> PlistValue::asData() const {
+  const Bytes* bytes = std::get_if<Bytes>(&value_);
+  return bytes != nullptr ? std::optional<std::span<const std::byte>>(**bytes) : std::nullopt;
+}
+
+const PlistArray* PlistValue::asArray() const {
+  const Elements* elements = std::get_if<Elements>(&value_);
+  return elements != nullptr ? elements->get() : nullptr;
+}
+
+const PlistDictionary* PlistValue::asDictionary() const {
+  const Entries* entries = std::get_if<Entries>(&value_);
+  return entries != nullptr ? entries->get() : nullptr;
+}
+
+bool operator==(const PlistValue& a, const PlistValue& b) {
+  if (a.value_.index() != b.value_.index()) return false;
+  return std::visit(
+      [&b](const auto& left) {
+        using T = std::decay_t<decltype(left)>;
+        const T& right = std::get<T>(b.value_);
+        if constexpr (requires { *left; }) {
+          return left == right || *left == *right;
+        } else {
+          return left == right;
+        }
+      },
+      a.value_);
+}
+
+PlistDictionary::PlistDictionary(std::initializer_list<Entry> entries) {
+  for (const Entry& entry : entries) set(entry.first, entry.second);
+}
+
+std::size_t PlistDictionary::indexOf(std::string_view key) const {
+  if (slots_.empty()) {
+    for (std::size_t i = 0; i < entries_.size(); ++i) {
+      if (entries_[i].first == key) return i;
+    }
+    return kNoEntry;
+  }
+  const std::size_t mask = slots_.size() - 1;
+  for (std::size_t slot = std::hash<std::string_view>{}(key) & mask; slots_[slot] != 0; slot = (slot + 1) & mask) {
+    const std::size_t entry = slots_[slot] - 1;
+    if (entries_[entry].first == key) return entry;
+  }
+  return kNoEntry;
+}
+
+void PlistDictionary::insertIntoIndex(std::size_t entry) {
+  const std::size_t mask = slots_.size() - 1;
+  std::size_t slot = std::hash<std::string_view>{}(entries_[entry].first) & mask;
+  while (slots_[slot] != 0) slot = (slot + 1) & mask;
+  slots_[slot] = static_cast<std::uint32_t>(entry + 1);
+}
+
+void PlistDictionary::rebuildIndex() {
+  slots_.clear();
+  if (entries_.size() < kIndexFrom) return;
+  slots_.resize(std::bit_ceil(entries_.size() * 4));
+  for (std::size_t i = 0; i < entries_.size(); ++i) insertIntoIndex(i);
+}
+
+const PlistValue* PlistDictionary::find(std::string_view key) const {
+  const std::size_t entry = indexOf(key);
+  return entry == kNoEntry ? nullptr : &entries_[entry].second;
+}
+
+PlistValue PlistDictionary::get(std::string_view key) const {
+  const PlistValue* value = find(key);
+  return value != nullptr ? *value : PlistValue();
+}
+
+void PlistDictionary::set(std::string_view key, PlistValue value) {
+  if (value.isNone()) return remove(key);
+  const std::size_t entry = indexOf(key);
+  if (entry != kNoEntry) {
+    entries_[entry].second = std::move(value);
+    return;
+  }
+  entries_.emplace_back(std::string(key), std::move(value));
+  if (entries_.size() * 2 > slots_.size()) {
+    rebuildIndex();
+  } else {
+    insertIntoIndex(entries_.size() - 1);
+  }
+}
+
+void PlistDictionary::remove(std::string_view key) {
+  const std::size_t entry = indexOf(key);
+  if (entry == kNoEntry) return;
+  entries_.erase(entries_.begin() + static_cast<std::ptrdiff_t>(entry));
+  rebuildIndex();
+}
+
+bool operator==(const PlistDictionary& a, const PlistDictionary& b) {
+  if (a.size() != b.size()) return false;
+  for (const auto& [key, value] : a) {
+    const PlistValue* other = b.find(key);
+    if (other == nullptr || !(*other == value)) return false;
+  }
+  return true;
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,37 @@
+// Property lists as bytes: reads the XML and the binary encoding, writes XML.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <span>
+#include <string>
+
+#include "platform/plist_value.h"
+
+namespace tbdaily {
+
+// Plain: the elements alone, whole-second dates; for other programs. A character that XML cannot carry is replaced by U+FFFD.
+// Exact: number widths and fractions of a second are kept, so that it reads back equal in value and kind; such a character
+// is an error.
+enum class PlistForm : std::uint8_t { Exact, Plain };
+
+struct PlistParseResult {
+  PlistValue value;   // none on failure
+  std::string error;  // one line with the place in the input; empty on success
+};
+
+struct PlistWriteResult {
+  bool ok = false;
+  std::string bytes;
+  std::string error;  // one line; empty on success
+};
+
+class PropertyListCodec {
+ public:
+  virtual ~PropertyListCodec() = default;
+
+  virtual PlistParseResult parse(std::span<const std::byte> bytes) = 0;
+  virtual PlistWriteResult write(const PlistValue& value, PlistForm form = PlistForm::Exact) = 0;
+};
+
+}  // namespace tbdaily

@@ -1,0 +1,56 @@
+// Cumulative network usage of each process.
+//
+// Absent service: a request is accepted and its reply never comes.
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <span>
+#include <string>
+
+#include "platform/plist_value.h"
+
+namespace tbdaily {
+
+enum class UsageNameKind : std::uint8_t { ProcessName };
+
+// `records` is an array of dictionaries: "bundleName", "procName", a since-time date, "wifiInBytes", "wifiOutBytes",
+// "wwanInBytes", "wwanOutBytes". Called at most once, on a thread other than the requester's.
+using UsageReplyHandler = std::function<void(const PlistValue& records)>;
+
+class UsageFeed {
+ public:
+  virtual ~UsageFeed() = default;
+  // No names: all processes. Returns at once; the handler must not refer to what the caller may have released by then.
+  virtual void requestUsageToDate(std::span<const std::string> names, UsageNameKind kind, UsageReplyHandler handler) = 0;
+};
+
+class UsageWorkspace {
+ public:
+  virtual ~UsageWorkspace() = default;
+  virtual std::unique_ptr<UsageFeed> createFeed() = 0;  // null on failure
+};
+
+class UsageService {
+ public:
+  virtual ~UsageService() = default;
+  virtual std::unique_ptr<UsageWorkspace> createWorkspace() = 0;  // null on failure
+};
+
+class AbsentUsageService : public UsageService {
+ public:
+  std::unique_ptr<UsageWorkspace> createWorkspace() override { return std::make_unique<Workspace>(); }
+
+ private:
+  class Feed : public UsageFeed {
+   public:
+    void requestUsageToDate(std::span<const std::string>, UsageNameKind, UsageReplyHandler) override {}
+  };
+  class Workspace : public UsageWorkspace {
+   public:
+    std::unique_ptr<UsageFeed> createFeed() override { return std::make_unique<Feed>(); }
+  };
+};
+
+}  // namespace tbdaily
