@@ -20,7 +20,8 @@ class DistributionEnumerator {
   virtual bool nextValue(double& value, std::int32_t& secondsInDay) = 0;
 };
 
-using ScalarRowCallback = std::function<void(std::string_view key, DayNumber day, std::int64_t value, bool& stop)>;
+using ScalarRowCallback =
+    std::function<void(std::string_view key, DayNumber day, std::int64_t value, bool& stop)>;
 using DistributionRowCallback =
     std::function<void(std::string_view key, DayNumber day, DistributionEnumerator& values, bool& stop)>;
 
@@ -29,8 +30,9 @@ class OpenAnalyticsHistory {
  public:
   virtual ~OpenAnalyticsHistory() = default;
 
-  // Rows of the keys that begin with the literal prefix and of the days from `minimumDay` to `maximumDay`, both included, in
-  // order of key (bytes) and then of day. The callback runs synchronously; setting `stop` ends the enumeration.
+  // Rows of the keys that begin with the literal prefix and of the days from `minimumDay` to `maximumDay`,
+  // both included, in order of key (bytes) and then of day. The callback runs synchronously; setting `stop`
+  // ends the enumeration.
   virtual void enumerateScalars(std::string_view keyPrefix, DayNumber minimumDay, DayNumber maximumDay,
                                 const ScalarRowCallback& row) = 0;
   // All values of one key and day are one row.

@@ -15,7 +15,8 @@ class AppRegistry {
  public:
   virtual ~AppRegistry() = default;
   // Calls back once for each bundle, with its type, before it returns.
-  virtual void enumerateBundles(BundleKind kind, const std::function<void(std::string_view bundleType)>& bundle) = 0;
+  virtual void enumerateBundles(BundleKind kind,
+                                const std::function<void(std::string_view bundleType)>& bundle) = 0;
   virtual std::string_view userApplicationType() const = 0;
 };
 

@@ -14,7 +14,8 @@
 
 namespace tbdaily {
 
-// A service, iterator, registry entry or connection; 0 is none. The caller releases objects and closes connections.
+// A service, iterator, registry entry or connection; 0 is none. The caller releases objects and closes
+// connections.
 using KdHandle = std::uint32_t;
 
 enum class KdRegistryPlane : std::uint8_t { KdService };
@@ -31,7 +32,8 @@ struct KdMethodOutput {
   std::span<std::uint64_t> scalars;
   std::size_t scalarCount = 0;  // out: how many of `scalars` were filled
   std::span<std::byte> structure;
-  std::size_t structureSize = 0;  // out: how many bytes of `structure` were filled, or the answer of a size query
+  std::size_t structureSize =
+      0;  // out: how many bytes of `structure` were filled, or the answer of a size query
 };
 
 class DriverRegistry {
@@ -54,8 +56,8 @@ class DriverRegistry {
   // A property of the entry itself, or none.
   virtual PlistValue KdRegistryEntryCreateCFProperty(KdHandle entry, std::string_view key) = 0;
   // A property of the entry or of its nearest parent that has it, or none.
-  virtual PlistValue KdRegistryEntrySearchCFProperty(KdHandle entry, KdRegistryPlane plane, std::string_view key,
-                                                     KdSearchOptions options) = 0;
+  virtual PlistValue KdRegistryEntrySearchCFProperty(KdHandle entry, KdRegistryPlane plane,
+                                                     std::string_view key, KdSearchOptions options) = 0;
   virtual KdStatus KdRegistryEntryGetRegistryEntryID(KdHandle entry, std::uint64_t& identifier) = 0;
   // At most 128 bytes.
   virtual KdStatus KdRegistryEntryGetName(KdHandle entry, std::string& name) = 0;
@@ -63,17 +65,20 @@ class DriverRegistry {
   virtual KdStatus KdServiceOpen(KdHandle service, std::uint32_t connectionType, KdHandle& connection) = 0;
   virtual KdStatus KdServiceClose(KdHandle connection) = 0;
   // `outputSize` holds the size of `output` on entry and the number of bytes filled on return.
-  virtual KdStatus KdConnectCallStructMethod(KdHandle connection, std::uint32_t method, std::span<const std::byte> input,
-                                             std::span<std::byte> output, std::size_t& outputSize) = 0;
+  virtual KdStatus KdConnectCallStructMethod(KdHandle connection, std::uint32_t method,
+                                             std::span<const std::byte> input, std::span<std::byte> output,
+                                             std::size_t& outputSize) = 0;
   // `outputCount` is the number of `outputs` that were filled.
   virtual KdStatus KdConnectCallScalarMethod(KdHandle connection, std::uint32_t method,
-                                             std::span<const std::uint64_t> inputs, std::span<std::uint64_t> outputs,
-                                             std::size_t& outputCount) = 0;
+                                             std::span<const std::uint64_t> inputs,
+                                             std::span<std::uint64_t> outputs, std::size_t& outputCount) = 0;
   virtual KdStatus KdConnectCallMethod(KdHandle connection, std::uint32_t method, const KdMethodInput& input,
                                        KdMethodOutput& output) = 0;
   // The memory stays mapped, and `memory` valid, until it is unmapped or the connection is closed.
-  virtual KdStatus KdConnectMapMemory(KdHandle connection, std::uint32_t memoryType, std::span<std::byte>& memory) = 0;
-  virtual KdStatus KdConnectUnmapMemory(KdHandle connection, std::uint32_t memoryType, std::span<std::byte> memory) = 0;
+  virtual KdStatus KdConnectMapMemory(KdHandle connection, std::uint32_t memoryType,
+                                      std::span<std::byte>& memory) = 0;
+  virtual KdStatus KdConnectUnmapMemory(KdHandle connection, std::uint32_t memoryType,
+                                        std::span<std::byte> memory) = 0;
 };
 
 // The answers of a host without a driver registry.
@@ -90,7 +95,8 @@ class AbsentDriverRegistry : public DriverRegistry {
   KdStatus KdObjectRelease(KdHandle) override { return kKdBadArgument; }
   std::uint32_t KdObjectGetUserRetainCount(KdHandle) override { return 0; }
   PlistValue KdRegistryEntryCreateCFProperty(KdHandle, std::string_view) override { return {}; }
-  PlistValue KdRegistryEntrySearchCFProperty(KdHandle, KdRegistryPlane, std::string_view, KdSearchOptions) override {
+  PlistValue KdRegistryEntrySearchCFProperty(KdHandle, KdRegistryPlane, std::string_view,
+                                             KdSearchOptions) override {
     return {};
   }
   KdStatus KdRegistryEntryGetRegistryEntryID(KdHandle, std::uint64_t&) override { return kKdNotFound; }
@@ -100,12 +106,12 @@ class AbsentDriverRegistry : public DriverRegistry {
     return kKdNotFound;
   }
   KdStatus KdServiceClose(KdHandle) override { return kKdBadArgument; }
-  KdStatus KdConnectCallStructMethod(KdHandle, std::uint32_t, std::span<const std::byte>, std::span<std::byte>,
-                                     std::size_t&) override {
+  KdStatus KdConnectCallStructMethod(KdHandle, std::uint32_t, std::span<const std::byte>,
+                                     std::span<std::byte>, std::size_t&) override {
     return kKdBadArgument;
   }
-  KdStatus KdConnectCallScalarMethod(KdHandle, std::uint32_t, std::span<const std::uint64_t>, std::span<std::uint64_t>,
-                                     std::size_t&) override {
+  KdStatus KdConnectCallScalarMethod(KdHandle, std::uint32_t, std::span<const std::uint64_t>,
+                                     std::span<std::uint64_t>, std::size_t&) override {
     return kKdBadArgument;
   }
   KdStatus KdConnectCallMethod(KdHandle, std::uint32_t, const KdMethodInput&, KdMethodOutput&) override {
@@ -115,7 +121,9 @@ class AbsentDriverRegistry : public DriverRegistry {
     memory = {};
     return kKdBadArgument;
   }
-  KdStatus KdConnectUnmapMemory(KdHandle, std::uint32_t, std::span<std::byte>) override { return kKdBadArgument; }
+  KdStatus KdConnectUnmapMemory(KdHandle, std::uint32_t, std::span<std::byte>) override {
+    return kKdBadArgument;
+  }
 };
 
 }  // namespace tbdaily

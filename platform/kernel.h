@@ -1,6 +1,7 @@
 // Kernel values: sysctls, the processor's tick counter, the time, the process itself.
 //
-// Absent: every sysctl fails with ENOENT, the tick count is 0, there is no timebase, the time is 1970-01-01T00:00:00Z.
+// Absent: every sysctl fails with ENOENT, the tick count is 0, there is no timebase, the time is
+// 1970-01-01T00:00:00Z.
 #pragma once
 
 #include <cstddef>
@@ -23,8 +24,8 @@ class Kernel {
  public:
   virtual ~Kernel() = default;
 
-  // Reads the value into the buffer. `length` is at most the size of `buffer`: on entry the room there, on success the bytes
-  // filled. Answers 0 or an errno value.
+  // Reads the value into the buffer. `length` is at most the size of `buffer`: on entry the room there, on
+  // success the bytes filled. Answers 0 or an errno value.
   virtual int sysctlByName(std::string_view name, std::span<std::byte> buffer, std::size_t& length) = 0;
   // Monotonic since boot; does not advance while the device sleeps.
   virtual std::uint64_t tickCount() = 0;

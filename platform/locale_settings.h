@@ -15,8 +15,9 @@ class LocaleSettings {
   virtual ~LocaleSettings() = default;
   virtual std::vector<std::string> preferredLanguages() = 0;  // most preferred first
   virtual std::vector<std::string> systemLanguages() = 0;
-  // The best of `available` for `preferred`, best first: for each preferred language in turn the available one that equals
-  // it, else the longest one that it begins with; without regard to case, `_` as `-`; each once.
+  // The best of `available` for `preferred`, best first: for each preferred language in turn the available
+  // one that equals it, else the longest one that it begins with; without regard to case, `_` as `-`; each
+  // once.
   virtual std::vector<std::string> bestLocalizations(std::span<const std::string> available,
                                                      std::span<const std::string> preferred) = 0;
   virtual std::optional<std::string> countryCode() = 0;

@@ -1,6 +1,7 @@
 // Diagnostic logs and structured data logs.
 //
-// Absent service: writing answers false, submission is disabled, texts are empty, everything else does nothing.
+// Absent service: writing answers false, submission is disabled, texts are empty, everything else does
+// nothing.
 #pragma once
 
 #include <cstddef>
@@ -28,10 +29,12 @@ class LogSubmission {
  public:
   virtual ~LogSubmission() = default;
 
-  // `logType` is decimal text; `options` is a dictionary or none; `extra` is always passed as none. The writer is called
-  // before this returns, unless the log cannot be opened. Answers whether the log was written.
-  virtual bool writeLogForSubmission(std::string_view logType, std::string_view logName, const PlistValue& options,
-                                     const PlistValue& extra, const LogWriter& writer) = 0;
+  // `logType` is decimal text; `options` is a dictionary or none; `extra` is always passed as none. The
+  // writer is called before this returns, unless the log cannot be opened. Answers whether the log was
+  // written.
+  virtual bool writeLogForSubmission(std::string_view logType, std::string_view logName,
+                                     const PlistValue& options, const PlistValue& extra,
+                                     const LogWriter& writer) = 0;
   virtual void logStructuredData(int type, const PlistDictionary& data) = 0;
   virtual bool isDiagnosticLogSubmissionEnabled() = 0;
   virtual void dumpAllOldStructuredDataLogs() = 0;

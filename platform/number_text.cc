@@ -41,13 +41,15 @@ std::string shortestText(Real value) {
   if (std::isnan(value)) return "nan";
   if (std::isinf(value)) return value < 0 ? "-inf" : "inf";
   std::array<char, 64> buffer;
-  const auto end = std::to_chars(buffer.data(), buffer.data() + buffer.size(), value, std::chars_format::scientific).ptr;
+  const auto end =
+      std::to_chars(buffer.data(), buffer.data() + buffer.size(), value, std::chars_format::scientific).ptr;
   return fromScientific({buffer.data(), static_cast<std::size_t>(end - buffer.data())});
 }
 
 constexpr std::int64_t kDaysTo2001 = 11323;  // from 1970-01-01
 
-// Days since 1970-01-01 of a date of the proleptic Gregorian calendar, and back; years begin in March, eras have 400 years.
+// Days since 1970-01-01 of a date of the proleptic Gregorian calendar, and back; years begin in March, eras
+// have 400 years.
 std::int64_t daysOfCivil(std::int64_t year, unsigned month, unsigned day) {
   year -= month <= 2 ? 1 : 0;
   const std::int64_t era = (year >= 0 ? year : year - 399) / 400;
@@ -72,24 +74,31 @@ void civilOfDays(std::int64_t days, CivilTime& time) {
 std::string fractionDigits(double whole, double fraction) {
   std::array<char, 512> buffer;
   for (int precision = 1; precision <= 17; ++precision) {
-    const auto end =
-        std::to_chars(buffer.data(), buffer.data() + buffer.size(), fraction, std::chars_format::fixed, precision).ptr;
+    const auto end = std::to_chars(buffer.data(), buffer.data() + buffer.size(), fraction,
+                                   std::chars_format::fixed, precision)
+                         .ptr;
     double readBack = 0;
     std::from_chars(buffer.data(), end, readBack);
     if (buffer[0] == '0' && whole + readBack == whole + fraction) return std::string(buffer.data() + 2, end);
   }
-  const auto end = std::to_chars(buffer.data(), buffer.data() + buffer.size(), fraction, std::chars_format::fixed).ptr;
+  const auto end =
+      std::to_chars(buffer.data(), buffer.data() + buffer.size(), fraction, std::chars_format::fixed).ptr;
   return buffer[0] == '0' ? std::string(buffer.data() + 2, end) : std::string();
 }
 
 }  // namespace
 
-std::string realText(double value) { return shortestText(value); }
-std::string realText(float value) { return shortestText(value); }
+std::string realText(double value) {
+  return shortestText(value);
+}
+std::string realText(float value) {
+  return shortestText(value);
+}
 
 std::string numberText(const PlistNumber& number) {
   if (!number.isReal()) return std::to_string(number.toInt64());
-  return number.kind() == NumberKind::Float32 ? realText(static_cast<float>(number.toDouble())) : realText(number.toDouble());
+  return number.kind() == NumberKind::Float32 ? realText(static_cast<float>(number.toDouble()))
+                                              : realText(number.toDouble());
 }
 
 bool isRepresentable(PlistDate date) {
@@ -121,10 +130,10 @@ std::string dateText(PlistDate date, DateFraction fraction) {
   const CivilTime time = civilTime(date);
   std::array<char, 64> buffer;
   const bool ordinaryYear = time.year >= 0 && time.year <= 9999;
-  const int length = std::snprintf(buffer.data(), buffer.size(), ordinaryYear ? "%04lld-%02u-%02uT%02u:%02u:%02u"
-                                                                              : "%+05lld-%02u-%02uT%02u:%02u:%02u",
-                                   static_cast<long long>(time.year), time.month, time.day, time.hour, time.minute,
-                                   time.second);
+  const int length = std::snprintf(
+      buffer.data(), buffer.size(),
+      ordinaryYear ? "%04lld-%02u-%02uT%02u:%02u:%02u" : "%+05lld-%02u-%02uT%02u:%02u:%02u",
+      static_cast<long long>(time.year), time.month, time.day, time.hour, time.minute, time.second);
   std::string text(buffer.data(), static_cast<std::size_t>(length));
   if (fraction == DateFraction::Keep && time.fraction > 0) {
     const std::string digits = fractionDigits(std::floor(date.secondsSinceReference), time.fraction);

@@ -7,7 +7,8 @@
 
 namespace tbdaily {
 
-// The fewest digits that read back to the same double; positional from 1e-5 up to 1e16, with an exponent outside; no trailing
+// The fewest digits that read back to the same double; positional from 1e-5 up to 1e16, with an exponent
+// outside; no trailing
 // ".0". Non-finite values: "nan", "inf", "-inf".
 std::string realText(double value);
 // The same for the fewest digits that read back to the same float.
@@ -17,8 +18,9 @@ std::string numberText(const PlistNumber& number);
 
 enum class DateFraction { Drop, Keep };
 
-// RFC 3339 in UTC: "2026-11-24T09:07:04Z", with the shortest fraction that reads back to the same date where it is kept and
-// is not zero. Years outside 0 to 9999 are written with a sign and as many digits as they need.
+// RFC 3339 in UTC: "2026-11-24T09:07:04Z", with the shortest fraction that reads back to the same date where
+// it is kept and is not zero. Years outside 0 to 9999 are written with a sign and as many digits as they
+// need.
 std::string dateText(PlistDate date, DateFraction fraction);
 
 // Whether a date can be written and read back: finite and within some 35 million years of the reference.

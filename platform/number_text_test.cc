@@ -11,11 +11,21 @@ namespace tbdaily {
 namespace {
 
 TEST(RealText, IsShortAndPositionalWherePeopleReadIt) {
-  const std::pair<double, const char*> cases[] = {
-      {0.0, "0"},     {-0.0, "-0"},         {10.0, "10"},     {2.5, "2.5"},     {0.1, "0.1"},       {100000.0, "100000"},
-      {0.0001, "0.0001"}, {0.00001, "0.00001"}, {1e-6, "1e-06"}, {-150.25, "-150.25"}, {1e15, "1000000000000000"}, {1e16, "1e+16"},
-      {1.7976931348623157e308, "1.7976931348623157e+308"}, {std::numeric_limits<double>::infinity(), "inf"},
-      {-std::numeric_limits<double>::infinity(), "-inf"}};
+  const std::pair<double, const char*> cases[] = {{0.0, "0"},
+                                                  {-0.0, "-0"},
+                                                  {10.0, "10"},
+                                                  {2.5, "2.5"},
+                                                  {0.1, "0.1"},
+                                                  {100000.0, "100000"},
+                                                  {0.0001, "0.0001"},
+                                                  {0.00001, "0.00001"},
+                                                  {1e-6, "1e-06"},
+                                                  {-150.25, "-150.25"},
+                                                  {1e15, "1000000000000000"},
+                                                  {1e16, "1e+16"},
+                                                  {1.7976931348623157e308, "1.7976931348623157e+308"},
+                                                  {std::numeric_limits<double>::infinity(), "inf"},
+                                                  {-std::numeric_limits<double>::infinity(), "-inf"}};
   for (const auto& [value, text] : cases) EXPECT_EQ(realText(value), text);
   EXPECT_EQ(realText(0.1F), "0.1");
   EXPECT_EQ(realText(static_cast<double>(0.1F)), "0.10000000149011612");
@@ -41,8 +51,10 @@ TEST(DateText, IsUtcWithTheFractionOnlyWhereAsked) {
   EXPECT_EQ(dateText(PlistDate::fromUnixSeconds(951782400), DateFraction::Keep), "2000-02-29T00:00:00Z");
   EXPECT_EQ(dateText(PlistDate{noon.secondsSinceReference + 0.5}, DateFraction::Drop),
             dateText(noon, DateFraction::Keep));
-  EXPECT_EQ(dateText(PlistDate::fromUnixSeconds(2147483647.0 * 86400), DateFraction::Keep), "+5881580-07-11T00:00:00Z");
-  EXPECT_EQ(dateText(PlistDate::fromUnixSeconds(-2147483648.0 * 86400), DateFraction::Keep), "-5877641-06-23T00:00:00Z");
+  EXPECT_EQ(dateText(PlistDate::fromUnixSeconds(2147483647.0 * 86400), DateFraction::Keep),
+            "+5881580-07-11T00:00:00Z");
+  EXPECT_EQ(dateText(PlistDate::fromUnixSeconds(-2147483648.0 * 86400), DateFraction::Keep),
+            "-5877641-06-23T00:00:00Z");
 }
 
 TEST(CivilTime, IsTheInverseOfItself) {

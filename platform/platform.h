@@ -1,5 +1,6 @@
-// The outside world of the job: one reference for each service family. Whoever makes a Platform owns the services and keeps
-// them alive; everything else takes a Platform& (or the one family that it needs) as its first parameter.
+// The outside world of the job: one reference for each service family. Whoever makes a Platform owns the
+// services and keeps them alive; everything else takes a Platform& (or the one family that it needs) as its
+// first parameter.
 #pragma once
 
 namespace tbdaily {

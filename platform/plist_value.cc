@@ -15,7 +15,9 @@ std::int64_t saturatingInt64(double value) {
   return static_cast<std::int64_t>(value);
 }
 
-std::int64_t PlistNumber::toInt64() const { return isReal() ? saturatingInt64(real_) : integer_; }
+std::int64_t PlistNumber::toInt64() const {
+  return isReal() ? saturatingInt64(real_) : integer_;
+}
 
 std::uint64_t PlistNumber::toUInt64() const {
   constexpr double kTwoTo63 = 9223372036854775808.0;
@@ -69,9 +71,15 @@ std::optional<T> scalarOf(const Variant& value) {
 }
 }  // namespace
 
-std::optional<bool> PlistValue::asBoolean() const { return scalarOf<bool>(value_); }
-std::optional<PlistNumber> PlistValue::asNumber() const { return scalarOf<PlistNumber>(value_); }
-std::optional<PlistDate> PlistValue::asDate() const { return scalarOf<PlistDate>(value_); }
+std::optional<bool> PlistValue::asBoolean() const {
+  return scalarOf<bool>(value_);
+}
+std::optional<PlistNumber> PlistValue::asNumber() const {
+  return scalarOf<PlistNumber>(value_);
+}
+std::optional<PlistDate> PlistValue::asDate() const {
+  return scalarOf<PlistDate>(value_);
+}
 
 std::optional<std::int64_t> PlistValue::asInteger() const {
   const auto* number = std::get_if<PlistNumber>(&value_);
@@ -126,7 +134,8 @@ std::size_t PlistDictionary::indexOf(std::string_view key) const {
     return kNoEntry;
   }
   const std::size_t mask = slots_.size() - 1;
-  for (std::size_t slot = std::hash<std::string_view>{}(key) & mask; slots_[slot] != 0; slot = (slot + 1) & mask) {
+  for (std::size_t slot = std::hash<std::string_view>{}(key)&mask; slots_[slot] != 0;
+       slot = (slot + 1) & mask) {
     const std::size_t entry = slots_[slot] - 1;
     if (entries_[entry].first == key) return entry;
   }

@@ -1,8 +1,9 @@
 // PlistValue: the one type for structured values that cross the platform interfaces.
 //
-// Scalars are held by value; strings, data, arrays and dictionaries are shared and immutable, so a copy costs a reference
-// count at most and may be handed to another thread. To change a container, take a mutable copy of it (PlistDictionary and
-// PlistArray are ordinary value types), change that, and make a new PlistValue of it.
+// Scalars are held by value; strings, data, arrays and dictionaries are shared and immutable, so a copy costs
+// a reference count at most and may be handed to another thread. To change a container, take a mutable copy
+// of it (PlistDictionary and PlistArray are ordinary value types), change that, and make a new PlistValue of
+// it.
 #pragma once
 
 #include <cstddef>
@@ -49,11 +50,11 @@ class PlistNumber {
   NumberKind kind() const { return kind_; }
   bool isReal() const { return kind_ == NumberKind::Float32 || kind_ == NumberKind::Float64; }
 
-  // The value as a signed 64-bit integer: a real loses its fraction, saturates at both ends, and reads as 0 when it is not a
-  // number.
+  // The value as a signed 64-bit integer: a real loses its fraction, saturates at both ends, and reads as 0
+  // when it is not a number.
   std::int64_t toInt64() const;
-  // The value as an unsigned 64-bit integer: a negative value as its two's complement, a real as for toInt64 (from 2^63 up to
-  // 2^64 in full).
+  // The value as an unsigned 64-bit integer: a negative value as its two's complement, a real as for toInt64
+  // (from 2^63 up to 2^64 in full).
   std::uint64_t toUInt64() const;
   double toDouble() const { return isReal() ? real_ : static_cast<double>(integer_); }
 
@@ -71,7 +72,8 @@ class PlistNumber {
   };
 };
 
-// Drops the fraction of a real (towards zero); saturates at the ends of the range; a value that is not a number gives 0.
+// Drops the fraction of a real (towards zero); saturates at the ends of the range; a value that is not a
+// number gives 0.
 std::int64_t saturatingInt64(double value);
 
 class PlistValue {
@@ -95,8 +97,8 @@ class PlistValue {
   bool isNone() const { return std::holds_alternative<std::monostate>(value_); }
   explicit operator bool() const { return !isNone(); }
 
-  // Typed access: none (or a null pointer) when the value is of another kind. Views and pointers are borrowed: they live as
-  // long as this value or any copy of it.
+  // Typed access: none (or a null pointer) when the value is of another kind. Views and pointers are
+  // borrowed: they live as long as this value or any copy of it.
   std::optional<bool> asBoolean() const;
   std::optional<PlistNumber> asNumber() const;
   std::optional<std::int64_t> asInteger() const;  // integer kinds only
@@ -106,8 +108,8 @@ class PlistValue {
   const PlistArray* asArray() const;
   const PlistDictionary* asDictionary() const;
 
-  // Same kind and equal contents. Dictionaries are equal when they hold equal entries, in whatever order. Nesting is limited
-  // by the codec's reader, not here.
+  // Same kind and equal contents. Dictionaries are equal when they hold equal entries, in whatever order.
+  // Nesting is limited by the codec's reader, not here.
   friend bool operator==(const PlistValue& a, const PlistValue& b);
 
  private:
@@ -153,7 +155,8 @@ class PlistDictionary {
   void rebuildIndex();
 
   std::vector<Entry> entries_;
-  std::vector<std::uint32_t> slots_;  // open addressing over entries_: entry number plus 1, 0 is free; a power of two long
+  std::vector<std::uint32_t>
+      slots_;  // open addressing over entries_: entry number plus 1, 0 is free; a power of two long
 };
 
 }  // namespace tbdaily

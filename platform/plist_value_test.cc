@@ -22,8 +22,10 @@ TEST(PlistValue, EqualityIsOfValueAndOfKind) {
   EXPECT_FALSE(PlistValue::array({}) == PlistValue());
   EXPECT_TRUE(PlistValue::float64(std::numeric_limits<double>::quiet_NaN()) ==
               PlistValue::float64(std::numeric_limits<double>::quiet_NaN()));
-  const auto ab = PlistValue::dictionary({{"a", PlistValue::int64(1)}, {"b", PlistValue::array({PlistValue::string("x")})}});
-  const auto ba = PlistValue::dictionary({{"b", PlistValue::array({PlistValue::string("x")})}, {"a", PlistValue::int64(1)}});
+  const auto ab = PlistValue::dictionary(
+      {{"a", PlistValue::int64(1)}, {"b", PlistValue::array({PlistValue::string("x")})}});
+  const auto ba = PlistValue::dictionary(
+      {{"b", PlistValue::array({PlistValue::string("x")})}, {"a", PlistValue::int64(1)}});
   EXPECT_TRUE(ab == ba);
 }
 

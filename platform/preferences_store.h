@@ -35,8 +35,8 @@ class PreferencesStore {
   // Forces what was written to the domain to storage.
   virtual void synchronize(std::string_view domain) = 0;
 
-  // An integer as it is, a real with its fraction dropped (saturating; not a number reads as 0). Anything else, a boolean
-  // included, is no number: 0, and `valid` (may be null) is false.
+  // An integer as it is, a real with its fraction dropped (saturating; not a number reads as 0). Anything
+  // else, a boolean included, is no number: 0, and `valid` (may be null) is false.
   std::int64_t getInteger(std::string_view key, std::string_view domain, bool* valid = nullptr) {
     const auto number = getValue(key, domain).asNumber();
     if (valid != nullptr) *valid = number.has_value();

@@ -10,9 +10,9 @@
 
 namespace tbdaily {
 
-// Plain: the elements alone, whole-second dates; for other programs. A character that XML cannot carry is replaced by U+FFFD.
-// Exact: number widths and fractions of a second are kept, so that it reads back equal in value and kind; such a character
-// is an error.
+// Plain: the elements alone, whole-second dates; for other programs. A character that XML cannot carry is
+// replaced by U+FFFD. Exact: number widths and fractions of a second are kept, so that it reads back equal in
+// value and kind; such a character is an error.
 enum class PlistForm : std::uint8_t { Exact, Plain };
 
 struct PlistParseResult {

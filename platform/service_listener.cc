@@ -23,7 +23,9 @@ std::optional<UuidBytes> messageUuid(const PlistDictionary& message, std::string
   return uuid;
 }
 
-PlistValue messageValue(const PlistDictionary& message, std::string_view field) { return message.get(field); }
+PlistValue messageValue(const PlistDictionary& message, std::string_view field) {
+  return message.get(field);
+}
 
 void forEachElement(const PlistValue& array, const std::function<void(const PlistValue& element)>& visit) {
   const PlistArray* elements = array.asArray();

@@ -28,7 +28,8 @@ struct ServiceEvent {
 
 using ServiceEventHandler = std::function<void(const ServiceEvent&)>;
 
-// Where events are delivered. There is one: the main queue, served only while a slice of the main event loop runs.
+// Where events are delivered. There is one: the main queue, served only while a slice of the main event loop
+// runs.
 enum class DeliveryQueue : std::uint8_t { Main };
 
 enum class SliceResult : std::uint8_t { Finished, Stopped, TimedOut, HandledEvent };

@@ -22,12 +22,23 @@ void appendQuoted(std::string& out, std::string_view text) {
   out += '"';
   for (const char c : text) {
     switch (c) {
-      case '"': out += "\\\""; break;
-      case '\\': out += "\\\\"; break;
-      case '\n': out += "\\n"; break;
-      case '\r': out += "\\r"; break;
-      case '\t': out += "\\t"; break;
-      default: out += c;
+      case '"':
+        out += "\\\"";
+        break;
+      case '\\':
+        out += "\\\\";
+        break;
+      case '\n':
+        out += "\\n";
+        break;
+      case '\r':
+        out += "\\r";
+        break;
+      case '\t':
+        out += "\\t";
+        break;
+      default:
+        out += c;
     }
   }
   out += '"';
@@ -91,7 +102,8 @@ std::string LogArgument::text() const {
   return plistText(*std::get<const PlistValue*>(value_));
 }
 
-std::string formatLogMessage(std::string_view format, std::span<const LogArgument> arguments, bool showPrivate) {
+std::string formatLogMessage(std::string_view format, std::span<const LogArgument> arguments,
+                             bool showPrivate) {
   std::string message;
   std::size_t next = 0;
   while (!format.empty()) {

@@ -1,8 +1,9 @@
 // The system log.
 //
-// Formats are the job's own constant texts, never text from outside: "%d" and "%llu" take a number, "%s" a text, "%@" an
-// object (a string as it is, a number as its decimal text, a date in its default text form). "{public}" after the percent sign
-// marks an argument that may be shown; texts and objects without the mark are private, numbers never are.
+// Formats are the job's own constant texts, never text from outside: "%d" and "%llu" take a number, "%s" a
+// text, "%@" an object (a string as it is, a number as its decimal text, a date in its default text form).
+// "{public}" after the percent sign marks an argument that may be shown; texts and objects without the mark
+// are private, numbers never are.
 #pragma once
 
 #include <array>
@@ -54,17 +55,20 @@ class SystemLog {
   template <typename... Arguments>
   void message(LogLevel level, std::string_view format, Arguments&&... arguments) {
     if (!isEnabled(level)) return;
-    const std::array<LogArgument, sizeof...(Arguments)> list{LogArgument(std::forward<Arguments>(arguments))...};
+    const std::array<LogArgument, sizeof...(Arguments)> list{
+        LogArgument(std::forward<Arguments>(arguments))...};
     write(level, format, list);
   }
 };
 
-// Puts the arguments into the format. Texts and objects that the format does not mark public become "<private>" unless
-// `showPrivate`.
-std::string formatLogMessage(std::string_view format, std::span<const LogArgument> arguments, bool showPrivate);
+// Puts the arguments into the format. Texts and objects that the format does not mark public become
+// "<private>" unless `showPrivate`.
+std::string formatLogMessage(std::string_view format, std::span<const LogArgument> arguments,
+                             bool showPrivate);
 
-// One-line text of a value, for log lines: an absent value "(null)", a string as it is, a number in decimal, a boolean 1 or 0, a
-// date "2026-11-24 09:07:04 +0000", data in hexadecimal, containers with keys and strings quoted.
+// One-line text of a value, for log lines: an absent value "(null)", a string as it is, a number in decimal,
+// a boolean 1 or 0, a date "2026-11-24 09:07:04 +0000", data in hexadecimal, containers with keys and strings
+// quoted.
 std::string plistText(const PlistValue& value);
 
 }  // namespace tbdaily

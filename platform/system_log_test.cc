@@ -27,9 +27,11 @@ TEST(LogMessage, PassesOverWhatIsNoConversion) {
 TEST(PlistText, RendersEveryKindOnOneLine) {
   const PlistValue value = PlistValue::array(
       {PlistValue::dictionary({{"bundle", PlistValue::string("a\"b\n")}, {"n", PlistValue::int64(-1)}}),
-       PlistValue::boolean(true), PlistValue::float64(0.5), PlistValue::data({std::byte{0x0a}, std::byte{0xff}}),
+       PlistValue::boolean(true), PlistValue::float64(0.5),
+       PlistValue::data({std::byte{0x0a}, std::byte{0xff}}),
        PlistValue(PlistDate::fromUnixSeconds(1795597624.9)), PlistValue::array({})});
-  EXPECT_EQ(plistText(value), R"([{"bundle": "a\"b\n", "n": -1}, 1, 0.5, <0aff>, 2026-11-25 09:07:04 +0000, []])");
+  EXPECT_EQ(plistText(value),
+            R"([{"bundle": "a\"b\n", "n": -1}, 1, 0.5, <0aff>, 2026-11-25 09:07:04 +0000, []])");
   EXPECT_EQ(plistText(PlistValue()), "(null)");
   EXPECT_EQ(plistText(PlistValue::string("as it is")), "as it is");
 }

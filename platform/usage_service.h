@@ -15,15 +15,17 @@ namespace tbdaily {
 
 enum class UsageNameKind : std::uint8_t { ProcessName };
 
-// `records` is an array of dictionaries: "bundleName", "procName", a since-time date, "wifiInBytes", "wifiOutBytes",
-// "wwanInBytes", "wwanOutBytes". Called at most once, on a thread other than the requester's.
+// `records` is an array of dictionaries: "bundleName", "procName", a since-time date, "wifiInBytes",
+// "wifiOutBytes", "wwanInBytes", "wwanOutBytes". Called at most once, on a thread other than the requester's.
 using UsageReplyHandler = std::function<void(const PlistValue& records)>;
 
 class UsageFeed {
  public:
   virtual ~UsageFeed() = default;
-  // No names: all processes. Returns at once; the handler must not refer to what the caller may have released by then.
-  virtual void requestUsageToDate(std::span<const std::string> names, UsageNameKind kind, UsageReplyHandler handler) = 0;
+  // No names: all processes. Returns at once; the handler must not refer to what the caller may have released
+  // by then.
+  virtual void requestUsageToDate(std::span<const std::string> names, UsageNameKind kind,
+                                  UsageReplyHandler handler) = 0;
 };
 
 class UsageWorkspace {

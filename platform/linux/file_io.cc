@@ -21,7 +21,7 @@ void FileDescriptor::reset() {
 }
 
 FileIdentity FileIdentity::of(const struct stat& status) {
-  return {status.st_dev,         status.st_ino,          status.st_size,        status.st_mtim.tv_sec,
+  return {status.st_dev,          status.st_ino,         status.st_size,        status.st_mtim.tv_sec,
           status.st_mtim.tv_nsec, status.st_ctim.tv_sec, status.st_ctim.tv_nsec};
 }
 
@@ -77,7 +77,9 @@ int writeAll(int fd, std::span<const std::byte> bytes) {
   return 0;
 }
 
-int writeAll(int fd, std::string_view text) { return writeAll(fd, std::as_bytes(std::span(text))); }
+int writeAll(int fd, std::string_view text) {
+  return writeAll(fd, std::as_bytes(std::span(text)));
+}
 
 int syncFolder(const fs::path& folder) {
   const FileDescriptor fd(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
@@ -97,7 +99,9 @@ int TemporaryFile::create(const fs::path& folder) {
   return 0;
 }
 
-int TemporaryFile::sync() { return ::fsync(fd_.get()) == 0 ? 0 : errno; }
+int TemporaryFile::sync() {
+  return ::fsync(fd_.get()) == 0 ? 0 : errno;
+}
 
 int TemporaryFile::replace(const fs::path& place) {
   if (const int error = sync(); error != 0) return error;
@@ -123,7 +127,8 @@ int replaceFile(const fs::path& place, std::string_view contents) {
 }
 
 int FileLock::acquire(const fs::path& lockFile, double timeoutSeconds) {
-  fd_ = FileDescriptor(::open(lockFile.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
+  fd_ =
+      FileDescriptor(::open(lockFile.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
   if (!fd_.isOpen()) return errno;
   const auto deadline = std::chrono::steady_clock::now() + std::chrono::duration<double>(timeoutSeconds);
   while (::flock(fd_.get(), LOCK_EX | LOCK_NB) != 0) {
@@ -139,7 +144,8 @@ bool isSafeName(std::string_view name) {
   constexpr std::size_t kMaximumLength = 200;
   if (name.empty() || name.size() > kMaximumLength || name.front() == '.') return false;
   return std::all_of(name.begin(), name.end(), [](char c) {
-    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.' || c == '-' || c == '_';
+    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.' ||
+           c == '-' || c == '_';
   });
 }
 

@@ -1,5 +1,5 @@
-// Files on the host: owned descriptors, whole reads, files that appear whole or not at all, locks between processes.
-// Failures are errno values, 0 is success.
+// Files on the host: owned descriptors, whole reads, files that appear whole or not at all, locks between
+// processes. Failures are errno values, 0 is success.
 #pragma once
 
 #include <sys/stat.h>
@@ -69,8 +69,8 @@ int writeAll(int fd, std::string_view text);
 // Forces a folder's entries to storage.
 int syncFolder(const std::filesystem::path& folder);
 
-// A file of mode 0600 that is written beside its place under a passing name and then put there; without that, its destructor
-// removes it. Passing names begin with ".tmp-".
+// A file of mode 0600 that is written beside its place under a passing name and then put there; without that,
+// its destructor removes it. Passing names begin with ".tmp-".
 class TemporaryFile {
  public:
   static constexpr std::string_view kNamePrefix = ".tmp-";
@@ -97,7 +97,8 @@ class TemporaryFile {
 // Replaces the file by one with these contents, atomically; makes its folder where that is missing.
 int replaceFile(const std::filesystem::path& place, std::string_view contents);
 
-// An exclusive lock between processes on a file of its own, held until destruction. Waits 5 seconds for another holder.
+// An exclusive lock between processes on a file of its own, held until destruction. Waits 5 seconds for
+// another holder.
 class FileLock {
  public:
   // 0, or EWOULDBLOCK when the other holder kept it, or what opening the lock file failed with.
@@ -107,7 +108,8 @@ class FileLock {
   FileDescriptor fd_;
 };
 
-// 1 to 200 letters, digits, '.', '-', '_', not beginning with '.': a name that may become part of a file name.
+// 1 to 200 letters, digits, '.', '-', '_', not beginning with '.': a name that may become part of a file
+// name.
 bool isSafeName(std::string_view name);
 
 }  // namespace tbdaily

@@ -28,8 +28,12 @@ Host Host::fromEnvironment() {
   return {std::move(path), live == nullptr || std::string_view(live) != "0"};
 }
 
-fs::path Host::devicePath(std::string_view absolutePath) const { return below(root_, absolutePath); }
-fs::path Host::livePath(std::string_view absolutePath) const { return below(liveRoot_, absolutePath); }
+fs::path Host::devicePath(std::string_view absolutePath) const {
+  return below(root_, absolutePath);
+}
+fs::path Host::livePath(std::string_view absolutePath) const {
+  return below(liveRoot_, absolutePath);
+}
 
 void Host::noteOnce(const std::string& line) {
   static std::mutex mutex;
@@ -44,6 +48,16 @@ void Host::noteOnce(const std::string& line) {
   text += '\n';
   // A standard error that cannot be written leaves nobody to tell.
   [[maybe_unused]] const ssize_t count = ::write(STDERR_FILENO, text.data(), text.size());
+}
+
+void Host::noteWriteFailure(const fs::path& path, int error) {
+  static std::mutex mutex;
+  static std::set<int> kinds;
+  {
+    const std::lock_guard lock(mutex);
+    if (!kinds.insert(error).second) return;
+  }
+  noteOnce("cannot write " + path.native() + ": " + errorText(error));
 }
 
 std::string errorText(int error) {

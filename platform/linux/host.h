@@ -1,5 +1,5 @@
-// What the host layer knows of the machine that it runs on: where the device's file tree lies, whether live sources may be
-// asked, and the one way in which it tells an administrator about trouble.
+// What the host layer knows of the machine that it runs on: where the device's file tree lies, whether live
+// sources may be asked, and the one way in which it tells an administrator about trouble.
 #pragma once
 
 #include <filesystem>
@@ -26,8 +26,12 @@ class Host {
   // The place of a live source given by its absolute path.
   std::filesystem::path livePath(std::string_view absolutePath) const;
 
-  // One line on standard error, prefixed by the program's name. The same line is written once in the life of a process.
+  // One line on standard error, prefixed by the program's name. The same line is written once in the life of
+  // a process.
   static void noteOnce(const std::string& line);
+  // For a file or folder that could not be written: one line for each kind of failure in the life of a
+  // process, since a root that cannot be written fails every write in the same way.
+  static void noteWriteFailure(const std::filesystem::path& path, int error);
 
  private:
   std::filesystem::path root_;

@@ -1,0 +1,116 @@
+#include "platform/linux/host_identity.h"
+
+#include <sha2.h>
+#include <sys/random.h>
+
+#include <array>
+#include <cstdint>
+#include <fstream>
+#include <iterator>
+#include <optional>
+#include <span>
+
+#include "platform/service_listener.h"
+
+namespace tbdaily {
+
+namespace {
+
+using Sha256 = std::array<std::uint8_t, SHA256_DIGEST_LENGTH>;
+using IdBytes = std::array<std::uint8_t, 16>;
+
+// Chosen once at random; it names this application in the hash.
+constexpr IdBytes kApplicationIdentifier = {0x5e, 0x0c, 0x31, 0x9b, 0x7d, 0x42, 0x4f, 0x86,
+                                            0xa9, 0x13, 0xc8, 0x6e, 0x2b, 0xd4, 0x70, 0xf5};
+
+Sha256 sha256(std::span<const std::uint8_t> first, std::span<const std::uint8_t> second) {
+  SHA2_CTX context;
+  ::SHA256Init(&context);
+  ::SHA256Update(&context, first.data(), first.size());
+  ::SHA256Update(&context, second.data(), second.size());
+  Sha256 digest;
+  ::SHA256Final(digest.data(), &context);
+  return digest;
+}
+
+// RFC 2104, for keys of at most one block.
+Sha256 hmacSha256(std::span<const std::uint8_t> key, std::span<const std::uint8_t> message) {
+  std::array<std::uint8_t, SHA256_BLOCK_LENGTH> inner{}, outer{};
+  inner.fill(0x36);
+  outer.fill(0x5c);
+  for (std::size_t i = 0; i < key.size(); ++i) {
+    inner[i] ^= key[i];
+    outer[i] ^= key[i];
+  }
+  return sha256(outer, sha256(inner, message));
+}
+
+std::string firstLine(const std::filesystem::path& path) {
+  std::ifstream file(path);
+  std::string line;
+  std::getline(file, line);
+  while (!line.empty() && (line.back() == '\0' || line.back() == ' ' || line.back() == '\r')) line.pop_back();
+  return line;
+}
+
+std::optional<unsigned> hexadecimalDigit(char c) {
+  if (c >= '0' && c <= '9') return static_cast<unsigned>(c - '0');
+  if (c >= 'a' && c <= 'f') return static_cast<unsigned>(c - 'a' + 10);
+  return std::nullopt;
+}
+
+std::optional<IdBytes> machineIdentifier(const Host& host) {
+  const std::string text = firstLine(host.livePath("/etc/machine-id"));
+  IdBytes bytes;
+  if (text.size() != 2 * bytes.size()) return std::nullopt;
+  for (std::size_t i = 0; i < bytes.size(); ++i) {
+    const auto high = hexadecimalDigit(text[2 * i]);
+    const auto low = hexadecimalDigit(text[2 * i + 1]);
+    if (!high || !low) return std::nullopt;
+    bytes[i] = static_cast<std::uint8_t>(*high << 4 | *low);
+  }
+  return bytes;
+}
+
+template <typename Bytes>
+void markAsRandomUuid(Bytes& bytes) {
+  using Byte = typename Bytes::value_type;
+  bytes[6] = static_cast<Byte>((static_cast<unsigned>(bytes[6]) & 0x0F) | 0x40);
+  bytes[8] = static_cast<Byte>((static_cast<unsigned>(bytes[8]) & 0x3F) | 0x80);
+}
+
+}  // namespace
+
+std::string hashedMachineIdentifier(const Host& host) {
+  const auto machine = machineIdentifier(host);
+  if (!machine) return {};
+  Sha256 hash = hmacSha256(*machine, kApplicationIdentifier);
+  markAsRandomUuid(hash);
+  static constexpr std::string_view kDigits = "0123456789abcdef";
+  std::string text;
+  for (const std::uint8_t byte : std::span(hash).first<16>()) {
+    text += kDigits[byte >> 4];
+    text += kDigits[byte & 15];
+  }
+  return text;
+}
+
+std::string hardwareModelName(const Host& host) {
+  for (const char* place : {"/sys/class/dmi/id/product_name", "/proc/device-tree/model"}) {
+    std::string model = firstLine(host.livePath(place));
+    if (!model.empty()) return model;
+  }
+  return {};
+}
+
+std::string randomUuid() {
+  UuidBytes bytes{};
+  if (::getrandom(bytes.data(), bytes.size(), 0) != static_cast<ssize_t>(bytes.size())) {
+    std::ifstream source("/dev/urandom", std::ios::binary);
+    source.read(reinterpret_cast<char*>(bytes.data()), static_cast<std::streamsize>(bytes.size()));
+  }
+  markAsRandomUuid(bytes);
+  return uuidText(bytes);
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,106 @@
+#include "platform/linux/linux_system_log.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <array>
+#include <cerrno>
+#include <cmath>
+#include <cstdio>
+#include <cstdlib>
+
+#include "platform/number_text.h"
+
+namespace tbdaily {
+
+namespace {
+
+struct LevelText {
+  std::string_view name;
+  std::string_view journalPrefix;
+};
+
+// In the order of LogLevel.
+constexpr std::array<LevelText, 4> kLevels = {{
+    {"default", "<5>"},
+    {"info", "<6>"},
+    {"debug", "<7>"},
+    {"error", "<3>"},
+}};
+
+bool environmentIs(const char* variable, std::string_view value) {
+  const char* text = std::getenv(variable);
+  return text != nullptr && text == value;
+}
+
+// "2026-11-24T09:07:04.123456Z"
+std::string stamp(PlistDate now) {
+  std::string text = dateText(now, DateFraction::Drop);
+  std::array<char, 16> fraction;
+  const auto microseconds = static_cast<unsigned>(civilTime(now).fraction * 1e6);
+  std::snprintf(fraction.data(), fraction.size(), ".%06uZ", microseconds);
+  text.replace(text.size() - 1, 1, fraction.data());
+  return text;
+}
+
+}  // namespace
+
+LinuxSystemLog::LinuxSystemLog(const Host& host, Kernel& kernel, DeviceAnswers& answers)
+    : host_(host),
+      kernel_(kernel),
+      answers_(answers),
+      toStandardError_(environmentIs("TBDAILY_LOG", "stderr")),
+      journal_(toStandardError_ && std::getenv("JOURNAL_STREAM") != nullptr),
+      debug_(environmentIs("TBDAILY_LOG_DEBUG", "1")) {}
+
+bool LinuxSystemLog::isEnabled(LogLevel level) {
+  return level != LogLevel::Debug || debug_;
+}
+
+bool LinuxSystemLog::showsPrivate() {
+  if (!showsPrivate_) {
+    showsPrivate_ = environmentIs("TBDAILY_LOG_PRIVATE", "show") || answers_.booleanAnswer("InternalBuild");
+  }
+  return *showsPrivate_;
+}
+
+void LinuxSystemLog::write(LogLevel level, std::string_view format, std::span<const LogArgument> arguments) {
+  if (isEnabled(level)) writeLine(level, formatLogMessage(format, arguments, showsPrivate()));
+}
+
+void LinuxSystemLog::writePlain(std::string_view message) {
+  writeLine(LogLevel::Default, message);
+}
+
+void LinuxSystemLog::writeLine(LogLevel level, std::string_view message) {
+  const LevelText& text = kLevels[static_cast<std::size_t>(level)];
+  const std::string_view prefix = journal_ ? text.journalPrefix : "";
+  std::string lines(prefix);
+  lines.append(stamp(kernel_.currentTime())).append(" ").append(kernel_.processName());
+  lines.append("[").append(std::to_string(kernel_.processIdentifier())).append("] ");
+  lines.append(text.name).append(": ");
+  for (const char c : message) {
+    lines += c;
+    if (c == '\n') lines.append(prefix).append("\t");
+  }
+  append(lines += '\n');
+}
+
+void LinuxSystemLog::append(const std::string& lines) {
+  if (toStandardError_) {
+    writeAll(STDERR_FILENO, lines);
+    return;
+  }
+  const std::filesystem::path place = host_.devicePath("/var/log/tbdaily.log");
+  if (!file_.isOpen()) {
+    if (const int error = makeFolders(place.parent_path()); error != 0) {
+      return Host::noteWriteFailure(place.parent_path(), error);
+    }
+    file_ = FileDescriptor(
+        ::open(place.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOCTTY | O_NONBLOCK, 0600));
+    if (!file_.isOpen()) return Host::noteWriteFailure(place, errno);
+  }
+  if (const int error = writeAll(file_.get(), lines); error != 0) Host::noteWriteFailure(place, error);
+}
+
+}  // namespace tbdaily

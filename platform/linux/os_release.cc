@@ -1,0 +1,46 @@
+#include "platform/linux/os_release.h"
+
+#include <fstream>
+
+namespace tbdaily {
+
+namespace {
+
+// The file is a list of shell assignments: a value may be quoted, and a backslash takes the next character as
+// it is.
+std::string unquote(std::string_view text) {
+  std::string value;
+  char quote = '\0';
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    const char c = text[i];
+    if (c == '\\' && quote != '\'' && i + 1 < text.size()) {
+      value += text[++i];
+    } else if (quote == '\0' && (c == '"' || c == '\'')) {
+      quote = c;
+    } else if (c == quote) {
+      quote = '\0';
+    } else {
+      value += c;
+    }
+  }
+  return value;
+}
+
+}  // namespace
+
+std::optional<std::string> osReleaseValue(const Host& host, std::string_view variable) {
+  for (const std::string_view place : {"/etc/os-release", "/usr/lib/os-release"}) {
+    std::ifstream file(host.livePath(place));
+    if (!file) continue;
+    for (std::string line; std::getline(file, line);) {
+      const std::size_t equals = line.find('=');
+      if (equals == std::string::npos || std::string_view(line).substr(0, equals) != variable) continue;
+      std::string value = unquote(std::string_view(line).substr(equals + 1));
+      if (!value.empty()) return value;
+    }
+    return std::nullopt;
+  }
+  return std::nullopt;
+}
+
+}  // namespace tbdaily

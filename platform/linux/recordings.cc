@@ -1,0 +1,42 @@
+#include "platform/linux/recordings.h"
+
+#include <cerrno>
+
+namespace tbdaily {
+
+std::filesystem::path Recordings::path(std::string_view file) const {
+  return host_.devicePath("/System/Device") / file;
+}
+
+PlistValue Recordings::load(std::string_view file) {
+  auto found = loaded_.find(file);
+  if (found == loaded_.end()) found = loaded_.emplace(std::string(file), Loaded{}).first;
+  Loaded& loaded = found->second;
+
+  const std::filesystem::path place = path(file);
+  const auto identity = fileIdentity(place);
+  if (identity == loaded.identity) return loaded.root;
+  loaded = Loaded{identity, PlistValue::dictionary({})};
+  if (!identity) return loaded.root;
+
+  FileContents contents;
+  if (const int error = readRegularFile(place, contents); error != 0) {
+    if (error != ENOENT) Host::noteOnce("recording " + place.native() + " is ignored: " + errorText(error));
+    return loaded.root;
+  }
+  loaded.identity = contents.identity;
+  const PlistParseResult parsed = codec_.parse(contents.bytes);
+  if (parsed.value.asDictionary() != nullptr) {
+    loaded.root = parsed.value;
+  } else {
+    const std::string reason = parsed.error.empty() ? "its root is no dictionary" : parsed.error;
+    Host::noteOnce("recording " + place.native() + " is ignored: " + reason);
+  }
+  return loaded.root;
+}
+
+PlistValue Recordings::entry(std::string_view file, std::string_view key) {
+  return load(file).asDictionary()->get(key);
+}
+
+}  // namespace tbdaily

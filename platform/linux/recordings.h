@@ -1,0 +1,48 @@
+// Recordings: property lists under System/Device/ of the device root that answer in place of the live host.
+#pragma once
+
+#include <map>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "platform/linux/file_io.h"
+#include "platform/linux/host.h"
+#include "platform/property_list_codec.h"
+
+namespace tbdaily {
+
+class Recordings {
+ public:
+  Recordings(const Host& host, PropertyListCodec& codec) : host_(host), codec_(codec) {}
+
+  // The recording's root dictionary; an empty one when it is missing or cannot be parsed (which is named once
+  // on standard error). A file that changed since the last call is read again.
+  PlistValue load(std::string_view file);
+
+  // An entry of the recording's root, or none.
+  PlistValue entry(std::string_view file, std::string_view key);
+
+  // The place of a file under System/Device/.
+  std::filesystem::path path(std::string_view file) const;
+
+ private:
+  struct Loaded {
+    std::optional<FileIdentity> identity;
+    PlistValue root = PlistValue::dictionary({});
+  };
+
+  const Host& host_;
+  PropertyListCodec& codec_;
+  std::map<std::string, Loaded, std::less<>> loaded_;
+};
+
+namespace recording {
+inline constexpr std::string_view kClock = "clock.plist";
+inline constexpr std::string_view kAnswers = "answers.plist";
+inline constexpr std::string_view kKernel = "kernel.plist";
+inline constexpr std::string_view kApps = "apps.plist";
+inline constexpr std::string_view kLocale = "locale.plist";
+}  // namespace recording
+
+}  // namespace tbdaily
