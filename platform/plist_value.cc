@@ -161,6 +161,11 @@ const PlistValue* PlistDictionary::find(std::string_view key) const {
   return entry == kNoEntry ? nullptr : &entries_[entry].second;
 }
 
+std::optional<std::size_t> PlistDictionary::positionOf(std::string_view key) const {
+  const std::size_t entry = indexOf(key);
+  return entry == kNoEntry ? std::nullopt : std::optional(entry);
+}
+
 PlistValue PlistDictionary::get(std::string_view key) const {
   const PlistValue* value = find(key);
   return value != nullptr ? *value : PlistValue();

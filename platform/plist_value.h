@@ -133,6 +133,9 @@ class PlistDictionary {
   // The value of the key, or none.
   PlistValue get(std::string_view key) const;
   bool contains(std::string_view key) const { return find(key) != nullptr; }
+  // The key's place in the order of the keys.
+  std::optional<std::size_t> positionOf(std::string_view key) const;
+  const Entry& at(std::size_t position) const { return entries_[position]; }
 
   // A key that is there keeps its place and takes the new value. A none value removes the key.
   void set(std::string_view key, PlistValue value);

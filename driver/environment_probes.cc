@@ -1,0 +1,87 @@
+#include "driver/environment_probes.h"
+
+#include "platform/device_answers.h"
+#include "platform/dynamic_loader.h"
+#include "platform/file_system.h"
+#include "platform/system_log.h"
+
+namespace tbdaily {
+
+EnvironmentProbeCache gEnvironmentProbeCache;
+
+namespace {
+
+constexpr std::string_view kSingleUserHome = "/var/mobile";
+constexpr std::string_view kMultiUserContainer = "systemgroup.com.velmora.sysmetrics";
+constexpr std::string_view kForceMultiUserMarker = "/var/db/forceMultiUserMode";
+constexpr std::string_view kSupportLibrary =
+    "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
+constexpr const char* kCorruptionCountKey = "DatabaseCorruptionCount";
+constexpr const char* kCorruptionCountDomain = "com.velmora.tallyd";
+constexpr std::int64_t kBytesPerMiB = 1048576;
+
+bool decideMultiUser(Platform& platform) {
+  if (platform.deviceAnswers.booleanAnswer("InternalBuild") && platform.fileSystem.status(kForceMultiUserMarker)) {
+    platform.systemLog.message(LogLevel::Default,
+                               "Forcing Multi User Mode behavior due to the presence of /var/db/forceMultiUserMode");
+    return true;
+  }
+  return platform.deviceAnswers.multiUserMode().value_or(false);
+}
+
+}  // namespace
+
+const std::string* GetAnalyticsHomePath(Platform& platform) {
+  EnvironmentProbeCache& cache = gEnvironmentProbeCache;
+  if (cache.homePath) return &*cache.homePath;
+  if (!cache.multiUser) cache.multiUser = decideMultiUser(platform);
+  if (!*cache.multiUser) return &cache.homePath.emplace(kSingleUserHome);
+
+  SystemGroupContainer container = platform.deviceAnswers.systemGroupContainerPath(kMultiUserContainer);
+  if (!container.path) {
+    platform.systemLog.message(LogLevel::Default, "Error getting system group container: %llu", container.error);
+    return nullptr;
+  }
+  return &cache.homePath.emplace(std::move(*container.path));
+}
+
+std::string analyticsDatabasePath(const std::string& homePath) {
+  return homePath + "/Library/Tallybook/TBDataStore.sqlitedb";
+}
+
+std::int64_t GetDatabaseSizeMB(Platform& platform) {
+  const std::string* home = GetAnalyticsHomePath(platform);
+  if (home == nullptr) return -1;
+  const auto status = platform.fileSystem.status(analyticsDatabasePath(*home));
+  return status ? status->size / kBytesPerMiB : -1;
+}
+
+void LinkPreferenceFunctions(Platform& platform) {
+  const LibraryHandle library = platform.dynamicLoader.open(kSupportLibrary);
+  if (library == nullptr) {
+    platform.systemLog.message(LogLevel::Error, "Failed to dynamically load the FaultdeskSupport framework");
+    return;
+  }
+  EnvironmentProbeCache& cache = gEnvironmentProbeCache;
+  cache.getInteger = reinterpret_cast<PreferencesGetInteger>(
+      platform.dynamicLoader.symbol(library, "SMXPreferencesGetIntegerValue"));
+  if (cache.getInteger == nullptr) {
+    platform.systemLog.message(LogLevel::Error, "Failed to dyanmically link SMXPreferencesGetIntegerValue");
+  }
+  cache.setValue =
+      reinterpret_cast<PreferencesSetValue>(platform.dynamicLoader.symbol(library, "SMXPreferencesSetValue"));
+  if (cache.setValue == nullptr) {
+    platform.systemLog.message(LogLevel::Error, "Failed to dynamically link SMXPreferencesSetValue");
+  }
+}
+
+std::int64_t TakeDatabaseCorruptionCount(Platform& platform) {
+  EnvironmentProbeCache& cache = gEnvironmentProbeCache;
+  if (cache.getInteger == nullptr || cache.setValue == nullptr) LinkPreferenceFunctions(platform);
+  if (cache.getInteger == nullptr || cache.setValue == nullptr) return 0;
+  const std::int64_t count = cache.getInteger(kCorruptionCountKey, kCorruptionCountDomain, nullptr);
+  cache.setValue(kCorruptionCountKey, 0, kCorruptionCountDomain);
+  return count;
+}
+
+}  // namespace tbdaily
