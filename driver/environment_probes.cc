@@ -21,9 +21,11 @@ constexpr const char* kCorruptionCountDomain = "com.velmora.tallyd";
 constexpr std::int64_t kBytesPerMiB = 1048576;
 
 bool decideMultiUser(Platform& platform) {
-  if (platform.deviceAnswers.booleanAnswer("InternalBuild") && platform.fileSystem.status(kForceMultiUserMarker)) {
-    platform.systemLog.message(LogLevel::Default,
-                               "Forcing Multi User Mode behavior due to the presence of /var/db/forceMultiUserMode");
+  if (platform.deviceAnswers.booleanAnswer("InternalBuild") &&
+      platform.fileSystem.status(kForceMultiUserMarker)) {
+    platform.systemLog.message(
+        LogLevel::Default,
+        "Forcing Multi User Mode behavior due to the presence of /var/db/forceMultiUserMode");
     return true;
   }
   return platform.deviceAnswers.multiUserMode().value_or(false);
@@ -39,7 +41,8 @@ const std::string* GetAnalyticsHomePath(Platform& platform) {
 
   SystemGroupContainer container = platform.deviceAnswers.systemGroupContainerPath(kMultiUserContainer);
   if (!container.path) {
-    platform.systemLog.message(LogLevel::Default, "Error getting system group container: %llu", container.error);
+    platform.systemLog.message(LogLevel::Default, "Error getting system group container: %llu",
+                               container.error);
     return nullptr;
   }
   return &cache.homePath.emplace(std::move(*container.path));

@@ -1,4 +1,5 @@
-// Small probes of the analytics store's surroundings: where it lives, how large it is, how often it was found damaged.
+// Small probes of the analytics store's surroundings: where it lives, how large it is, how often it was found
+// damaged.
 //
 // Answers are cached for the life of the process. For the main thread only.
 #pragma once
@@ -11,7 +12,8 @@
 
 namespace tbdaily {
 
-// The functions that are bound at run time: the integer value of a key in a domain (the out-flag may be null), and its setting.
+// The functions that are bound at run time: the integer value of a key in a domain (the out-flag may be
+// null), and its setting.
 using PreferencesGetInteger = std::int64_t (*)(const char* key, const char* domain, bool* valid);
 using PreferencesSetValue = void (*)(const char* key, std::int64_t value, const char* domain);
 
@@ -24,8 +26,8 @@ struct EnvironmentProbeCache {
 };
 extern EnvironmentProbeCache gEnvironmentProbeCache;
 
-// The folder that holds the analytics data, or null when a multi-user device's container cannot be found (which is tried again at
-// the next call). Owned by the cache.
+// The folder that holds the analytics data, or null when a multi-user device's container cannot be found
+// (which is tried again at the next call). Owned by the cache.
 const std::string* GetAnalyticsHomePath(Platform& platform);
 
 // The analytics database file's path under a home path.
@@ -34,7 +36,8 @@ std::string analyticsDatabasePath(const std::string& homePath);
 // Size of the analytics database file in whole MiB, or -1 when it cannot be examined.
 std::int64_t GetDatabaseSizeMB(Platform& platform);
 
-// The corruption counter, which is then reset to 0. When the preference functions cannot be bound: 0, and no reset.
+// The corruption counter, which is then reset to 0. When the preference functions cannot be bound: 0, and no
+// reset.
 std::int64_t TakeDatabaseCorruptionCount(Platform& platform);
 
 // Binds the two preference functions, as far as they can be.

@@ -1,0 +1,7 @@
+#include "driver/device_metrics.h"
+
+namespace tbdaily {
+
+void CollectDailyDeviceMetrics(Platform&) {}
+
+}  // namespace tbdaily

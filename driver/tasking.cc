@@ -1,0 +1,7 @@
+#include "driver/tasking.h"
+
+namespace tbdaily {
+
+void HandleTaskingAndOSChange(Platform&) {}
+
+}  // namespace tbdaily
