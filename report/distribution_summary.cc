@@ -22,8 +22,9 @@ void DistributionSummary::add(double value) {
 }
 
 PlistValue DistributionSummary::statistics() const {
-  return PlistValue::array({PlistValue::float64(minimum_), PlistValue::float64(maximum_), PlistValue::float64(mean_),
-                            PlistValue::float64(squaredDeviations_), PlistValue::int32(static_cast<std::int32_t>(count_))});
+  return PlistValue::array({PlistValue::float64(minimum_), PlistValue::float64(maximum_),
+                            PlistValue::float64(mean_), PlistValue::float64(squaredDeviations_),
+                            PlistValue::int32(static_cast<std::int32_t>(count_))});
 }
 
 std::uint32_t determineHistBucketForValueWithIntervals(double value, std::span<const double> intervals) {
@@ -32,8 +33,11 @@ std::uint32_t determineHistBucketForValueWithIntervals(double value, std::span<c
   return bucket;
 }
 
-PlistValue histogramDictForIntervalsWithHistCounts(const PlistArray& intervals, std::span<const std::uint64_t> counts) {
-  const auto boundaryText = [&intervals](std::size_t i) { return numberText(intervals[i].asNumber().value_or(PlistNumber::float64(0))); };
+PlistValue histogramDictForIntervalsWithHistCounts(const PlistArray& intervals,
+                                                   std::span<const std::uint64_t> counts) {
+  const auto boundaryText = [&intervals](std::size_t i) {
+    return numberText(intervals[i].asNumber().value_or(PlistNumber::float64(0)));
+  };
   PlistDictionary histogram;
   for (std::size_t i = 0; i < counts.size(); ++i) {
     if (counts[i] == 0) continue;

@@ -5,7 +5,8 @@ namespace tbdaily {
 InternalDeviceAnswer gInternalDeviceAnswer;
 
 bool TBIsInternalDevice(DeviceAnswers& answers) {
-  gInternalDeviceAnswer.once.run([&] { gInternalDeviceAnswer.isInternal = answers.booleanAnswer("InternalBuild"); });
+  gInternalDeviceAnswer.once.run(
+      [&] { gInternalDeviceAnswer.isInternal = answers.booleanAnswer("InternalBuild"); });
   return gInternalDeviceAnswer.isInternal;
 }
 

@@ -1,4 +1,5 @@
-// One look-up table of the whitelist: exact keys or key prefixes, with their options and the group that listed them.
+// One look-up table of the whitelist: exact keys or key prefixes, with their options and the group that
+// listed them.
 #pragma once
 
 #include <cstdint>

@@ -8,11 +8,13 @@ namespace {
 
 std::size_t commonLength(std::string_view a, std::string_view b) {
   const auto limit = std::min(a.size(), b.size());
-  return static_cast<std::size_t>(std::mismatch(a.begin(), a.begin() + static_cast<std::ptrdiff_t>(limit), b.begin()).first -
-                                  a.begin());
+  return static_cast<std::size_t>(
+      std::mismatch(a.begin(), a.begin() + static_cast<std::ptrdiff_t>(limit), b.begin()).first - a.begin());
 }
 
-unsigned char byteOf(char c) { return static_cast<unsigned char>(c); }
+unsigned char byteOf(char c) {
+  return static_cast<unsigned char>(c);
+}
 
 }  // namespace
 
@@ -22,10 +24,11 @@ PrefixIndex::PrefixIndex(const std::vector<std::string_view>& prefixes) {
   for (std::uint32_t place = 0; place < prefixes.size(); ++place) {
     if (!prefixes[place].empty()) sorted.push_back({prefixes[place], place});
   }
-  std::sort(sorted.begin(), sorted.end(), [](const Listed& a, const Listed& b) { return a.prefix < b.prefix; });
+  std::sort(sorted.begin(), sorted.end(),
+            [](const Listed& a, const Listed& b) { return a.prefix < b.prefix; });
 
-  // Nodes whose children are still to be made, each with its run of the sorted list and its depth in bytes. A worklist, since a
-  // chain of prefixes can be as deep as the longest of them.
+  // Nodes whose children are still to be made, each with its run of the sorted list and its depth in bytes. A
+  // worklist, since a chain of prefixes can be as deep as the longest of them.
   struct Pending {
     std::uint32_t node;
     std::size_t begin, end, depth;
@@ -62,9 +65,9 @@ PrefixIndex::PrefixIndex(const std::vector<std::string_view>& prefixes) {
 const PrefixIndex::Node* PrefixIndex::childFor(const Node& node, char byte) const {
   const Node* begin = nodes_.data() + node.firstChild;
   const Node* end = begin + node.childCount;
-  const Node* found = std::lower_bound(begin, end, byteOf(byte), [this](const Node& child, unsigned char wanted) {
-    return byteOf(labels_[child.labelStart]) < wanted;
-  });
+  const Node* found = std::lower_bound(
+      begin, end, byteOf(byte),
+      [this](const Node& child, unsigned char wanted) { return byteOf(labels_[child.labelStart]) < wanted; });
   return found != end && labels_[found->labelStart] == byte ? found : nullptr;
 }
 

@@ -1,7 +1,8 @@
-// Finds, for a key, the first listed prefix with which it begins, in time that depends on the key's length alone.
+// Finds, for a key, the first listed prefix with which it begins, in time that depends on the key's length
+// alone.
 //
-// A radix tree over the prefixes: every node that ends a prefix carries the prefix's place in the list, and the walk along the
-// key keeps the smallest place that it meets.
+// A radix tree over the prefixes: every node that ends a prefix carries the prefix's place in the list, and
+// the walk along the key keeps the smallest place that it meets.
 #pragma once
 
 #include <cstdint>

@@ -36,8 +36,9 @@ bool isAbsentOrNumbers(const PlistDictionary& options, std::string_view key) {
   const PlistValue* value = options.find(key);
   if (value == nullptr) return true;
   const PlistArray* array = value->asArray();
-  return array != nullptr && std::all_of(array->begin(), array->end(),
-                                         [](const PlistValue& element) { return element.asNumber().has_value(); });
+  return array != nullptr && std::all_of(array->begin(), array->end(), [](const PlistValue& element) {
+           return element.asNumber().has_value();
+         });
 }
 
 // A coarsening rule that cannot be read must never mean that a value leaves the device as it is.
@@ -116,11 +117,13 @@ void TBConfig::mergeEntries(KeyTable& table, const std::string& where, const Pli
   for (const auto& [key, options] : *keys) {
     const PlistDictionary* rules = options.asDictionary();
     if (rules == nullptr) {
-      log_.message(LogLevel::Error, "options of whitelist key %{public}@ in %{public}@ are no dictionary; the key is skipped",
+      log_.message(LogLevel::Error,
+                   "options of whitelist key %{public}@ in %{public}@ are no dictionary; the key is skipped",
                    key, where);
     } else if (!rulesAreReadable(*rules)) {
-      log_.message(LogLevel::Error, "options of whitelist key %{public}@ in %{public}@ cannot be read; the key is skipped", key,
-                   where);
+      log_.message(LogLevel::Error,
+                   "options of whitelist key %{public}@ in %{public}@ cannot be read; the key is skipped",
+                   key, where);
     } else {
       table.set(key, options, group);
     }

@@ -1,4 +1,5 @@
-// The key whitelist: which keys a daily report may carry, and how their values are coarsened before they leave the device.
+// The key whitelist: which keys a daily report may carry, and how their values are coarsened before they
+// leave the device.
 #pragma once
 
 #include <memory>
@@ -12,7 +13,8 @@
 
 namespace tbdaily {
 
-inline constexpr std::string_view kWhitelistPath = "/Library/Application Support/Tallybook/Whitelist_Nimbos.plist";
+inline constexpr std::string_view kWhitelistPath =
+    "/Library/Application Support/Tallybook/Whitelist_Nimbos.plist";
 
 // Options of a key; other entries of an options dictionary mean nothing to the report.
 namespace whitelist_option {
@@ -35,12 +37,14 @@ struct WhitelistMatch {
 // Read-only once loaded. Keeps a reference to the platform's log.
 class TBConfig {
  public:
-  // Reads, digests and parses the whitelist. Null when it cannot be read or is no property list with a dictionary at its root;
-  // the log says why. Groups that a tasking switched off, and entries that are not understood, are left out with a message.
+  // Reads, digests and parses the whitelist. Null when it cannot be read or is no property list with a
+  // dictionary at its root; the log says why. Groups that a tasking switched off, and entries that are not
+  // understood, are left out with a message.
   static std::unique_ptr<TBConfig> init(Platform& platform);
 
-  // The key's options, or null when it may not be reported. An exact entry beats every prefix; of several prefixes the first in
-  // file order wins; on an internal device everything else is allowed with empty options. Borrowed.
+  // The key's options, or null when it may not be reported. An exact entry beats every prefix; of several
+  // prefixes the first in file order wins; on an internal device everything else is allowed with empty
+  // options. Borrowed.
   const PlistDictionary* configOptionsForScalarKey(std::string_view key) const;
   const PlistDictionary* configOptionsForDistributionKey(std::string_view key) const;
 

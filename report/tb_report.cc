@@ -11,7 +11,8 @@ namespace tbdaily {
 
 namespace {
 
-// The counters of one distribution's histogram; without boundaries, or without memory for the counters, it counts nothing.
+// The counters of one distribution's histogram; without boundaries, or without memory for the counters, it
+// counts nothing.
 class Histogram {
  public:
   Histogram(const PlistArray* intervals, std::string_view key, SystemLog& log) : intervals_(intervals) {
@@ -22,7 +23,8 @@ class Histogram {
       boundaries_.reserve(intervals->size());
     } catch (const std::bad_alloc&) {
       counts_ = {};
-      log.message(LogLevel::Default, "Couldn't allocate histCounts for key %@. Will not calculate histogram values", key);
+      log.message(LogLevel::Default,
+                  "Couldn't allocate histCounts for key %@. Will not calculate histogram values", key);
       return;
     }
     // The whitelist lets only numbers through.
@@ -56,13 +58,15 @@ void TBReport::writeLogForYesterdayWithAppInfo(DayNumber day, const PlistValue& 
 void TBReport::readHistory(DayNumber day) {
   const std::unique_ptr<OpenAnalyticsHistory> history = platform_.analyticsHistory.open();
   const DayNumber previous = day == std::numeric_limits<DayNumber>::min() ? day : day - 1;
-  history->enumerateScalars("", previous, day, [this](std::string_view key, DayNumber, std::int64_t value, bool&) {
-    const PlistDictionary* options = scalarOptions(key);
-    if (options != nullptr) addScalarForKeyWithOptions(value, key, *options);
-  });
+  history->enumerateScalars("", previous, day,
+                            [this](std::string_view key, DayNumber, std::int64_t value, bool&) {
+                              const PlistDictionary* options = scalarOptions(key);
+                              if (options != nullptr) addScalarForKeyWithOptions(value, key, *options);
+                            });
   history->enumerateDistributions(
       "", previous, day, [this](std::string_view key, DayNumber, DistributionEnumerator& values, bool&) {
-        const PlistDictionary* options = _config != nullptr ? _config->configOptionsForDistributionKey(key) : nullptr;
+        const PlistDictionary* options =
+            _config != nullptr ? _config->configOptionsForDistributionKey(key) : nullptr;
         if (options != nullptr) computeAndAddDistributionForKeyWithOptions(values, key, *options);
       });
 }
@@ -78,12 +82,14 @@ std::int64_t TBReport::addScalarForKeyWithOptions(std::int64_t value, std::strin
   return rounded;
 }
 
-void TBReport::addScalarForKeyByExecutingBlock(std::string_view key, const std::function<std::int64_t()>& producer) {
+void TBReport::addScalarForKeyByExecutingBlock(std::string_view key,
+                                               const std::function<std::int64_t()>& producer) {
   const PlistDictionary* options = scalarOptions(key);
   if (options != nullptr) addScalarForKeyWithOptions(producer(), key, *options);
 }
 
-void TBReport::computeAndAddDistributionForKeyWithOptions(DistributionEnumerator& values, std::string_view key,
+void TBReport::computeAndAddDistributionForKeyWithOptions(DistributionEnumerator& values,
+                                                          std::string_view key,
                                                           const PlistDictionary& options) {
   const PlistValue intervals = options.get(whitelist_option::kIntervals);
   Histogram histogram(intervals.asArray(), key, platform_.systemLog);

@@ -1,4 +1,5 @@
-// The daily report: gathers one day's whitelisted values, coarsens them and writes them as a log for submission.
+// The daily report: gathers one day's whitelisted values, coarsens them and writes them as a log for
+// submission.
 #pragma once
 
 #include <cstdint>
@@ -7,8 +8,8 @@
 #include <string_view>
 
 #include "platform/analytics_history.h"
-#include "platform/plist_value.h"
 #include "platform/platform.h"
+#include "platform/plist_value.h"
 #include "report/tb_config.h"
 
 namespace tbdaily {
@@ -19,12 +20,13 @@ class TBReport {
   // Loads the whitelist. Without one the report stays empty and is not written.
   explicit TBReport(Platform& platform);
 
-  // Reads the rows of the day (and of the day before it), keeps what the whitelist allows, and writes the report. `appInfo` is an
-  // array of AppInfoRecord, or none.
+  // Reads the rows of the day (and of the day before it), keeps what the whitelist allows, and writes the
+  // report. `appInfo` is an array of AppInfoRecord, or none.
   void writeLogForYesterdayWithAppInfo(DayNumber day, const PlistValue& appInfo);
 
   // Rounds the value as the options say, stores it under the key and returns it.
-  std::int64_t addScalarForKeyWithOptions(std::int64_t value, std::string_view key, const PlistDictionary& options);
+  std::int64_t addScalarForKeyWithOptions(std::int64_t value, std::string_view key,
+                                          const PlistDictionary& options);
   // Runs the producer, once, only when the key is whitelisted, and adds what it returns.
   void addScalarForKeyByExecutingBlock(std::string_view key, const std::function<std::int64_t()>& producer);
   // Consumes the values; stores their statistics and, with "intervals", their histogram.
@@ -49,8 +51,10 @@ class TBReport {
  private:
   void readHistory(DayNumber day);
   const PlistDictionary* scalarOptions(std::string_view key) const;
-  PlistDictionary rootDictionary(DayNumber day, const PlistValue& appInfo, const std::string& whitelistDigest);
-  // The options of the log record: the previous OS version when it is not the current one, which is then remembered.
+  PlistDictionary rootDictionary(DayNumber day, const PlistValue& appInfo,
+                                 const std::string& whitelistDigest);
+  // The options of the log record: the previous OS version when it is not the current one, which is then
+  // remembered.
   PlistValue noteOSVersion();
 
   Platform& platform_;

@@ -23,7 +23,8 @@ constexpr std::string_view kUptimeKey = "com.velmora.usage.cur_boot_session_cpu_
 constexpr std::string_view kUnknown = "<unknown>";
 constexpr std::int64_t kNotAvailable = -1;
 
-// A kernel value that is reported as it is: read into a buffer of this size, of which the first bytes are the number.
+// A kernel value that is reported as it is: read into a buffer of this size, of which the first bytes are the
+// number.
 struct KernelMetric {
   std::string_view key;
   std::string_view sysctl;
@@ -44,7 +45,8 @@ constexpr std::array<KernelMetric, 5> kKernelMetrics = {{
 std::int64_t readKernelMetric(Kernel& kernel, const KernelMetric& metric) {
   std::array<std::byte, kLargestBuffer> buffer{};
   std::size_t length = metric.bufferSize;
-  if (kernel.sysctlByName(metric.sysctl, std::span(buffer).first(metric.bufferSize), length) != 0) return kNotAvailable;
+  if (kernel.sysctlByName(metric.sysctl, std::span(buffer).first(metric.bufferSize), length) != 0)
+    return kNotAvailable;
   const ByteReader reader(buffer);
   if (metric.numberSize == sizeof(std::uint32_t)) return *reader.at<std::uint32_t>(0);
   return static_cast<std::int64_t>(*reader.at<std::uint64_t>(0));
@@ -73,7 +75,8 @@ void TBReport::addInstalledAppInfo() {
 void TBReport::addMetadataKeys() {
   LocaleSettings& settings = platform_.localeSettings;
   const std::vector<std::string> preferred = settings.preferredLanguages();
-  const std::vector<std::string> localizations = settings.bestLocalizations(settings.systemLanguages(), preferred);
+  const std::vector<std::string> localizations =
+      settings.bestLocalizations(settings.systemLanguages(), preferred);
   _metadataOutput.set("TBUserInterfaceLanguage", PlistValue::string(firstOr(localizations, kUnknown)));
   _metadataOutput.set("TBPreferredUserInterfaceLanguage", PlistValue::string(firstOr(preferred, kUnknown)));
   if (const auto country = settings.countryCode()) {
@@ -83,7 +86,8 @@ void TBReport::addMetadataKeys() {
 
 void TBReport::reportDatabaseSize() {
   addScalarForKeyByExecutingBlock(kDatabaseSizeKey, [this] { return GetDatabaseSizeMB(platform_); });
-  addScalarForKeyByExecutingBlock(kDatabaseCorruptionsKey, [this] { return TakeDatabaseCorruptionCount(platform_); });
+  addScalarForKeyByExecutingBlock(kDatabaseCorruptionsKey,
+                                  [this] { return TakeDatabaseCorruptionCount(platform_); });
 }
 
 void TBReport::reportCPUUptime() {
@@ -95,8 +99,8 @@ void TBReport::reportCPUUptime() {
       return kNotAvailable;
     }
     // In this order: another one rounds differently.
-    return saturatingInt64(static_cast<double>(timebase->numerator) * 1e-9 / static_cast<double>(timebase->denominator) /
-                           60 * static_cast<double>(ticks));
+    return saturatingInt64(static_cast<double>(timebase->numerator) * 1e-9 /
+                           static_cast<double>(timebase->denominator) / 60 * static_cast<double>(ticks));
   });
 }
 

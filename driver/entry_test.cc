@@ -1,0 +1,181 @@
+#include "driver/entry.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "driver/daily_tasks.h"
+#include "driver/environment_probes.h"
+#include "driver/service_endpoint.h"
+#include "report/internal_device.h"
+#include "report/tb_config.h"
+#include "testing/fake_platform.h"
+
+namespace tbdaily {
+namespace {
+
+using ::testing::Contains;
+using ::testing::Each;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+constexpr DayNumber kToday = 20781;
+constexpr const char* kLastDay = "LastCrashLogSerializationDateInDaysSince1970";
+constexpr ServiceConnection kPeer = 2;
+
+PlistDictionary operation(std::int64_t number) {
+  return {{"operation", PlistValue::int64(number)}};
+}
+
+PlistValue app(const char* bundle, std::size_t uuidLength = 16) {
+  return PlistValue::dictionary({{"bundle_id", PlistValue::string(bundle)},
+                                 {"version", PlistValue::string("1.2")},
+                                 {"kestrel_id", PlistValue::int64(-5)},
+                                 {"arch", PlistValue::int64(2)},
+                                 {"uuid", PlistValue::data(PlistData(uuidLength, std::byte{0xab}))}});
+}
+
+class EntryTest : public ::testing::Test {
+ protected:
+  EntryTest() {
+    gCommandState.gAppInfoRequested = false;
+    gCommandState.commandOnce.reset();
+    gInternalDeviceAnswer.once.reset();
+    gEnvironmentProbeCache = {};
+    fake_.analyticsClient.today = kToday;
+    fake_.logSubmission.enabled = true;
+    fake_.analyticsHistory.addScalar("k", kToday - 1, 1);
+    fake_.analyticsHistory.addScalar("k", kToday, 2);
+    fake_.putPlist(
+        kWhitelistPath,
+        {{"G", PlistValue::dictionary(
+                   {{"ScalarKeys", PlistValue::dictionary({{"k", PlistValue::dictionary({})}})}})}});
+  }
+
+  // Runs the process and answers its log lines between the first and the last.
+  std::vector<std::string> run(std::vector<const char*> arguments) {
+    arguments.insert(arguments.begin(), "tbdaily");
+    fake_.systemLog.lines.clear();
+    EXPECT_EQ(runEntry(fake_.platform, static_cast<int>(arguments.size()), arguments.data()), 0);
+    std::vector<std::string> lines = fake_.systemLog.lines;
+    EXPECT_EQ(lines.front(), "default: tbdaily started");
+    EXPECT_EQ(lines.back(), "default: tbdaily ended");
+    return {lines.begin() + 1, lines.end() - 1};
+  }
+  PlistValue lastDay() { return fake_.preferences.getValue(kLastDay, "com.velmora.tallyd.tbdaily"); }
+  PlistValue appInfoOfReport(std::size_t index) {
+    return fake_.plistOf(fake_.logSubmission.logs.at(index)).asDictionary()->get("TBActivatedAppInfo");
+  }
+
+  testing::FakePlatform fake_;
+};
+
+TEST_F(EntryTest, RunsOncePerDayAndRemembersTheDayAfterTheTasks) {
+  EXPECT_THAT(run({"-d", "ignored"}), Contains("default: daily tasks for day 20780"));
+  EXPECT_EQ(lastDay(), PlistValue::int32(kToday - 1));
+  EXPECT_EQ(fake_.preferences.writes.back(), "synchronize com.velmora.tallyd.tbdaily");
+  EXPECT_THAT(run({"-d"}), ElementsAre("default: Day unchanged since last run"));
+  fake_.analyticsClient.today = kToday - 10;  // the clock was moved back
+  EXPECT_THAT(run({"-d"}), ElementsAre("default: Day unchanged since last run"));
+  fake_.analyticsClient.today = kToday + 5;
+  EXPECT_THAT(run({"-d"}), Contains("default: daily tasks for day 20785"));
+}
+
+TEST_F(EntryTest, ForcedRunsNeitherReadNorWriteTheLastDay) {
+  EXPECT_THAT(run({"-f"}), Contains("default: daily tasks for day 20780"));
+  EXPECT_THAT(run({"-t"}), Contains("default: daily tasks for day 20781"));
+  EXPECT_TRUE(lastDay().isNone());
+  for (const char* argument : {"-D", "-dd", "", "--help"}) {
+    EXPECT_THAT(run({argument}), ElementsAre("default: Unknown arg: " + std::string(argument)));
+  }
+  EXPECT_EQ(runEntry(fake_.platform, 0, nullptr), 0);
+}
+
+TEST_F(EntryTest, TheStepsRunInTheirOrderWithAndWithoutTheReport) {
+  RunDailyTasks(fake_.platform, 5, {});
+  EXPECT_THAT(fake_.analyticsClient.calls, Contains("checkpoint"));
+  EXPECT_THAT(fake_.logSubmission.calls, ElementsAre("enabled?", "dump", "roll"));  // day 5 has no rows
+  fake_.logSubmission.calls.clear();
+  RunDailyTasks(fake_.platform, kToday, {});
+  EXPECT_THAT(fake_.logSubmission.calls, ElementsAre("enabled?", "write", "dump", "roll"));
+  fake_.logSubmission.calls.clear();
+  fake_.logSubmission.enabled = false;
+  RunDailyTasks(fake_.platform, kToday, {});
+  EXPECT_THAT(fake_.logSubmission.calls, ElementsAre("enabled?", "dump", "roll"));
+}
+
+TEST_F(EntryTest, TheListenerEndsAfterOneQuietSlice) {
+  EXPECT_THAT(run({}), IsEmpty());
+  EXPECT_EQ(fake_.serviceListener.endpoint, "com.velmora.tallyd.tbdaily");
+  fake_.serviceListener.addError(testing::FakeServiceListener::kListener);
+  fake_.serviceListener.addFinishedSlice();
+  EXPECT_THAT(run({}), IsEmpty());
+  EXPECT_EQ(fake_.serviceListener.sliceSeconds.size(), 4U);
+  EXPECT_THAT(fake_.serviceListener.sliceSeconds, Each(10.0));
+  fake_.serviceListener.fails = true;
+  EXPECT_THAT(run({}), IsEmpty());
+  EXPECT_EQ(fake_.serviceListener.sliceSeconds.size(), 5U);
+}
+
+TEST_F(EntryTest, AppInfoThatWasAskedForStandsInTheReport) {
+  fake_.serviceListener.addPeer(kPeer);
+  fake_.serviceListener.addMessage(kPeer, operation(2));  // nobody asked yet
+  fake_.serviceListener.addMessage(kPeer, {});            // no operation counts as 0
+  PlistDictionary info = operation(2 + (std::int64_t{7} << 32));
+  info.set("app_data",
+           PlistValue::array({app("one"), PlistValue::string("odd"), app("two", 15), app("three")}));
+  fake_.serviceListener.addMessage(kPeer, info);
+  fake_.serviceListener.addMessage(kPeer, operation(2));  // and nobody asks any more
+  const auto lines = run({});
+  EXPECT_EQ(lines[0], "default: tbdaily got (unsolicited -- so ignoring) AAI:\n[]");
+  EXPECT_EQ(lines[1], "default: notified of logging status, waiting for activate app info");
+  EXPECT_TRUE(lines[2].starts_with("default: tbdaily got requestedAAI:\n[{\"bundle\": \"one\""));
+  EXPECT_EQ(lines.back(), "default: tbdaily got (unsolicited -- so ignoring) AAI:\n[]");
+  EXPECT_THAT(fake_.notifications.posts, ElementsAre("com.velmora.tallyd.tbdaily.logging"));
+  ASSERT_EQ(fake_.logSubmission.logs.size(), 1U);
+  const PlistValue appInfo = appInfoOfReport(0);
+  ASSERT_EQ(appInfo.asArray()->size(), 2U);
+  EXPECT_EQ((*appInfo.asArray())[1],
+            PlistValue::dictionary({{"bundle", PlistValue::string("three")},
+                                    {"version", PlistValue::string("1.2")},
+                                    {"kestrelID", PlistValue::int64(-5)},
+                                    {"arch", PlistValue::int64(2)},
+                                    {"uuid", PlistValue::string("ABABABAB-ABAB-ABAB-ABAB-ABABABABABAB")}}));
+}
+
+TEST_F(EntryTest, AnAnswerThatNeverCameIsDoneWithout) {
+  fake_.serviceListener.addPeer(kPeer);
+  fake_.serviceListener.addMessage(kPeer, operation(0));
+  fake_.serviceListener.addMessage(kPeer, operation(1));  // the guard is used up
+  const auto lines = run({});
+  EXPECT_EQ(lines[1], "default: never received requested AAI, so moving along without it");
+  EXPECT_EQ(lines[2], "default: daily tasks for day 20780");
+  EXPECT_TRUE(appInfoOfReport(0).isNone());
+}
+
+TEST_F(EntryTest, AnEmptyListOfAppsIsAnAnswer) {
+  fake_.serviceListener.addPeer(kPeer);
+  fake_.serviceListener.addMessage(kPeer, operation(0));
+  fake_.serviceListener.addMessage(kPeer, operation(2));
+  run({});
+  EXPECT_EQ(appInfoOfReport(0), PlistValue::array({}));
+}
+
+TEST_F(EntryTest, ARunForADayBypassesTheRuleAndUsesUpTheGuard) {
+  fake_.serviceListener.addPeer(kPeer);
+  PlistDictionary message = operation(1);
+  message.set("value", PlistValue::int64(-1));
+  fake_.serviceListener.addMessage(kPeer, message);
+  fake_.serviceListener.addMessage(kPeer, operation(0));
+  EXPECT_EQ(run({})[0], "default: daily tasks for day -1");
+  EXPECT_THAT(fake_.notifications.posts, IsEmpty());
+  EXPECT_FALSE(gCommandState.gAppInfoRequested);
+  EXPECT_TRUE(lastDay().isNone());
+
+  gCommandState.commandOnce.reset();
+  fake_.serviceListener.addMessage(kPeer, operation(77));
+  fake_.serviceListener.addMessage(kPeer, operation(1));
+  EXPECT_THAT(run({}), IsEmpty());
+}
+
+}  // namespace
+}  // namespace tbdaily

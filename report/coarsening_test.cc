@@ -1,0 +1,115 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <limits>
+
+#include "report/distribution_summary.h"
+#include "report/scalar_rounding.h"
+
+namespace tbdaily {
+namespace {
+
+constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
+constexpr std::int64_t kMin = std::numeric_limits<std::int64_t>::min();
+
+TEST(ScalarRounding, FollowsIntervalThenFigures) {
+  struct Case {
+    std::int64_t value;
+    std::optional<std::int64_t> interval, figures;
+    std::int64_t expected;
+  };
+  const std::optional<std::int64_t> none;
+  const Case cases[] = {{14, 10, none, 10},
+                        {15, 10, none, 20},
+                        {25, 10, none, 30},
+                        {1536, 1024, none, 2048},
+                        {7, 0, none, 0},
+                        {-7, 10, none, -10},
+                        {-4, 10, none, 0},
+                        {-5, 10, none, -10},
+                        {kMin, 10, none, kMin},
+                        {kMax, 10, none, -9223372036854775806},  // the unsigned result, read as signed
+                        {5, -1, none, 0},      // an interval of 2^64 - 1: half of it is not reached
+                        {kMax, -2, none, -2},  // here it is reached
+                        {123456, none, 2, 120000},
+                        {987654321, none, 3, 988000000},
+                        {1234, none, 3, 1230},
+                        {999, none, 2, 1000},
+                        {45, none, 1, 50},
+                        {44, none, 1, 40},
+                        {-150, none, 1, -200},
+                        {12, none, 5, 12},
+                        {5, none, 0, 10},
+                        {0, none, 1, 0},
+                        {kMax, none, 1, 9000000000000000000},
+                        {kMax, none, 0, kMax},
+                        {kMin, none, 0, kMin},
+                        {7, none, -1000, 0},  // ten to the power of a thousand: nothing is left
+                        {14, 10, 1, 10},
+                        {1536, 1024, 1, 2000},
+                        {4, 10, 1, 0},
+                        {77, none, none, 77}};
+  for (const Case& c : cases) {
+    PlistDictionary options{{"unknown", PlistValue::int64(3)}};
+    if (c.interval) options.set("bucket_interval", PlistValue::int64(*c.interval));
+    if (c.figures) options.set("sig_fig", PlistValue::int64(*c.figures));
+    EXPECT_EQ(roundedScalar(c.value, options), c.expected)
+        << c.value << " " << c.interval.value_or(-99) << " " << c.figures.value_or(-99);
+  }
+  EXPECT_EQ(roundedScalar(kMin, {}), kMin);
+}
+
+std::vector<double> statisticsOf(const std::vector<double>& values) {
+  DistributionSummary summary;
+  for (const double value : values) summary.add(value);
+  std::vector<double> numbers;
+  const PlistValue statistics = summary.statistics();
+  for (const PlistValue& number : *statistics.asArray()) numbers.push_back(number.asNumber()->toDouble());
+  return numbers;
+}
+
+TEST(DistributionSummary, KeepsFiveFigures) {
+  using ::testing::DoubleEq;
+  using ::testing::ElementsAre;
+  EXPECT_THAT(statisticsOf({}), ElementsAre(0, 0, 0, 0, 0));
+  EXPECT_THAT(statisticsOf({-2.5}), ElementsAre(-2.5, -2.5, -2.5, 0, 1));
+  EXPECT_THAT(statisticsOf({2, 4, 4, 4, 5, 5, 7, 9}), ElementsAre(2, 9, 5, DoubleEq(32), 8));
+  const auto odd = statisticsOf({1, std::nan(""), 0.5});
+  EXPECT_EQ(odd[0], 0.5);
+  EXPECT_TRUE(std::isnan(odd[2]));
+  EXPECT_EQ(odd[4], 3);
+  EXPECT_TRUE(std::isnan(statisticsOf({1, std::nan("")})[1]));
+  EXPECT_EQ(DistributionSummary().statistics().asArray()->at(4).asNumber()->kind(), NumberKind::SInt32);
+}
+
+TEST(Histogram, BucketsAreClosedAboveAndInTheGivenOrder) {
+  const double ascending[] = {10, 100};
+  const std::pair<double, std::uint32_t> cases[] = {{-5, 0},  {10, 0},  {10.5, 1},
+                                                    {100, 1}, {101, 2}, {std::nan(""), 2}};
+  for (const auto& [value, bucket] : cases) {
+    EXPECT_EQ(determineHistBucketForValueWithIntervals(value, ascending), bucket) << value;
+  }
+  const double unsorted[] = {100, 10};
+  EXPECT_EQ(determineHistBucketForValueWithIntervals(5, unsorted), 0U);
+  EXPECT_EQ(determineHistBucketForValueWithIntervals(500, unsorted), 2U);
+  EXPECT_EQ(determineHistBucketForValueWithIntervals(5, {}), 0U);
+}
+
+TEST(Histogram, LabelsShowTheBoundariesOwnText) {
+  const PlistArray boundaries = {PlistValue::int64(10), PlistValue::float64(2.5),
+                                 PlistValue::float64(100000)};
+  const std::uint64_t counts[] = {1, 2, 0, 3};
+  EXPECT_EQ(histogramDictForIntervalsWithHistCounts(boundaries, counts),
+            PlistValue::dictionary({{"(-inf, 10]", PlistValue::int64(1)},
+                                    {"(10, 2.5]", PlistValue::int64(2)},
+                                    {"(100000, inf)", PlistValue::int64(3)}}));
+  const std::uint64_t one[] = {4};
+  EXPECT_EQ(histogramDictForIntervalsWithHistCounts({}, one),
+            PlistValue::dictionary({{"(-inf, inf)", PlistValue::int64(4)}}));
+  const std::uint64_t nothing[] = {0};
+  EXPECT_TRUE(histogramDictForIntervalsWithHistCounts({}, nothing).isNone());
+}
+
+}  // namespace
+}  // namespace tbdaily

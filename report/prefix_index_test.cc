@@ -1,0 +1,59 @@
+#include "report/prefix_index.h"
+
+#include <gtest/gtest.h>
+
+#include <random>
+#include <string>
+
+namespace tbdaily {
+namespace {
+
+TEST(PrefixIndex, TheFirstListedPrefixWinsWhicheverIsLonger) {
+  const PrefixIndex index({"net.wifi.", "net.", "", "app", "application.", "z"});
+  EXPECT_EQ(index.firstMatch("net.wifi.rssi"), 0U);
+  EXPECT_EQ(index.firstMatch("net.cell"), 1U);
+  EXPECT_EQ(index.firstMatch("application.x"), 3U);
+  EXPECT_EQ(index.firstMatch("z"), 5U);
+  EXPECT_FALSE(index.firstMatch("ap"));
+  EXPECT_FALSE(index.firstMatch(""));
+  EXPECT_FALSE(index.firstMatch("other"));
+  EXPECT_EQ(PrefixIndex({"net.", "net.wifi."}).firstMatch("net.wifi.rssi"), 0U);
+  EXPECT_FALSE(PrefixIndex().firstMatch("anything"));
+}
+
+TEST(PrefixIndex, AgreesWithAScanOfTheList) {
+  std::mt19937 random(3);
+  const auto text = [&random](std::size_t longest) {
+    std::string s(random() % (longest + 1), ' ');
+    for (char& c : s) c = static_cast<char>("ab\xff"[random() % 3]);
+    return s;
+  };
+  for (int round = 0; round < 200; ++round) {
+    std::vector<std::string> texts;
+    for (unsigned i = 0; i < random() % 40; ++i) {
+      std::string candidate = text(6);
+      if (std::find(texts.begin(), texts.end(), candidate) == texts.end())
+        texts.push_back(std::move(candidate));
+    }
+    const PrefixIndex index({texts.begin(), texts.end()});
+    for (int i = 0; i < 100; ++i) {
+      const std::string key = text(9);
+      std::optional<std::uint32_t> expected;
+      for (std::uint32_t place = 0; place < texts.size() && !expected; ++place) {
+        if (!texts[place].empty() && key.starts_with(texts[place])) expected = place;
+      }
+      ASSERT_EQ(index.firstMatch(key), expected) << key;
+    }
+  }
+}
+
+TEST(PrefixIndex, AChainAsDeepAsItsLongestPrefixIsNoTrouble) {
+  std::vector<std::string> chain;
+  for (std::size_t length = 3000; length > 0; --length) chain.emplace_back(length, 'a');
+  const PrefixIndex index({chain.begin(), chain.end()});
+  EXPECT_EQ(index.firstMatch(std::string(5000, 'a')), 0U);
+  EXPECT_EQ(index.firstMatch("ab"), 2999U);
+}
+
+}  // namespace
+}  // namespace tbdaily

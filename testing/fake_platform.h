@@ -1,0 +1,57 @@
+// A platform of fakes: `FakePlatform fake; RunDailyTasks(fake.platform, ...)`.
+#pragma once
+
+#include "platform/driver_registry.h"
+#include "platform/platform.h"
+#include "platform/stack_snapshot.h"
+#include "platform/usage_service.h"
+#include "testing/fake_analytics.h"
+#include "testing/fake_log_submission.h"
+#include "testing/fake_property_list_codec.h"
+#include "testing/fake_services.h"
+
+namespace tbdaily::testing {
+
+struct FakePlatform {
+  FakePlatform() = default;
+  FakePlatform(const FakePlatform&) = delete;
+  FakePlatform& operator=(const FakePlatform&) = delete;
+
+  AbsentDriverRegistry driverRegistry;
+  FakePreferences preferences;
+  FakeDeviceAnswers deviceAnswers;
+  FakeLogSubmission logSubmission;
+  FakeAnalyticsClient analyticsClient;
+  FakeAnalyticsHistory analyticsHistory;
+  FakePropertyListCodec propertyListCodec;
+  AbsentStackSnapshot stackSnapshot;
+  AbsentUsageService usageService;
+  FakeAppRegistry appRegistry;
+  FakeLocaleSettings localeSettings;
+  FakeServiceListener serviceListener;
+  FakeNotifications notifications;
+  FakeSystemLog systemLog;
+  FakeKernel kernel;
+  FakeFileSystem fileSystem;
+  FakeDynamicLoader dynamicLoader;
+  FakeMessageDigest messageDigest;
+
+  Platform platform{driverRegistry,   preferences,       deviceAnswers, logSubmission, analyticsClient,
+                    analyticsHistory, propertyListCodec, stackSnapshot, usageService,  appRegistry,
+                    localeSettings,   serviceListener,   notifications, systemLog,     kernel,
+                    fileSystem,       dynamicLoader,     messageDigest};
+
+  // Puts a property list into a file, through the fake codec.
+  void putPlist(std::string_view path, const PlistDictionary& root) {
+    const PlistWriteResult written = propertyListCodec.write(PlistValue::dictionary(root));
+    propertyListCodec.forms.clear();
+    const auto bytes = std::as_bytes(std::span(written.bytes));
+    fileSystem.files[std::string(path)] = {bytes.begin(), bytes.end()};
+  }
+  // The value that a log's bytes hold.
+  PlistValue plistOf(const FakeLogSubmission::Log& log) {
+    return propertyListCodec.parse(std::as_bytes(std::span(log.bytes))).value;
+  }
+};
+
+}  // namespace tbdaily::testing
