@@ -1,11 +1,10 @@
 // Feeds arbitrary bytes to the property-list codec: whatever reads, writes, and what is written in the exact
-// form reads back equal. Built as a program of its own with clang, from the top of the tree:
+// form reads back equal. Built as a program of its own with clang, from the top of the tree (bash):
 //
-//   clang++ -std=c++20 -g -O1 -fsanitize=fuzzer,address,undefined -I. fuzz/plist_fuzz.cc
-//   platform/linux/utf8.cc \
-//     platform/linux/plist_{binary_reader,builder,json,scalar_text,xml_reader,xml_writer}.cc
-//     platform/number_text.cc \ platform/linux/{base64,property_list_codec,xml_doctype}.cc
-//     platform/plist_value.cc -lexpat -o plist_fuzz
+//   parts=(plist_{binary_reader,builder,json,scalar_text,xml_reader,xml_writer} property_list_codec)
+//   parts+=(base64 utf8 xml_doctype ../number_text ../plist_value)
+//   flags="-std=c++20 -g -O1 -fsanitize=fuzzer,address,undefined -I."
+//   clang++ $flags fuzz/plist_fuzz.cc $(printf 'platform/linux/%s.cc ' ${parts[@]}) -lexpat -o plist_fuzz
 //   ./plist_fuzz -max_len=4096 CORPUS
 #include <cstddef>
 #include <cstdint>

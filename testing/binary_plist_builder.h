@@ -46,9 +46,11 @@ class BinaryPlistBuilder {
     return bigEndian(kind << 4 | 15U, 1) + "\x12" + bigEndian(length, 4);
   }
   static std::string integer(std::int64_t value) {
-    return "\x13" + bigEndian(static_cast<std::uint64_t>(value), 8);
+    return std::string("\x13").append(bigEndian(static_cast<std::uint64_t>(value), 8));
   }
-  static std::string real(double value) { return "\x23" + bigEndian(std::bit_cast<std::uint64_t>(value), 8); }
+  static std::string real(double value) {
+    return std::string("\x23").append(bigEndian(std::bit_cast<std::uint64_t>(value), 8));
+  }
   static std::string ascii(std::string_view text) { return marker(5, text.size()).append(text); }
   static std::string array(const std::vector<std::size_t>& references) {
     return marker(10, references.size()) + encoded(references);

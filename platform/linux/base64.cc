@@ -15,7 +15,9 @@ constexpr std::uint8_t kSpace = 64, kPadding = 65, kOther = 66;
 constexpr auto kSextets = [] {
   std::array<std::uint8_t, 256> table{};
   table.fill(kOther);
-  for (std::uint8_t i = 0; i < kAlphabet.size(); ++i) table[static_cast<unsigned char>(kAlphabet[i])] = i;
+  for (std::size_t i = 0; i < kAlphabet.size(); ++i) {
+    table[static_cast<unsigned char>(kAlphabet[i])] = static_cast<std::uint8_t>(i);
+  }
   for (const char space : {' ', '\t', '\n', '\r'}) table[static_cast<unsigned char>(space)] = kSpace;
   table['='] = kPadding;
   return table;

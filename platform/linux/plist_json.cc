@@ -93,7 +93,7 @@ void JsonWriter::writeText(std::string_view text) {
 
 void JsonWriter::writeNumber(const PlistNumber& number) {
   if (!number.isReal()) {
-    std::array<char, 24> digits;
+    std::array<char, 24> digits{};
     out_.append(digits.data(),
                 std::to_chars(digits.data(), digits.data() + digits.size(), number.toInt64()).ptr);
     return;

@@ -175,7 +175,7 @@ std::optional<PlistNumber> realOfText(std::string_view text, int bits) {
 
 std::string exactDateText(PlistDate date) {
   if (!isInLastSecond(date.secondsSinceReference)) return dateText(date, DateFraction::Keep);
-  std::array<char, 1100> buffer;  // room for the smallest double with all its zeros
+  std::array<char, 1100> buffer{};  // room for the smallest double with all its zeros
   const auto end = std::to_chars(buffer.data(), buffer.data() + buffer.size(), -date.secondsSinceReference,
                                  std::chars_format::fixed)
                        .ptr;

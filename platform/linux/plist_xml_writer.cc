@@ -182,7 +182,7 @@ void XmlWriter::writeInteger(const PlistNumber& number) {
   out_ += !exact_ || number.kind() == NumberKind::SInt64 ? "<integer>"
           : number.kind() == NumberKind::SInt32          ? "<integer bits=\"32\">"
                                                          : "<integer bits=\"8\">";
-  std::array<char, 24> digits;
+  std::array<char, 24> digits{};
   out_.append(digits.data(),
               std::to_chars(digits.data(), digits.data() + digits.size(), number.toInt64()).ptr);
   out_ += "</integer>\n";

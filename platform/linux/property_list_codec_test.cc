@@ -27,6 +27,7 @@ INSTANTIATE_TYPED_TEST_SUITE_P(Linux, PropertyListCodecContract, LinuxCodecSubje
 
 namespace {
 
+using namespace std::string_literals;
 using ::testing::AllOf;
 using ::testing::HasSubstr;
 using ::testing::StartsWith;
@@ -205,7 +206,7 @@ TEST(PropertyListCodec, RefusesEveryOtherEncodingOfText) {
     bigEndian.append(1, '\0').append(1, c);
   }
   for (const std::string& text :
-       {littleEndian, bigEndian, "\xFF\xFE" + littleEndian, "\xFE\xFF" + bigEndian,
+       {littleEndian, bigEndian, "\xFF\xFE"s + littleEndian, "\xFE\xFF"s + bigEndian,
         std::string("<?xml version='1.0' encoding='ISO-8859-1'?><plist><true/></plist>")}) {
     EXPECT_THAT(parse(text).error, HasSubstr("UTF-8"));
   }
@@ -234,7 +235,6 @@ TEST(PropertyListCodec, NestingEndsAt512LevelsInEveryDirection) {
 }
 
 TEST(PropertyListCodec, ReadsEveryBinaryKind) {
-  using namespace std::string_literals;
   const std::pair<std::string, PlistValue> cases[] = {
       {"\x08", PlistValue::boolean(false)},
       {"\x09", PlistValue::boolean(true)},
@@ -242,8 +242,8 @@ TEST(PropertyListCodec, ReadsEveryBinaryKind) {
       {"\x11\xFF\xFE", PlistValue::int64(65534)},
       {"\x12\xFF\xFF\xFF\xFF", PlistValue::int64(4294967295)},
       {Builder::integer(-2), PlistValue::int64(-2)},
-      {"\x14" + std::string(15, '\0') + "\x07", PlistValue::int64(7)},
-      {"\x14" + std::string(16, '\xFF'), PlistValue::int64(-1)},
+      {"\x14"s + std::string(15, '\0') + "\x07", PlistValue::int64(7)},
+      {"\x14"s + std::string(16, '\xFF'), PlistValue::int64(-1)},
       {"\x22\x3F\xC0\0\0"s, PlistValue::float32(1.5F)},
       {Builder::real(-0.1), PlistValue::float64(-0.1)},
       {"\x33\x41\xC8\0\0\0\0\0\0"s, PlistValue(PlistDate{805306368})},
@@ -268,8 +268,7 @@ TEST(PropertyListCodec, ReadsEveryBinaryKind) {
 }
 
 TEST(PropertyListCodec, FaultsOfTheBinaryEncodingAreErrorsWithTheirPlace) {
-  using namespace std::string_literals;
-  const std::string huge = "\x13\x7F" + std::string(7, '\xFF');
+  const std::string huge = "\x13\x7F"s + std::string(7, '\xFF');
   const std::string longInteger = "\x14"s + std::string(8, '\0') + std::string(8, '\xFF');
   const std::pair<const char*, std::vector<std::string>> cases[] = {
       {"unknown marker", {"\0"s, "\x0F"s, "\x15"s + std::string(32, '\0'), "\x21\0\0"s}},
@@ -353,7 +352,7 @@ TEST(PropertyListCodec, DamagedListsNeverBringItDown) {
   builder.add(Builder::array({5, 6, 7, 5}));
   builder.add(Builder::integer(-3));
   builder.add(Builder::real(2.5));
-  builder.add("\x33" + Builder::real(8e8).substr(1));
+  builder.add("\x33"s + Builder::real(8e8).substr(1));
   const std::string originals[] = {codec.write(everything()).bytes, builder.build()};
   ASSERT_EQ(parse(originals[1]).error, "");
   std::mt19937 random(20260101);
