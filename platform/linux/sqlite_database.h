@@ -1,0 +1,111 @@
+// SQLite behind owning types: a connection, a prepared statement, and the time for which a statement runs.
+//
+// Result codes are SQLite's own (SQLITE_OK is 0), with the extended bits dropped. Not for several threads at
+// once.
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <filesystem>
+#include <memory>
+#include <string>
+#include <string_view>
+
+struct sqlite3;
+struct sqlite3_stmt;
+
+namespace tbdaily {
+
+class SqliteStatement {
+ public:
+  SqliteStatement() = default;
+  explicit SqliteStatement(sqlite3_stmt* statement) : statement_(statement) {}
+
+  explicit operator bool() const { return statement_ != nullptr; }
+
+  // Parameters count from 1, columns from 0. A bound text is borrowed until the statement is reset.
+  void bind(int parameter, std::int64_t value);
+  void bind(int parameter, double value);  // not a number is bound as NULL
+  void bind(int parameter, std::string_view text);
+  // Binds an empty blob, which is greater than every text.
+  void bindAboveEveryText(int parameter);
+
+  // SQLITE_ROW, SQLITE_DONE, or what went wrong. A statement that could not be prepared answers
+  // SQLITE_MISUSE.
+  int step();
+  void reset();
+
+  bool isInteger(int column) const;
+  bool isNumber(int column) const;  // an integer or a real
+  std::int64_t integer(int column) const;
+  double real(int column) const;
+  // Borrowed until the next step or reset.
+  std::string_view text(int column) const;
+
+ private:
+  struct Finalizer {
+    void operator()(sqlite3_stmt* statement) const;
+  };
+  std::unique_ptr<sqlite3_stmt, Finalizer> statement_;
+};
+
+// Resets a statement at the end of a block, so that it holds no lock and no borrowed text afterwards.
+class StatementRun {
+ public:
+  explicit StatementRun(SqliteStatement& statement) : statement_(statement) {}
+  ~StatementRun() { statement_.reset(); }
+  StatementRun(const StatementRun&) = delete;
+  StatementRun& operator=(const StatementRun&) = delete;
+
+ private:
+  SqliteStatement& statement_;
+};
+
+enum class SqliteMode {
+  ReadWrite,
+  ReadOnly,
+  // Takes no lock, looks at no log and makes no file: for a file that nobody changes meanwhile.
+  Immutable,
+};
+
+class SqliteDatabase {
+ public:
+  SqliteDatabase() = default;
+
+  // Opens a file that exists. What its schema holds is not trusted: no triggers, no views, no unsafe
+  // functions.
+  int open(const std::filesystem::path& file, SqliteMode mode, std::chrono::milliseconds busyTimeout);
+  // Closing then leaves the write-ahead log as it is.
+  void keepLogOnClose();
+  void close() { connection_.reset(); }
+
+  bool isOpen() const { return connection_ != nullptr; }
+  // Whether a statement outside of a transaction would commit by itself.
+  bool isOutsideTransaction() const;
+  // Whether the path leads to another file than the one that is open.
+  bool hasMoved() const;
+  std::int64_t changedRows() const;  // by the last statement
+
+  int execute(const char* sql);
+  SqliteStatement prepare(std::string_view sql);
+  // The first column of the first row.
+  int queryInteger(std::string_view sql, std::int64_t& value);
+  int queryText(std::string_view sql, std::string& value);
+  // Writes the log back into the file and truncates it. `complete` is false when a reader kept that from
+  // happening in full.
+  int truncateLog(bool& complete);
+
+  std::filesystem::path logFile() const;
+
+  // The outcome and the reason of the last failed operation, the system's reason included.
+  int errorCode() const;
+  std::string errorMessage() const;
+
+ private:
+  struct Closer {
+    void operator()(sqlite3* connection) const;
+  };
+  std::unique_ptr<sqlite3, Closer> connection_;
+};
+
+}  // namespace tbdaily
