@@ -1,4 +1,5 @@
-// The one door through which bytes from drivers, kernels and files become numbers: bounds-checked, little-endian.
+// The one door through which bytes from drivers, kernels and files become numbers: bounds-checked,
+// little-endian.
 #pragma once
 
 #include <concepts>
@@ -18,7 +19,8 @@ class ByteReader {
   std::optional<T> at(std::size_t offset) const {
     if (offset > bytes_.size() || bytes_.size() - offset < sizeof(T)) return std::nullopt;
     std::uint64_t value = 0;
-    for (std::size_t i = sizeof(T); i-- > 0;) value = value << 8 | std::to_integer<std::uint64_t>(bytes_[offset + i]);
+    for (std::size_t i = sizeof(T); i-- > 0;)
+      value = value << 8 | std::to_integer<std::uint64_t>(bytes_[offset + i]);
     return static_cast<T>(value);
   }
 

@@ -126,6 +126,12 @@ PlistDictionary::PlistDictionary(std::initializer_list<Entry> entries) {
   for (const Entry& entry : entries) set(entry.first, entry.second);
 }
 
+namespace {
+std::uint32_t hashOf(std::string_view key) {
+  return static_cast<std::uint32_t>(std::hash<std::string_view>{}(key));
+}
+}  // namespace
+
 std::size_t PlistDictionary::indexOf(std::string_view key) const {
   if (slots_.empty()) {
     for (std::size_t i = 0; i < entries_.size(); ++i) {
@@ -134,19 +140,20 @@ std::size_t PlistDictionary::indexOf(std::string_view key) const {
     return kNoEntry;
   }
   const std::size_t mask = slots_.size() - 1;
-  for (std::size_t slot = std::hash<std::string_view>{}(key)&mask; slots_[slot] != 0;
-       slot = (slot + 1) & mask) {
-    const std::size_t entry = slots_[slot] - 1;
-    if (entries_[entry].first == key) return entry;
+  const std::uint32_t hash = hashOf(key);
+  for (std::size_t slot = hash & mask; slots_[slot].entry != 0; slot = (slot + 1) & mask) {
+    const std::size_t entry = slots_[slot].entry - 1;
+    if (slots_[slot].hash == hash && entries_[entry].first == key) return entry;
   }
   return kNoEntry;
 }
 
 void PlistDictionary::insertIntoIndex(std::size_t entry) {
   const std::size_t mask = slots_.size() - 1;
-  std::size_t slot = std::hash<std::string_view>{}(entries_[entry].first) & mask;
-  while (slots_[slot] != 0) slot = (slot + 1) & mask;
-  slots_[slot] = static_cast<std::uint32_t>(entry + 1);
+  const std::uint32_t hash = hashOf(entries_[entry].first);
+  std::size_t slot = hash & mask;
+  while (slots_[slot].entry != 0) slot = (slot + 1) & mask;
+  slots_[slot] = {hash, static_cast<std::uint32_t>(entry + 1)};
 }
 
 void PlistDictionary::rebuildIndex() {

@@ -158,8 +158,11 @@ class PlistDictionary {
   void rebuildIndex();
 
   std::vector<Entry> entries_;
-  std::vector<std::uint32_t>
-      slots_;  // open addressing over entries_: entry number plus 1, 0 is free; a power of two long
+  struct Slot {
+    std::uint32_t hash = 0;   // tells most other keys apart without a look at them
+    std::uint32_t entry = 0;  // number plus 1; 0 is free
+  };
+  std::vector<Slot> slots_;  // open addressing over entries_; a power of two long
 };
 
 }  // namespace tbdaily

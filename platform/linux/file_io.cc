@@ -119,7 +119,6 @@ int TemporaryFile::placeNew(const fs::path& place) {
 }
 
 int replaceFile(const fs::path& place, std::string_view contents) {
-  if (const int error = makeFolders(place.parent_path()); error != 0) return error;
   TemporaryFile file;
   if (const int error = file.create(place.parent_path()); error != 0) return error;
   if (const int error = writeAll(file.fd(), contents); error != 0) return error;

@@ -94,7 +94,7 @@ class TemporaryFile {
   std::filesystem::path path_;
 };
 
-// Replaces the file by one with these contents, atomically; makes its folder where that is missing.
+// Replaces the file by one with these contents, atomically. Its folder must be there.
 int replaceFile(const std::filesystem::path& place, std::string_view contents);
 
 // An exclusive lock between processes on a file of its own, held until destruction. Waits 5 seconds for

@@ -1,11 +1,13 @@
 #include "platform/linux/host.h"
 
 #include <errno.h>  // program_invocation_short_name
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cstdlib>
-#include <cstring>
 #include <utility>
+
+#include "platform/linux/file_io.h"
 
 namespace tbdaily {
 
@@ -14,6 +16,14 @@ namespace fs = std::filesystem;
 namespace {
 fs::path below(const fs::path& base, std::string_view absolutePath) {
   return base / (fs::path("/") / absolutePath).lexically_normal().relative_path();
+}
+
+// Of the failures to write that this process met.
+bool isFirstOfKind(int error) {
+  static std::mutex mutex;
+  static std::set<int> kinds;
+  const std::lock_guard lock(mutex);
+  return kinds.insert(error).second;
 }
 }  // namespace
 
@@ -50,13 +60,17 @@ void Host::noteOnce(const std::string& line) {
   [[maybe_unused]] const ssize_t count = ::write(STDERR_FILENO, text.data(), text.size());
 }
 
+int Host::makeFolders(const fs::path& folder) const {
+  struct stat status {};
+  const int error = ::stat(root_.c_str(), &status) != 0 ? errno : S_ISDIR(status.st_mode) ? 0 : ENOTDIR;
+  if (error == 0) return tbdaily::makeFolders(folder);
+  if (isFirstOfKind(error))
+    noteOnce("the device root " + root_.native() + " cannot be used: " + errorText(error));
+  return error;
+}
+
 void Host::noteWriteFailure(const fs::path& path, int error) {
-  static std::mutex mutex;
-  static std::set<int> kinds;
-  {
-    const std::lock_guard lock(mutex);
-    if (!kinds.insert(error).second) return;
-  }
+  if (!isFirstOfKind(error)) return;
   noteOnce("cannot write " + path.native() + ": " + errorText(error));
 }
 

@@ -26,6 +26,10 @@ class Host {
   // The place of a live source given by its absolute path.
   std::filesystem::path livePath(std::string_view absolutePath) const;
 
+  // Makes a folder below the root and its missing parents, mode 0700; never the root itself. 0 or an errno
+  // value.
+  int makeFolders(const std::filesystem::path& folder) const;
+
   // One line on standard error, prefixed by the program's name. The same line is written once in the life of
   // a process.
   static void noteOnce(const std::string& line);

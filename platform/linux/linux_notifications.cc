@@ -22,7 +22,8 @@ std::uint64_t LinuxNotifications::postCount(std::string_view name) const {
 void LinuxNotifications::post(std::string_view name) {
   if (!isSafeName(name))
     return Host::noteOnce("notification \"" + std::string(name.substr(0, 40)) + "\" is refused: bad name");
-  if (const int error = makeFolders(folder()); error != 0) return Host::noteWriteFailure(folder(), error);
+  if (const int error = host_.makeFolders(folder()); error != 0)
+    return Host::noteWriteFailure(folder(), error);
   const std::filesystem::path lockFile = folder().parent_path() / "notifications.lock";
   FileLock lock;
   if (const int error = lock.acquire(lockFile); error != 0) return Host::noteWriteFailure(lockFile, error);

@@ -106,7 +106,8 @@ void LinuxPreferences::setValue(std::string_view key, const PlistValue& value, s
   if (!acceptsDomain(name)) return;
   const fs::path lockFile = file(name).native() + ".lock";
   if (value.isNone() && !fileIdentity(file(name))) return;  // nothing to remove, nothing to make
-  if (const int error = makeFolders(folder()); error != 0) return Host::noteWriteFailure(folder(), error);
+  if (const int error = host_.makeFolders(folder()); error != 0)
+    return Host::noteWriteFailure(folder(), error);
   FileLock lock;
   if (const int error = lock.acquire(lockFile); error != 0) return Host::noteWriteFailure(lockFile, error);
 

@@ -72,7 +72,7 @@ ServiceConnection LinuxServiceListener::createListener(std::string_view endpoint
                    (error == EADDRINUSE ? "another job is listening there" : errorText(error)));
     return 0;
   };
-  if (const int error = makeFolders(path.parent_path()); error != 0) {
+  if (const int error = host_.makeFolders(path.parent_path()); error != 0) {
     Host::noteWriteFailure(path.parent_path(), error);
     return 0;
   }

@@ -93,7 +93,7 @@ void LinuxSystemLog::append(const std::string& lines) {
   }
   const std::filesystem::path place = host_.devicePath("/var/log/tbdaily.log");
   if (!file_.isOpen()) {
-    if (const int error = makeFolders(place.parent_path()); error != 0) {
+    if (const int error = host_.makeFolders(place.parent_path()); error != 0) {
       return Host::noteWriteFailure(place.parent_path(), error);
     }
     file_ = FileDescriptor(

@@ -71,11 +71,6 @@ void removeRemains(const fs::path& folder) {
   }
 }
 
-int lockSpool(const fs::path& folder, FileLock& lock) {
-  if (const int error = makeFolders(folder); error != 0) return error;
-  return lock.acquire(folder / ".lock");
-}
-
 // Puts both files in place under the first free number. The log comes last: who sees it finds its meta file.
 int placePair(const fs::path& stem, std::string_view type, TemporaryFile& meta, TemporaryFile& log) {
   for (unsigned n = 0; n < kMaximumNumber; ++n) {
@@ -104,6 +99,11 @@ std::string spoolStamp(PlistDate now) {
   return dayText(now) + clock.data();
 }
 
+int LogSpool::lockSpool(FileLock& lock) const {
+  if (const int error = host_.makeFolders(folder()); error != 0) return error;
+  return lock.acquire(folder() / ".lock");
+}
+
 bool LogSpool::writePending(std::string_view type, std::string_view name, const PlistValue& options,
                             PlistDate now, const LogWriter& writer) {
   if (!isSafeName(type) || !isSafeName(name)) return false;
@@ -120,8 +120,8 @@ bool LogSpool::writePending(std::string_view type, std::string_view name, const 
 
   FileLock lock;
   TemporaryFile logFile, metaFile;
-  int error = lockSpool(folder(), lock);
-  if (error == 0) error = makeFolders(pending());
+  int error = lockSpool(lock);
+  if (error == 0) error = host_.makeFolders(pending());
   if (error == 0) removeRemains(pending());
   if (error == 0) error = metaFile.create(pending());
   if (error == 0) error = writeAll(metaFile.fd(), meta.bytes);
@@ -145,8 +145,8 @@ void LogSpool::appendStructured(int type, const PlistDictionary& data, PlistDate
   const std::string line = "{\"time\": \"" + millisecondStamp(now) +
                            "\", \"data\": " + jsonText(PlistValue::dictionary(data)) + "}\n";
   FileLock lock;
-  int error = lockSpool(folder(), lock);
-  if (error == 0) error = makeFolders(place.parent_path());
+  int error = lockSpool(lock);
+  if (error == 0) error = host_.makeFolders(place.parent_path());
   if (error == 0) {
     const FileDescriptor fd(
         ::open(place.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0600));
@@ -160,14 +160,13 @@ void LogSpool::dumpOldStructured(PlistDate now) {
   std::error_code ignored;
   if (!fs::is_directory(structured, ignored)) return;
   FileLock lock;
-  if (const int error = lockSpool(folder(), lock); error != 0)
-    return Host::noteWriteFailure(structured, error);
+  if (const int error = lockSpool(lock); error != 0) return Host::noteWriteFailure(structured, error);
   const std::string today = dayText(now);
   for (const fs::path& typeFolder : filesIn(structured)) {
     for (const fs::path& file : filesIn(typeFolder)) {
       const std::string day = file.stem().native();
       if (file.extension() != ".jsonl" || day.size() != today.size() || day >= today) continue;
-      if (const int error = makeFolders(pending()); error != 0)
+      if (const int error = host_.makeFolders(pending()); error != 0)
         return Host::noteWriteFailure(pending(), error);
       const std::string stem = "structured-" + typeFolder.filename().native() + "-" + day;
       fs::path place = pending() / (stem + ".jsonl");
@@ -183,11 +182,11 @@ void LogSpool::submitPending(PlistDate now) {
   std::error_code ignored;
   if (!fs::is_directory(pending(), ignored)) return;
   FileLock lock;
-  if (const int error = lockSpool(folder(), lock); error != 0)
-    return Host::noteWriteFailure(pending(), error);
+  if (const int error = lockSpool(lock); error != 0) return Host::noteWriteFailure(pending(), error);
   removeRemains(pending());
   if (fs::is_empty(pending(), ignored)) return;
-  if (const int error = makeFolders(outbox()); error != 0) return Host::noteWriteFailure(outbox(), error);
+  if (const int error = host_.makeFolders(outbox()); error != 0)
+    return Host::noteWriteFailure(outbox(), error);
 
   // The folder itself moves, so that a submission is never half handed over.
   fs::path place;
@@ -196,7 +195,7 @@ void LogSpool::submitPending(PlistDate now) {
     if (!fs::exists(fs::symlink_status(place, ignored))) break;
   }
   if (::rename(pending().c_str(), place.c_str()) != 0) return Host::noteWriteFailure(place, errno);
-  if (const int error = makeFolders(pending()); error != 0) Host::noteWriteFailure(pending(), error);
+  if (const int error = host_.makeFolders(pending()); error != 0) Host::noteWriteFailure(pending(), error);
   syncFolder(outbox());
 }
 

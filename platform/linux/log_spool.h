@@ -7,6 +7,7 @@
 #include <string>
 #include <string_view>
 
+#include "platform/linux/file_io.h"
 #include "platform/linux/host.h"
 #include "platform/log_submission.h"
 #include "platform/property_list_codec.h"
@@ -39,6 +40,8 @@ class LogSpool {
   std::filesystem::path outbox() const { return folder() / "Outbox"; }
 
  private:
+  int lockSpool(FileLock& lock) const;
+
   const Host& host_;
   PropertyListCodec& codec_;
 };

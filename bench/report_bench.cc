@@ -1,0 +1,146 @@
+// Whitelist look-up, scalar rounding, distribution reduction, and a whole run over a store on disk.
+
+#include <benchmark/benchmark.h>
+
+#include <cmath>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "driver/environment_probes.h"
+#include "platform/linux/analytics_history.h"
+#include "platform/linux/analytics_store.h"
+#include "platform/linux/property_list_codec.h"
+#include "report/distribution_summary.h"
+#include "report/internal_device.h"
+#include "report/prefix_index.h"
+#include "report/scalar_rounding.h"
+#include "report/tb_report.h"
+#include "testing/fake_platform.h"
+#include "testing/temporary_folder.h"
+
+namespace tbdaily {
+namespace {
+
+constexpr DayNumber kDay = 20780;
+
+// The cost of a look-up must depend on the key, not on how many prefixes there are.
+void firstMatchingPrefix(benchmark::State& state) {
+  std::vector<std::string> texts;
+  for (std::int64_t i = 0; i < state.range(0); ++i)
+    texts.push_back("com.velmora.domain" + std::to_string(i) + ".metric.");
+  const PrefixIndex index({texts.begin(), texts.end()});
+  std::vector<std::string> keys;
+  for (int i = 0; i < 64; ++i) {
+    keys.push_back(texts[static_cast<std::size_t>(i) * 7919 % texts.size()] + "value");
+    keys.push_back("com.velmora.other" + std::to_string(i));
+  }
+  std::size_t next = 0;
+  for (auto _ : state) benchmark::DoNotOptimize(index.firstMatch(keys[next++ % keys.size()]));
+}
+BENCHMARK(firstMatchingPrefix)->RangeMultiplier(10)->Range(10, 1000000);
+
+// What the index is for: the same keys, prefix by prefix.
+void firstMatchingPrefixByScan(benchmark::State& state) {
+  std::vector<std::string> texts;
+  for (std::int64_t i = 0; i < state.range(0); ++i)
+    texts.push_back("com.velmora.domain" + std::to_string(i) + ".metric.");
+  const std::string key = texts.back() + "value";
+  for (auto _ : state) {
+    std::size_t found = 0;
+    while (found < texts.size() && !key.starts_with(texts[found])) ++found;
+    benchmark::DoNotOptimize(found);
+  }
+}
+BENCHMARK(firstMatchingPrefixByScan)->RangeMultiplier(10)->Range(10, 100000);
+
+void roundScalar(benchmark::State& state) {
+  const PlistDictionary options{{"bucket_interval", PlistValue::int64(1024)},
+                                {"sig_fig", PlistValue::int64(2)}};
+  std::int64_t value = 123456789;
+  for (auto _ : state) benchmark::DoNotOptimize(roundedScalar(value++, options));
+}
+BENCHMARK(roundScalar);
+
+void reduceDistribution(benchmark::State& state) {
+  const std::vector<double> boundaries = {5, 10, 25, 50, 100, 250, 1000};
+  std::vector<double> values;
+  for (int i = 0; i < 100000; ++i) values.push_back(std::fmod(i * 37.7, 1200));
+  for (auto _ : state) {
+    DistributionSummary summary;
+    std::vector<std::uint64_t> counts(boundaries.size() + 1);
+    for (const double value : values) {
+      summary.add(value);
+      ++counts[determineHistBucketForValueWithIntervals(value, boundaries)];
+    }
+    benchmark::DoNotOptimize(counts.data());
+    benchmark::DoNotOptimize(summary.statistics());
+  }
+  state.SetItemsProcessed(static_cast<std::int64_t>(values.size()) * state.iterations());
+}
+BENCHMARK(reduceDistribution);
+
+void fillStore(AnalyticsStore& store, std::int64_t scalars, std::int64_t values) {
+  store.beginLoad();
+  for (std::int64_t i = 0; i < scalars; ++i) store.setScalar("scalar." + std::to_string(i), kDay, i * 7919);
+  constexpr std::int64_t kDistributions = 200;
+  std::vector<double> row(static_cast<std::size_t>(values / kDistributions));
+  for (std::size_t i = 0; i < row.size(); ++i) row[i] = std::fmod(static_cast<double>(i) * 37.7, 1200);
+  for (std::int64_t d = 0; d < kDistributions; ++d) {
+    store.appendDistributionValues("distribution." + std::to_string(d), kDay, 0, row);
+  }
+  store.commitLoad();
+}
+
+// From the store on disk to the serialized report; the arguments are the numbers of scalars and of
+// distribution values.
+void writeWholeReport(benchmark::State& state) {
+  const testing::TemporaryFolder folder;
+  const std::filesystem::path file = folder.path() / "store";
+  {
+    AnalyticsStore store(file);
+    fillStore(store, state.range(0), state.range(1));
+  }
+  testing::FakePlatform fake;
+  LinuxPropertyListCodec codec;
+  LinuxAnalyticsHistory history([&file] { return std::optional(file); });
+  const PlistValue scalarOptions = PlistValue::dictionary({{"sig_fig", PlistValue::int64(2)}});
+  const PlistValue distributionOptions = PlistValue::dictionary(
+      {{"intervals",
+        PlistValue::array({PlistValue::int64(10), PlistValue::int64(100), PlistValue::int64(1000)})}});
+  const auto group = PlistValue::dictionary(
+      {{"ScalarKeyPrefixes", PlistValue::dictionary({{"scalar.", scalarOptions}})},
+       {"DistributionKeyPrefixes", PlistValue::dictionary({{"distribution.", distributionOptions}})}});
+  const PlistWriteResult whitelist = codec.write(PlistValue::dictionary({{"All", group}}));
+  const auto bytes = std::as_bytes(std::span(whitelist.bytes));
+  fake.fileSystem.files[std::string(kWhitelistPath)] = {bytes.begin(), bytes.end()};
+  Platform platform{fake.driverRegistry,
+                    fake.preferences,
+                    fake.deviceAnswers,
+                    fake.logSubmission,
+                    fake.analyticsClient,
+                    history,
+                    codec,
+                    fake.stackSnapshot,
+                    fake.usageService,
+                    fake.appRegistry,
+                    fake.localeSettings,
+                    fake.serviceListener,
+                    fake.notifications,
+                    fake.systemLog,
+                    fake.kernel,
+                    fake.fileSystem,
+                    fake.dynamicLoader,
+                    fake.messageDigest};
+  for (auto _ : state) {
+    fake.logSubmission.logs.clear();
+    fake.systemLog.lines.clear();
+    TBReport(platform).writeLogForYesterdayWithAppInfo(kDay, PlistValue());
+  }
+  if (fake.logSubmission.logs.empty()) state.SkipWithError("no report was written");
+  state.SetItemsProcessed((state.range(0) + state.range(1)) * state.iterations());
+}
+BENCHMARK(writeWholeReport)->Args({20000, 200000})->Args({200000, 2000000})->Unit(benchmark::kMillisecond);
+
+}  // namespace
+}  // namespace tbdaily

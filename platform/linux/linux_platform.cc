@@ -1,0 +1,68 @@
+#include "platform/linux/linux_platform.h"
+
+#include <utility>
+
+#include "platform/driver_registry.h"
+#include "platform/linux/analytics_history.h"
+#include "platform/linux/analytics_home.h"
+#include "platform/linux/linux_analytics_client.h"
+#include "platform/linux/linux_app_registry.h"
+#include "platform/linux/linux_device_answers.h"
+#include "platform/linux/linux_file_system.h"
+#include "platform/linux/linux_kernel.h"
+#include "platform/linux/linux_locale_settings.h"
+#include "platform/linux/linux_log_submission.h"
+#include "platform/linux/linux_notifications.h"
+#include "platform/linux/linux_preferences.h"
+#include "platform/linux/linux_service_listener.h"
+#include "platform/linux/linux_system_log.h"
+#include "platform/linux/property_list_codec.h"
+#include "platform/linux/recordings.h"
+#include "platform/stack_snapshot.h"
+#include "platform/usage_service.h"
+
+namespace tbdaily {
+
+// In the order in which each needs those above it.
+struct LinuxPlatform::Families {
+  explicit Families(Host h) : host(std::move(h)) {}
+
+  const Host host;
+  LinuxPropertyListCodec codec;
+  Recordings recordings{host, codec};
+  LinuxKernel kernel{host, recordings};
+  LinuxDeviceAnswers deviceAnswers{host, recordings};
+  LinuxFileSystem fileSystem{host};
+  LinuxPreferences preferences{host, codec};
+  LinuxLogSubmission logSubmission{host, recordings, codec, preferences, kernel};
+  AnalyticsStoreLocator storeLocator = analyticsStoreLocator(host, deviceAnswers, fileSystem);
+  LinuxAnalyticsClient analyticsClient{storeLocator, kernel};
+  LinuxAnalyticsHistory analyticsHistory{storeLocator};
+  LinuxAppRegistry appRegistry{host, recordings};
+  LinuxLocaleSettings localeSettings{host, recordings};
+  LinuxServiceListener serviceListener{host, codec};
+  LinuxNotifications notifications{host};
+  LinuxSystemLog systemLog{host, kernel, deviceAnswers};
+  LinuxDynamicLoader dynamicLoader{host};
+  LinuxMessageDigest messageDigest;
+  AbsentDriverRegistry driverRegistry;
+  AbsentStackSnapshot stackSnapshot;
+  AbsentUsageService usageService;
+
+  Platform services{driverRegistry,   preferences,     deviceAnswers, logSubmission, analyticsClient,
+                    analyticsHistory, codec,           stackSnapshot, usageService,  appRegistry,
+                    localeSettings,   serviceListener, notifications, systemLog,     kernel,
+                    fileSystem,       dynamicLoader,   messageDigest};
+};
+
+LinuxPlatform::LinuxPlatform(Host host) : families_(std::make_unique<Families>(std::move(host))) {}
+LinuxPlatform::~LinuxPlatform() = default;
+
+const Host& LinuxPlatform::host() const {
+  return families_->host;
+}
+Platform& LinuxPlatform::services() {
+  return families_->services;
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,129 @@
+"""A device root of its own for one test, and the real programs that work on it."""
+
+import datetime
+import json
+import os
+import pathlib
+import plistlib
+import shutil
+import sqlite3
+import subprocess
+import tempfile
+import time
+
+BIN = pathlib.Path(os.environ["TBDAILY_BIN"])
+EPOCH = datetime.datetime(1970, 1, 1)
+NOW = datetime.datetime(2026, 11, 24, 9, 7, 4)
+TODAY = (NOW - EPOCH).days
+YESTERDAY = TODAY - 1
+ENDPOINT = "com.velmora.tallyd.tbdaily"
+LOGGING = "com.velmora.tallyd.tbdaily.logging"
+
+
+class Device:
+    """Dependent on its recordings alone, unless `live`; the clock stands at NOW."""
+
+    def __init__(self, sample=False, live=False, name="root"):
+        self.base = pathlib.Path(tempfile.mkdtemp(prefix="tbdaily-e2e-"))
+        self.root = self.base / name
+        self.root.mkdir(parents=True)
+        self.env = dict(os.environ, TBDAILY_ROOT=str(self.root), TBDAILY_LIVE="1" if live else "0",
+                        TBDAILY_LOG_PRIVATE="show", ASAN_OPTIONS="detect_leaks=1:exitcode=99",
+                        UBSAN_OPTIONS="print_stacktrace=1")
+        self.record("clock", {"now": NOW, "ticks": 3600000000000, "numerator": 125, "denominator": 3})
+        if sample:
+            self.tally("init")
+
+    def close(self):
+        shutil.rmtree(self.base, ignore_errors=True)
+
+    def path(self, *parts):
+        return self.root.joinpath(*parts)
+
+    def write(self, relative, data):
+        place = self.path(relative)
+        place.parent.mkdir(parents=True, exist_ok=True)
+        place.write_bytes(data if isinstance(data, bytes) else plistlib.dumps(data, sort_keys=False))
+        return place
+
+    def record(self, name, value):
+        return self.write(f"System/Device/{name}.plist", value)
+
+    def whitelist(self, value):
+        return self.write("Library/Application Support/Tallybook/Whitelist_Nimbos.plist", value)
+
+    def preferences(self, domain, values=None):
+        relative = f"var/mobile/Library/Preferences/{domain}.plist"
+        if values is not None:
+            return self.write(relative, values)
+        place = self.path(relative)
+        return plistlib.loads(place.read_bytes()) if place.exists() else {}
+
+    def enable(self):
+        self.preferences("com.velmora.Crashferry", {"DiagnosticLogSubmissionEnabled": True})
+
+    def allow(self, **tables):
+        """Submission on, and one whitelist group with these tables."""
+        self.enable()
+        self.whitelist({"G": tables})
+
+    @property
+    def store_path(self):
+        return self.path("var/mobile/Library/Tallybook/TBDataStore.sqlitedb")
+
+    def store(self):
+        return sqlite3.connect(f"file:{self.store_path}?mode=ro", uri=True)
+
+    def run(self, *arguments, **options):
+        """The job; it must end with status 0 whatever happens."""
+        result = subprocess.run([BIN / "tbdaily", *arguments], env=dict(self.env, **options), capture_output=True, text=True,
+                                timeout=120)
+        assert result.returncode == 0, (result.returncode, result.stderr)
+        assert "runtime error" not in result.stderr and "Sanitizer" not in result.stderr, result.stderr
+        return result
+
+    def start(self):
+        """The job in listener mode, once its endpoint is there."""
+        job = subprocess.Popen([BIN / "tbdaily"], env=self.env, stderr=subprocess.PIPE, text=True)
+        self.wait_for(lambda: "tbdaily started" in self.log() and self.socket_path.exists())
+        return job
+
+    @staticmethod
+    def wait_for(condition, seconds=60):
+        deadline = time.monotonic() + seconds
+        while not condition():
+            assert time.monotonic() < deadline, "waited in vain"
+            time.sleep(0.02)
+
+    @property
+    def socket_path(self):
+        return self.path("var/run", ENDPOINT + ".sock")
+
+    def tally(self, *arguments, status=0, stdin=None):
+        result = subprocess.run([BIN / "tallyctl", *arguments], env=self.env, capture_output=True, text=True, input=stdin,
+                                timeout=120)
+        assert result.returncode == status, (arguments, result.returncode, result.stdout, result.stderr)
+        if status != 0:
+            assert len(result.stderr.splitlines()) == 1, result.stderr
+        return result.stdout if status == 0 else result.stderr
+
+    def tally_json(self, *arguments):
+        return json.loads(self.tally("--json", *arguments))
+
+    def log(self):
+        place = self.path("var/log/tbdaily.log")
+        return place.read_text(errors="replace") if place.exists() else ""
+
+    def messages(self):
+        """(level, message) of every log line."""
+        return [tuple(line.split("] ", 1)[1].split(": ", 1)) for line in self.log().splitlines() if "] " in line]
+
+    def pending(self, suffix=".193"):
+        return sorted(self.path("var/mobile/Library/Logs/Pending").glob("*" + suffix))
+
+    def reports(self):
+        return [plistlib.loads(place.read_bytes()) for place in self.pending()]
+
+    def snapshot(self):
+        """Every file of the root with its bytes."""
+        return {str(p.relative_to(self.root)): p.read_bytes() for p in self.root.rglob("*") if p.is_file()}

@@ -1,0 +1,132 @@
+#include "tools/tallyctl/terminal.h"
+
+#include <sys/ioctl.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <cstdio>
+#include <cstdlib>
+
+namespace tbdaily {
+
+namespace {
+
+std::string_view environment(const char* variable) {
+  const char* text = std::getenv(variable);
+  return text != nullptr ? text : "";
+}
+
+bool localeIsUtf8() {
+  for (const char* variable : {"LC_ALL", "LC_CTYPE", "LANG"}) {
+    const std::string_view locale = environment(variable);
+    if (locale.empty()) continue;
+    return locale.find("UTF-8") != std::string_view::npos || locale.find("utf8") != std::string_view::npos;
+  }
+  return false;
+}
+
+std::string repeated(std::string_view text, std::size_t count) {
+  std::string result;
+  for (std::size_t i = 0; i < count; ++i) result += text;
+  return result;
+}
+
+constexpr auto kFirstDraw = std::chrono::seconds(1);
+constexpr auto kRedraw = std::chrono::milliseconds(100);
+
+}  // namespace
+
+Terminal::Terminal() {
+  if (::isatty(STDOUT_FILENO) == 0) return;
+  const bool capable = environment("TERM") != "dumb" && !environment("TERM").empty();
+  colour_ = capable && environment("NO_COLOR").empty();
+  drawing_ = capable && localeIsUtf8();
+  winsize size{};
+  if (::ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col >= 40) width_ = size.ws_col;
+}
+
+void Terminal::print(std::string_view text) {
+  std::fwrite(text.data(), 1, text.size(), stdout);
+}
+
+void Terminal::line(std::string_view text) {
+  print(text);
+  print("\n");
+}
+
+std::string Terminal::styled(std::string_view text, Style style) const {
+  static constexpr std::array<std::string_view, 5> kCodes = {"", "\x1b[1m", "\x1b[2m", "\x1b[32m",
+                                                             "\x1b[31m"};
+  if (!colour_ || style == Style::Plain) return std::string(text);
+  return std::string(kCodes[static_cast<std::size_t>(style)]).append(text).append("\x1b[0m");
+}
+
+std::string Terminal::bar(double value, double maximum, std::size_t width) const {
+  if (!(value > 0) || !(maximum > 0)) return {};
+  const double share = std::min(value / maximum, 1.0) * static_cast<double>(width);
+  if (!drawing_)
+    return std::string(std::max<std::size_t>(static_cast<std::size_t>(std::lround(share)), 1), '#');
+  static constexpr std::array<std::string_view, 8> kEighths = {"", "▏", "▎", "▍", "▌", "▋", "▊", "▉"};
+  const auto eighths = std::max<std::size_t>(static_cast<std::size_t>(std::lround(share * 8)), 1);
+  return repeated("█", eighths / 8).append(kEighths[eighths % 8]);
+}
+
+std::string printable(std::string_view text) {
+  std::string result(text);
+  for (char& c : result) {
+    const auto byte = static_cast<unsigned char>(c);
+    if (byte < 0x20 || byte == 0x7f) c = '?';
+  }
+  return result;
+}
+
+std::size_t columnsOf(std::string_view text) {
+  return static_cast<std::size_t>(std::count_if(
+      text.begin(), text.end(), [](char c) { return (static_cast<unsigned char>(c) & 0xC0) != 0x80; }));
+}
+
+void Table::print(Terminal& out) const {
+  std::vector<std::size_t> widths(columns_.size(), 0);
+  for (const auto& row : rows_) {
+    for (std::size_t i = 0; i < row.size(); ++i) widths[i] = std::max(widths[i], columnsOf(row[i]));
+  }
+  for (const auto& row : rows_) {
+    std::string text = "  ";
+    for (std::size_t i = 0; i < row.size(); ++i) {
+      const std::string padding(widths[i] - columnsOf(row[i]), ' ');
+      text += columns_[i] == Align::Right ? padding + row[i] : row[i] + padding;
+      text += "  ";
+    }
+    text.erase(text.find_last_not_of(' ') + 1);
+    out.line(text);
+  }
+}
+
+Progress::Progress(std::string label, std::uint64_t total)
+    : label_(std::move(label)),
+      total_(total),
+      shown_(::isatty(STDERR_FILENO) != 0),
+      nextDraw_(std::chrono::steady_clock::now() + kFirstDraw) {}
+
+Progress::~Progress() {
+  if (drawn_) std::fputs("\r\x1b[K", stderr);
+}
+
+void Progress::at(std::uint64_t done) {
+  if (!shown_ || std::chrono::steady_clock::now() < nextDraw_) return;
+  nextDraw_ = std::chrono::steady_clock::now() + kRedraw;
+  drawn_ = true;
+  if (total_ == 0) {
+    std::fprintf(stderr, "\r%s: %llu MiB", label_.c_str(), static_cast<unsigned long long>(done >> 20));
+    return;
+  }
+  constexpr std::size_t kBarWidth = 30;
+  const auto filled = static_cast<std::size_t>(std::min(done, total_) * kBarWidth / total_);
+  std::fprintf(stderr, "\r%s [%s%s] %3llu %%", label_.c_str(), std::string(filled, '#').c_str(),
+               std::string(kBarWidth - filled, '.').c_str(),
+               static_cast<unsigned long long>(std::min(done, total_) * 100 / total_));
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,39 @@
+#include "tools/tallyctl/tool.h"
+
+#include <cstdio>
+#include <cstdlib>
+#include <limits>
+
+#include "platform/linux/plist_json.h"
+
+namespace tbdaily {
+
+PlistValue jsonNull() {
+  return PlistValue::float64(std::numeric_limits<double>::quiet_NaN());
+}
+
+LinuxPlatform& Tool::platform() {
+  if (!platform_) {
+    if (!options.root.empty()) ::setenv("TBDAILY_ROOT", options.root.c_str(), 1);
+    platform_ = std::make_unique<LinuxPlatform>(Host::fromEnvironment());
+  }
+  return *platform_;
+}
+
+bool Tool::namesRoot() const {
+  const char* root = std::getenv("TBDAILY_ROOT");
+  return !options.root.empty() || (root != nullptr && *root != '\0');
+}
+
+bool Tool::printedAsJson(const PlistValue& value) {
+  if (!options.json) return false;
+  out_.line(jsonText(value, JsonLayout::Indented));
+  return true;
+}
+
+void Tool::fail(std::string_view reason, int status) {
+  std::fprintf(stderr, "tallyctl: %.*s\n", static_cast<int>(reason.size()), reason.data());
+  exitStatus = status;
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,66 @@
+// What every subcommand of tallyctl has at hand: the platform over the device root, the way to print, the way
+// to fail.
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <string>
+#include <string_view>
+
+#include "platform/linux/linux_platform.h"
+#include "platform/plist_value.h"
+#include "tools/tallyctl/terminal.h"
+
+namespace CLI {
+class App;
+}
+
+namespace tbdaily {
+
+// Exit statuses of the program.
+enum ExitStatus : int { kDone = 0, kFailed = 1, kWrongUsage = 2 };
+
+// A value that prints as null. A dictionary cannot hold an absent value; a number that is not finite has no
+// other text in JSON.
+PlistValue jsonNull();
+
+class Tool {
+ public:
+  // What the common options say. An empty root means TBDAILY_ROOT, else "/".
+  struct Options {
+    std::string root;
+    bool json = false;
+  };
+
+  Options options;
+  int exitStatus = kDone;
+
+  // Made at the first call, when the options are known; `--root` then also stands in TBDAILY_ROOT, where the
+  // support library looks.
+  LinuxPlatform& platform();
+  // Whether the user named a root, by option or in the environment.
+  bool namesRoot() const;
+
+  Terminal& out() { return out_; }
+
+  // Prints the value as JSON when --json was given, and answers whether it did.
+  bool printedAsJson(const PlistValue& value);
+
+  // One line on standard error with the reason.
+  void fail(std::string_view reason, int status = kFailed);
+
+ private:
+  std::unique_ptr<LinuxPlatform> platform_;
+  Terminal out_;
+};
+
+// One function for each subcommand, in a file of its own; it declares the options and what runs.
+void addInitCommand(CLI::App& app, Tool& tool);
+void addRecordCommand(CLI::App& app, Tool& tool);
+void addSendCommand(CLI::App& app, Tool& tool);
+void addWaitCommand(CLI::App& app, Tool& tool);
+void addReportCommand(CLI::App& app, Tool& tool);
+void addWhitelistCommand(CLI::App& app, Tool& tool);
+void addPlistCommand(CLI::App& app, Tool& tool);
+
+}  // namespace tbdaily
