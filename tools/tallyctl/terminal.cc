@@ -48,7 +48,7 @@ Terminal::Terminal() {
 }
 
 void Terminal::print(std::string_view text) {
-  std::fwrite(text.data(), 1, text.size(), stdout);
+  if (!text.empty()) std::fwrite(text.data(), 1, text.size(), stdout);
 }
 
 void Terminal::line(std::string_view text) {
