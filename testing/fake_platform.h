@@ -1,11 +1,9 @@
 // A platform of fakes: `FakePlatform fake; RunDailyTasks(fake.platform, ...)`.
 #pragma once
 
-#include "platform/driver_registry.h"
 #include "platform/platform.h"
-#include "platform/stack_snapshot.h"
-#include "platform/usage_service.h"
 #include "testing/fake_analytics.h"
+#include "testing/fake_drivers.h"
 #include "testing/fake_log_submission.h"
 #include "testing/fake_property_list_codec.h"
 #include "testing/fake_services.h"
@@ -17,15 +15,15 @@ struct FakePlatform {
   FakePlatform(const FakePlatform&) = delete;
   FakePlatform& operator=(const FakePlatform&) = delete;
 
-  AbsentDriverRegistry driverRegistry;
+  FakeDriverRegistry driverRegistry;
   FakePreferences preferences;
   FakeDeviceAnswers deviceAnswers;
   FakeLogSubmission logSubmission;
   FakeAnalyticsClient analyticsClient;
   FakeAnalyticsHistory analyticsHistory;
   FakePropertyListCodec propertyListCodec;
-  AbsentStackSnapshot stackSnapshot;
-  AbsentUsageService usageService;
+  FakeStackSnapshot stackSnapshot;
+  FakeUsageService usageService;
   FakeAppRegistry appRegistry;
   FakeLocaleSettings localeSettings;
   FakeServiceListener serviceListener;

@@ -64,7 +64,8 @@ class FakeDeviceAnswers : public DeviceAnswers {
   std::optional<bool> multiUserMode() override { return multiUser; }
   SystemGroupContainer systemGroupContainerPath(std::string_view identifier) override {
     asked.emplace_back(identifier);
-    return {found(containers, identifier), 2};
+    const auto path = found(containers, identifier);
+    return {path, path ? 0U : 2U};
   }
 
   PlistDictionary answers;
@@ -188,7 +189,8 @@ class FakeSystemLog : public SystemLog {
   std::vector<std::string> lines;
 };
 
-// A listener whose events are scripted: each slice delivers the next step, and times out when none is left.
+// A listener whose events are scripted: each slice delivers the next step that is due, and times out when
+// there is none.
 class FakeServiceListener : public ServiceListener {
  public:
   ServiceConnection createListener(std::string_view endpointName, DeliveryQueue) override {
@@ -202,12 +204,16 @@ class FakeServiceListener : public ServiceListener {
   void resume(ServiceConnection connection) override { resumed.push_back(connection); }
   SliceResult runSlice(double seconds) override {
     sliceSeconds.push_back(seconds);
-    if (steps.empty()) return SliceResult::TimedOut;
-    const auto [connection, event] = std::move(steps.front());
-    steps.pop_front();
+    // What is for a connection that was not resumed yet waits.
+    const auto next = std::ranges::find_if(steps, [this](const auto& step) {
+      return step.first == 0 || std::ranges::find(resumed, step.first) != resumed.end();
+    });
+    if (next == steps.end()) return SliceResult::TimedOut;
+    const auto [connection, event] = std::move(*next);
+    steps.erase(next);
     if (connection == 0) return SliceResult::Finished;
-    const bool isResumed = std::find(resumed.begin(), resumed.end(), connection) != resumed.end();
-    if (isResumed && handlers[connection]) handlers[connection](event);
+    const ServiceEventHandler handler = handlers[connection];  // it may set another one
+    if (handler) handler(event);
     return SliceResult::HandledEvent;
   }
 

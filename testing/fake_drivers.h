@@ -1,0 +1,274 @@
+// Fakes of the families that reach into the kernel: driver registry, stack snapshots, network usage. Each
+// answers as an absent service until it is scripted.
+#pragma once
+
+#include <algorithm>
+#include <chrono>
+#include <functional>
+#include <map>
+#include <memory>
+#include <optional>
+#include <string>
+#include <thread>
+#include <utility>
+#include <vector>
+
+#include "platform/driver_registry.h"
+#include "platform/stack_snapshot.h"
+#include "platform/usage_service.h"
+
+namespace tbdaily::testing {
+
+struct FakeDriver {
+  std::optional<std::uint64_t> identifier;  // without one, or without a name, that query fails
+  std::optional<std::string> name;
+  std::string serviceClass;
+  PlistDictionary properties;
+  std::optional<std::uint64_t> parent;  // the identifier of another driver
+  std::uint32_t retainCount = 1;
+};
+
+// A matching description matches on the class, or, with "KdPropertyMatch", on properties that equal every
+// value in it.
+class FakeDriverRegistry : public DriverRegistry {
+ public:
+  std::vector<FakeDriver> drivers;  // in the order in which they are found
+  bool iteratorsAreValid = true;
+  KdStatus openStatus = kKdSuccess, closeStatus = kKdSuccess;
+  // The user clients' answers; without one a call is a bad argument. Outputs as in DriverRegistry.
+  std::function<KdStatus(const FakeDriver&, std::uint32_t method, std::span<const std::byte> input,
+                         std::span<std::byte> output, std::size_t& outputSize)>
+      structMethod;
+  std::function<KdStatus(const FakeDriver&, std::uint32_t method, std::span<const std::uint64_t> inputs,
+                         std::span<std::uint64_t> outputs, std::size_t& outputCount)>
+      scalarMethod;
+  std::function<KdStatus(const FakeDriver&, std::uint32_t method, const KdMethodInput&, KdMethodOutput&)>
+      method;
+  std::function<KdStatus(const FakeDriver&, std::uint32_t memoryType, std::span<std::byte>& memory)>
+      mapMemory;
+
+  // Objects that were not released and connections that were not closed; memory that was not unmapped.
+  std::size_t openHandles() const { return handles_.size(); }
+  int mappings = 0;
+
+  PlistValue KdServiceMatching(std::string_view serviceClass) override {
+    if (drivers.empty()) return {};
+    return PlistValue::dictionary({{kClassKey, PlistValue::string(std::string(serviceClass))}});
+  }
+  KdHandle KdServiceGetMatchingService(const PlistValue& matching) override {
+    const auto found = matchingDrivers(matching);
+    return found.empty() ? 0 : add({Kind::Object, found.front(), {}});
+  }
+  KdStatus KdServiceGetMatchingServices(const PlistValue& matching, KdHandle& iterator) override {
+    iterator = 0;
+    if (drivers.empty()) return kKdNotFound;
+    iterator = add({Kind::Iterator, 0, matchingDrivers(matching)});
+    return kKdSuccess;
+  }
+  KdHandle KdIteratorNext(KdHandle iterator) override {
+    Handle* handle = find(iterator, Kind::Iterator);
+    if (handle == nullptr || !iteratorsAreValid || handle->rest.empty()) return 0;
+    const std::size_t driver = handle->rest.front();
+    handle->rest.erase(handle->rest.begin());
+    return add({Kind::Object, driver, {}});
+  }
+  bool KdIteratorIsValid(KdHandle) override { return iteratorsAreValid; }
+  KdStatus KdObjectRelease(KdHandle object) override {
+    if (find(object, Kind::Connection) != nullptr) return kKdBadArgument;
+    return handles_.erase(object) == 1 ? kKdSuccess : kKdBadArgument;
+  }
+  std::uint32_t KdObjectGetUserRetainCount(KdHandle object) override {
+    const FakeDriver* driver = driverOf(object);
+    return driver != nullptr ? driver->retainCount : 0;
+  }
+
+  PlistValue KdRegistryEntryCreateCFProperty(KdHandle entry, std::string_view key) override {
+    const FakeDriver* driver = driverOf(entry);
+    return driver != nullptr ? driver->properties.get(key) : PlistValue();
+  }
+  PlistValue KdRegistryEntrySearchCFProperty(KdHandle entry, KdRegistryPlane, std::string_view key,
+                                             KdSearchOptions) override {
+    const FakeDriver* driver = driverOf(entry);
+    for (std::size_t steps = 0; driver != nullptr && steps < drivers.size(); ++steps) {
+      if (driver->properties.contains(key)) return driver->properties.get(key);
+      const auto parent = std::ranges::find(drivers, driver->parent, &FakeDriver::identifier);
+      driver = driver->parent && parent != drivers.end() ? &*parent : nullptr;
+    }
+    return {};
+  }
+  KdStatus KdRegistryEntryGetRegistryEntryID(KdHandle entry, std::uint64_t& identifier) override {
+    const FakeDriver* driver = driverOf(entry);
+    if (driver == nullptr || !driver->identifier) return kKdNotFound;
+    identifier = *driver->identifier;
+    return kKdSuccess;
+  }
+  KdStatus KdRegistryEntryGetName(KdHandle entry, std::string& name) override {
+    constexpr std::size_t kMaximumLength = 128;
+    const FakeDriver* driver = driverOf(entry);
+    if (driver == nullptr || !driver->name) return kKdNotFound;
+    name = driver->name->substr(0, kMaximumLength);
+    return kKdSuccess;
+  }
+
+  KdStatus KdServiceOpen(KdHandle service, std::uint32_t, KdHandle& connection) override {
+    connection = 0;
+    const Handle* handle = find(service, Kind::Object);
+    if (handle == nullptr) return kKdNotFound;
+    if (openStatus == kKdSuccess) connection = add({Kind::Connection, handle->driver, {}});
+    return openStatus;
+  }
+  KdStatus KdServiceClose(KdHandle connection) override {
+    if (find(connection, Kind::Connection) == nullptr) return kKdBadArgument;
+    handles_.erase(connection);
+    return closeStatus;
+  }
+  KdStatus KdConnectCallStructMethod(KdHandle connection, std::uint32_t number,
+                                     std::span<const std::byte> input, std::span<std::byte> output,
+                                     std::size_t& outputSize) override {
+    return answer(connection, structMethod, number, input, output, outputSize);
+  }
+  KdStatus KdConnectCallScalarMethod(KdHandle connection, std::uint32_t number,
+                                     std::span<const std::uint64_t> inputs, std::span<std::uint64_t> outputs,
+                                     std::size_t& outputCount) override {
+    return answer(connection, scalarMethod, number, inputs, outputs, outputCount);
+  }
+  KdStatus KdConnectCallMethod(KdHandle connection, std::uint32_t number, const KdMethodInput& input,
+                               KdMethodOutput& output) override {
+    return answer(connection, method, number, input, output);
+  }
+  KdStatus KdConnectMapMemory(KdHandle connection, std::uint32_t type,
+                              std::span<std::byte>& memory) override {
+    memory = {};
+    const KdStatus status = answer(connection, mapMemory, type, memory);
+    mappings += status == kKdSuccess ? 1 : 0;
+    return status;
+  }
+  KdStatus KdConnectUnmapMemory(KdHandle connection, std::uint32_t, std::span<std::byte>) override {
+    if (find(connection, Kind::Connection) == nullptr) return kKdBadArgument;
+    --mappings;
+    return kKdSuccess;
+  }
+
+ private:
+  static constexpr const char* kClassKey = "KdProviderClass";
+  enum class Kind { Object, Iterator, Connection };
+  struct Handle {
+    Kind kind;
+    std::size_t driver;
+    std::vector<std::size_t> rest;  // of an iterator
+  };
+
+  KdHandle add(Handle handle) {
+    handles_.emplace(++lastHandle_, std::move(handle));
+    return lastHandle_;
+  }
+  Handle* find(KdHandle handle, Kind kind) {
+    const auto found = handles_.find(handle);
+    return found != handles_.end() && found->second.kind == kind ? &found->second : nullptr;
+  }
+  const FakeDriver* driverOf(KdHandle object, Kind kind = Kind::Object) {
+    const Handle* handle = find(object, kind);
+    return handle != nullptr ? &drivers[handle->driver] : nullptr;
+  }
+  std::vector<std::size_t> matchingDrivers(const PlistValue& matching) const {
+    std::vector<std::size_t> found;
+    for (std::size_t i = 0; i < drivers.size(); ++i) {
+      if (matches(drivers[i], matching)) found.push_back(i);
+    }
+    return found;
+  }
+  static bool matches(const FakeDriver& driver, const PlistValue& matching) {
+    const PlistDictionary* description = matching.asDictionary();
+    if (description == nullptr) return false;
+    const PlistValue wanted = description->get("KdPropertyMatch");
+    if (wanted.asDictionary() == nullptr)
+      return description->get(kClassKey).asString() == driver.serviceClass;
+    return std::ranges::all_of(*wanted.asDictionary(), [&driver](const PlistDictionary::Entry& entry) {
+      return driver.properties.get(entry.first) == entry.second;
+    });
+  }
+  template <typename Script, typename... Arguments>
+  KdStatus answer(KdHandle connection, const Script& script, Arguments&&... arguments) {
+    const FakeDriver* driver = driverOf(connection, Kind::Connection);
+    if (driver == nullptr || !script) return kKdBadArgument;
+    return script(*driver, std::forward<Arguments>(arguments)...);
+  }
+
+  std::map<KdHandle, Handle> handles_;
+  KdHandle lastHandle_ = 0;
+};
+
+class FakeStackSnapshot : public StackSnapshot {
+ public:
+  std::optional<std::vector<std::byte>> bytes;  // none: the facility is absent
+  bool givesBuffer = true;                      // after a successful capture
+  KdStatus flagsStatus = kKdSuccess, captureStatus = kKdSuccess;
+  std::vector<std::uint64_t> flags;
+  int configurations = 0;  // that were not released
+
+  std::unique_ptr<StackSnapshotConfiguration> createConfiguration() override {
+    return bytes ? std::make_unique<Configuration>(*this) : nullptr;
+  }
+
+ private:
+  class Configuration : public StackSnapshotConfiguration {
+   public:
+    explicit Configuration(FakeStackSnapshot& fake) : fake_(fake) { ++fake_.configurations; }
+    ~Configuration() override { --fake_.configurations; }
+    KdStatus setFlags(std::uint64_t word) override {
+      fake_.flags.push_back(word);
+      return fake_.flagsStatus;
+    }
+    KdStatus capture() override {
+      captured_ = fake_.captureStatus == kKdSuccess;
+      return fake_.captureStatus;
+    }
+    std::optional<std::span<const std::byte>> buffer() override {
+      if (!captured_ || !fake_.givesBuffer) return std::nullopt;
+      return std::span<const std::byte>(*fake_.bytes);
+    }
+    std::uint32_t size() override { return captured_ ? static_cast<std::uint32_t>(fake_.bytes->size()) : 0; }
+
+   private:
+    FakeStackSnapshot& fake_;
+    bool captured_ = false;
+  };
+};
+
+class FakeUsageService : public UsageService {
+ public:
+  PlistValue records;  // none: the reply never comes
+  std::chrono::milliseconds delay{0};
+  bool workspaceFails = false, feedFails = false;
+  int requests = 0;
+
+  std::unique_ptr<UsageWorkspace> createWorkspace() override {
+    return workspaceFails ? nullptr : std::make_unique<Workspace>(*this);
+  }
+  void waitForReplies() { replies_.clear(); }
+
+ private:
+  struct Feed : UsageFeed {
+    explicit Feed(FakeUsageService& service) : fake(service) {}
+    void requestUsageToDate(std::span<const std::string>, UsageNameKind, UsageReplyHandler handler) override {
+      ++fake.requests;
+      if (fake.records.isNone()) return;
+      fake.replies_.emplace_back([handler = std::move(handler), records = fake.records, delay = fake.delay] {
+        std::this_thread::sleep_for(delay);
+        handler(records);
+      });
+    }
+    FakeUsageService& fake;
+  };
+  struct Workspace : UsageWorkspace {
+    explicit Workspace(FakeUsageService& service) : fake(service) {}
+    std::unique_ptr<UsageFeed> createFeed() override {
+      return fake.feedFails ? nullptr : std::make_unique<Feed>(fake);
+    }
+    FakeUsageService& fake;
+  };
+
+  std::vector<std::jthread> replies_;  // ended before the rest goes
+};
+
+}  // namespace tbdaily::testing
