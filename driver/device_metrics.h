@@ -5,7 +5,7 @@
 
 namespace tbdaily {
 
-// Records nothing yet: no figure has a source on this platform so far.
+// Records the network usage of the processes. Nothing that it meets stops the daily run.
 void CollectDailyDeviceMetrics(Platform& platform);
 
 }  // namespace tbdaily

@@ -1,7 +1,180 @@
 #include "driver/tasking.h"
 
+#include <algorithm>
+#include <charconv>
+#include <limits>
+#include <set>
+#include <string>
+
+#include "platform/device_answers.h"
+#include "platform/log_submission.h"
+#include "platform/notifications.h"
+#include "platform/preferences_store.h"
+#include "platform/system_log.h"
+
 namespace tbdaily {
 
-void HandleTaskingAndOSChange(Platform&) {}
+namespace {
+
+constexpr std::string_view kJob = preference_domain::kJob;
+
+PlistValue entryOf(const PlistValue& dictionary, std::string_view key) {
+  return dictionary.asDictionary() != nullptr ? dictionary.asDictionary()->get(key) : PlistValue();
+}
+
+std::int32_t saturatingInt32(std::int64_t value) {
+  using Limits = std::numeric_limits<std::int32_t>;
+  return static_cast<std::int32_t>(std::clamp<std::int64_t>(value, Limits::min(), Limits::max()));
+}
+
+std::int32_t integer32(const PlistValue& value) {
+  const auto number = value.asNumber();
+  return number ? saturatingInt32(number->toInt64()) : 0;
+}
+
+PlistValue stringOrNone(const std::optional<std::string>& text) {
+  return text ? PlistValue::string(*text) : PlistValue();
+}
+
+// Applies the scheduled tasking, and remembers which domains have to reach storage.
+class TaskingStep {
+ public:
+  TaskingStep(Platform& platform, const PlistDictionary& tasking, std::string_view id,
+              const std::optional<std::string>& build)
+      : platform_(platform), tasking_(tasking), id_(id), build_(build) {}
+
+  void run() {
+    PreferencesStore& preferences = platform_.preferences;
+    const PlistValue currentID = preferences.getValue("TaskingID", kJob);
+    const PlistValue currentOS = preferences.getValue("TaskingOS", kJob);
+    if (const auto applied = currentID.asString()) {
+      if (*applied == id_ && build_ && currentOS.asString() == std::string_view(*build_)) return;
+      platform_.systemLog.message(LogLevel::Default,
+                                  "Tasking update (%{public}@ -> %{public}@, %{public}@ -> %{public}@)",
+                                  currentID, id_, currentOS, stringOrNone(build_));
+      withdraw();
+    }
+    apply();
+    for (const std::string& domain : touchedDomains_) preferences.synchronize(domain);
+    platform_.notifications.post(kTaskingChangedNotification);
+  }
+
+ private:
+  void change(const std::vector<PreferenceChange>& changes) {
+    platform_.preferences.applyChanges(changes);
+    for (const PreferenceChange& change : changes) touchedDomains_.emplace(change.domain);
+  }
+
+  void withdraw() {
+    const PlistValue payload = platform_.preferences.getValue("TaskingPayload", kJob);
+    std::vector<PreferenceChange> removals;
+    if (payload.asArray() != nullptr) {
+      for (const TaskingItem& item : taskingItems(*payload.asArray()))
+        removals.push_back({item.key, {}, item.domain});
+    }
+    change(removals);
+    change({{"TaskingID", {}, kJob}, {"TaskingDigest", {}, kJob}, {"TaskingPayload", {}, kJob}});
+  }
+
+  void apply() {
+    const PlistValue payload = tasking_.get("TaskingPayload");
+    if (payload.asArray() == nullptr) return;
+    std::vector<PreferenceChange> settings;
+    for (const TaskingItem& item : taskingItems(*payload.asArray()))
+      settings.push_back({item.key, item.value, item.domain});
+    change(settings);
+    change({{"TaskingID", PlistValue::string(std::string(id_)), kJob},
+            {"TaskingOS", stringOrNone(build_), kJob},
+            {"TaskingDigest", tasking_.get("TaskingDigest"), kJob},
+            {"TaskingPayload", payload, kJob}});
+  }
+
+  Platform& platform_;
+  const PlistDictionary& tasking_;
+  std::string_view id_;
+  const std::optional<std::string>& build_;
+  std::set<std::string, std::less<>> touchedDomains_;
+};
+
+OSUpdate noteOSChange(Platform& platform, const std::optional<std::string>& build, DayNumber today) {
+  OSUpdate last = lastOSUpdate(platform.preferences);
+  const PlistValue version = last.version();
+  if (!build || version.asString() == std::string_view(*build)) return last;
+  platform.systemLog.message(LogLevel::Default, "OS change since last run (%{public}@ -> %{public}@)",
+                             version, *build);
+  last.record =
+      PlistValue::dictionary({{"version", PlistValue::string(*build)}, {"day", PlistValue::int32(today)}});
+  platform.preferences.setValue("LastOSUpdate", last.record, kJob);
+  return last;
+}
+
+void submitOnAggressiveDays(Platform& platform, DayNumber today, const OSUpdate& last) {
+  const std::int32_t days = aggressiveDays(platform.logSubmission.taskingValue(kAggressiveDaysKey));
+  const std::int32_t elapsed = daysBetween(today, last.day());
+  if (elapsed >= days) return;
+  platform.systemLog.message(LogLevel::Default,
+                             "Aggressive submission day %d of %d; triggering log submission", elapsed, days);
+  platform.logSubmission.submitDiagnosticLogs();
+}
+
+}  // namespace
+
+PlistValue OSUpdate::version() const {
+  return entryOf(record, "version");
+}
+DayNumber OSUpdate::day() const {
+  return integer32(entryOf(record, "day"));
+}
+
+OSUpdate lastOSUpdate(PreferencesStore& preferences) {
+  return {preferences.getValue("LastOSUpdate", kJob)};
+}
+
+std::vector<TaskingItem> taskingItems(const PlistArray& payload) {
+  std::vector<TaskingItem> items;
+  items.reserve(payload.size());
+  for (const PlistValue& element : payload) {
+    const PlistDictionary* item = element.asDictionary();
+    const PlistValue* domain = item != nullptr ? item->find("Domain") : nullptr;
+    const PlistValue* key = item != nullptr ? item->find("Key") : nullptr;
+    if (domain == nullptr || key == nullptr || !domain->asString() || !key->asString()) continue;
+    items.push_back({*domain->asString(), *key->asString(), item->get("Value")});
+  }
+  return items;
+}
+
+std::int32_t aggressiveDays(const PlistValue& value) {
+  const auto text = value.asString();
+  if (!text) return integer32(value);
+  const std::size_t start = std::min(text->find_first_not_of(" \t\n"), text->size());
+  const char* digits = text->data() + start;
+  const char* end = text->data() + text->size();
+  if (digits != end && *digits == '+') ++digits;
+  std::int64_t number = 0;
+  const auto [rest, error] = std::from_chars(digits, end, number);
+  if (error == std::errc::result_out_of_range) {
+    return *digits == '-' ? std::numeric_limits<std::int32_t>::min()
+                          : std::numeric_limits<std::int32_t>::max();
+  }
+  return saturatingInt32(number);
+}
+
+std::int32_t daysBetween(DayNumber today, DayNumber since) {
+  const auto difference = static_cast<std::uint32_t>(today) - static_cast<std::uint32_t>(since);
+  return static_cast<std::int32_t>(static_cast<std::int32_t>(difference) < 0 ? 0 - difference : difference);
+}
+
+void HandleTaskingAndOSChange(Platform& platform) {
+  const DayNumber today = platform.analyticsClient.currentDayNumber();
+  const std::optional<std::string> build = platform.deviceAnswers.currentOSBuildVersion();
+  const OSUpdate last = noteOSChange(platform, build, today);
+
+  const PlistValue scheduled =
+      platform.preferences.getValue("ScheduledTasking", preference_domain::kLogSubmission);
+  const PlistValue id = entryOf(scheduled, "TaskingID");
+  if (!id.asString()) return;
+  TaskingStep(platform, *scheduled.asDictionary(), *id.asString(), build).run();
+  submitOnAggressiveDays(platform, today, last);
+}
 
 }  // namespace tbdaily

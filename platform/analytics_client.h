@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstdint>
+#include <span>
 #include <string_view>
 
 #include "platform/plist_value.h"
@@ -12,6 +13,12 @@ namespace tbdaily {
 
 using DayNumber = std::int32_t;
 inline constexpr std::int64_t kSecondsPerDay = 86400;
+
+// One increment of a series. The key is borrowed for the call.
+struct ScalarIncrement {
+  std::string_view key;
+  std::int64_t increment = 0;
+};
 
 class AnalyticsClient {
  public:
@@ -28,6 +35,10 @@ class AnalyticsClient {
   virtual void setValueForScalarKey(std::string_view key, std::int64_t value) = 0;
   // Adds to today's value of the key, which counts as 0 when absent; wraps at 64 bits.
   virtual void addValueForScalarKey(std::string_view key, std::int64_t increment) = 0;
+  // Comes to the same as adding one after the other; a store may do it at once.
+  virtual void addValuesForScalarKeys(std::span<const ScalarIncrement> increments) {
+    for (const auto& [key, increment] : increments) addValueForScalarKey(key, increment);
+  }
 };
 
 // The numbering itself, the same on every host.

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstdint>
+#include <span>
 #include <string_view>
 
 #include "platform/plist_value.h"
@@ -25,6 +26,13 @@ struct PreferenceBoolean {
   bool valid = false;  // the key exists and holds a boolean
 };
 
+// One change of a series. The texts are borrowed for the call.
+struct PreferenceChange {
+  std::string_view key;
+  PlistValue value;  // none removes the key
+  std::string_view domain;
+};
+
 class PreferencesStore {
  public:
   virtual ~PreferencesStore() = default;
@@ -32,6 +40,11 @@ class PreferencesStore {
   virtual PlistValue getValue(std::string_view key, std::string_view domain) = 0;
   // None removes the key. Visible at once to later reads in this and in other processes.
   virtual void setValue(std::string_view key, const PlistValue& value, std::string_view domain) = 0;
+  // Comes to the same as setting one after the other in this order. A store may write each domain once; a
+  // change that cannot be written does not keep the others from being written.
+  virtual void applyChanges(std::span<const PreferenceChange> changes) {
+    for (const PreferenceChange& change : changes) setValue(change.key, change.value, change.domain);
+  }
   // Forces what was written to the domain to storage.
   virtual void synchronize(std::string_view domain) = 0;
 

@@ -8,6 +8,7 @@
 #include <memory>
 #include <span>
 #include <string>
+#include <string_view>
 
 #include "platform/plist_value.h"
 
@@ -15,7 +16,10 @@ namespace tbdaily {
 
 enum class UsageNameKind : std::uint8_t { ProcessName };
 
-// `records` is an array of dictionaries: "bundleName", "procName", a since-time date, "wifiInBytes",
+// The entry of a usage record that holds the moment from which its counters count (a date).
+inline constexpr std::string_view kUsageSinceTimeKey = "since";
+
+// `records` is an array of dictionaries: "bundleName", "procName", the since-time, "wifiInBytes",
 // "wifiOutBytes", "wwanInBytes", "wwanOutBytes". Called at most once, on a thread other than the requester's.
 using UsageReplyHandler = std::function<void(const PlistValue& records)>;
 

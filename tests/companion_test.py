@@ -26,6 +26,8 @@ class Companion(unittest.TestCase):
                       ["record", "scalar", "k", str(2 ** 63)], ["record", "distribution", "k", "inf"], ["send", "run", "x"],
                       ["record", "scalar", "k", "1", "--day", str(2 ** 31)], ["report", "--day", "5"], ["init", "--profile", "x"]):
             device.tally(*words, status=2)
+        self.assertIn('no command "nonsense"', device.tally("nonsense", status=2))
+        self.assertIn("no folder", device.tally("record", "scalar", "k", "1", "--root", str(device.base / "missing"), status=1))
         environment = {k: v for k, v in device.env.items() if k != "TBDAILY_ROOT"}
         self.assertEqual(subprocess.run([BIN / "tallyctl", "init"], env=environment, capture_output=True).returncode, 2)
 
@@ -82,7 +84,8 @@ class Companion(unittest.TestCase):
         self.assertEqual(keys["off", "distribution"], {"key": "off", "kind": "distribution", "allowed": False, "by": None,
                                                        "entry": None, "group": None, "options": None})
         self.assertFalse(answer["internal"])
-        for oddity in ("Off is disabled by tasking", "Broken is no dictionary", "A has the entry \"Note\"", "empty prefix",
+        self.assertIn("keyGroup Off is disabled by tasking", device.tally("whitelist", "check"))
+        for oddity in ("Broken is no dictionary", "A has the entry \"Note\"", "empty prefix",
                        "net.wifi. is never reached", "replaces the options that group A", "every value becomes 0",
                        "do not ascend", "\"odd\""):
             self.assertTrue(any(oddity in problem for problem in answer["problems"]), oddity)

@@ -119,7 +119,8 @@ class DailyRun(unittest.TestCase):
         device.preferences("com.velmora.Crashferry", {"DiagnosticLogSubmissionEnabled": 1})  # a number is no yes
         device.run("-d")
         self.assertEqual(device.reports(), [])
-        self.assertEqual(device.preferences(JOB), {"LastCrashLogSerializationDateInDaysSince1970": YESTERDAY})
+        self.assertEqual(device.preferences(JOB)["LastCrashLogSerializationDateInDaysSince1970"], YESTERDAY)
+        self.assertNotIn("LastOSVersion", device.preferences(JOB))
 
     def test_os_updates_and_numbers_of_logs(self):
         device = self.device(sample=True)

@@ -31,7 +31,9 @@ class Device:
                         TBDAILY_LOG_PRIVATE="show", ASAN_OPTIONS="detect_leaks=1:exitcode=99",
                         UBSAN_OPTIONS="print_stacktrace=1")
         self.record("clock", {"now": NOW, "ticks": 3600000000000, "numerator": 125, "denominator": 3})
+        self.record("usage", {"records": []})  # without one every run waits for a reply that never comes
         if sample:
+            self.path("System/Device/usage.plist").unlink()
             self.tally("init")
 
     def close(self):

@@ -11,7 +11,7 @@
 
 #include "platform/linux/file_io.h"
 #include "platform/linux/host.h"
-#include "platform/linux/utf8.h"
+#include "platform/utf8.h"
 
 namespace tbdaily {
 
@@ -162,7 +162,9 @@ Verdict examineFile(const fs::path& file, std::chrono::milliseconds busyTimeout)
   struct stat status {};
   if (::stat(file.c_str(), &status) != 0) {
     if (errno == ENOENT || errno == ENOTDIR) return {};
-    return unusable(file, errorText(errno));
+    const int error = errno;  // no fault of the store's own
+    return {StoreState::Unusable,
+            {StoreFault::Failed, file.native() + " cannot be examined: " + errorText(error), error}};
   }
   if (!S_ISREG(status.st_mode)) return unusable(file, "it is not a regular file");
   if (status.st_size == 0) return {StoreState::New, {}};
@@ -241,12 +243,7 @@ std::optional<std::string_view> analyticsKeyFault(std::string_view key) {
   while (!key.empty()) {
     const std::size_t length = utf8CharacterLength(key);
     if (length == 0) return "the key is not UTF-8";
-    const std::string_view character = key.substr(0, length);
-    const bool isControl = static_cast<unsigned char>(character[0]) < 0x20 && character != "\t" &&
-                           character != "\n" && character != "\r";
-    if (isControl || character == "\xEF\xBF\xBE" || character == "\xEF\xBF\xBF") {
-      return "the key holds a character that a report cannot carry";
-    }
+    if (carriedCharacterLength(key) == 0) return "the key holds a character that a report cannot carry";
     key.remove_prefix(length);
   }
   return std::nullopt;

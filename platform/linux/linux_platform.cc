@@ -16,10 +16,10 @@
 #include "platform/linux/linux_preferences.h"
 #include "platform/linux/linux_service_listener.h"
 #include "platform/linux/linux_system_log.h"
+#include "platform/linux/linux_usage_service.h"
 #include "platform/linux/property_list_codec.h"
 #include "platform/linux/recordings.h"
 #include "platform/stack_snapshot.h"
-#include "platform/usage_service.h"
 
 namespace tbdaily {
 
@@ -47,7 +47,7 @@ struct LinuxPlatform::Families {
   LinuxMessageDigest messageDigest;
   AbsentDriverRegistry driverRegistry;
   AbsentStackSnapshot stackSnapshot;
-  AbsentUsageService usageService;
+  LinuxUsageService usageService{recordings};  // last: it ends before what its replies use
 
   Platform services{driverRegistry,   preferences,     deviceAnswers, logSubmission, analyticsClient,
                     analyticsHistory, codec,           stackSnapshot, usageService,  appRegistry,

@@ -10,7 +10,7 @@
 
 #include "platform/linux/big_endian_reader.h"
 #include "platform/linux/plist_limits.h"
-#include "platform/linux/utf8.h"
+#include "platform/utf8.h"
 #include "platform/number_text.h"
 
 namespace tbdaily {

@@ -13,7 +13,7 @@
 #include "platform/linux/plist_builder.h"
 #include "platform/linux/plist_limits.h"
 #include "platform/linux/plist_scalar_text.h"
-#include "platform/linux/utf8.h"
+#include "platform/utf8.h"
 #include "platform/linux/xml_doctype.h"
 
 namespace tbdaily {

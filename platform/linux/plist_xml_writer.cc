@@ -9,7 +9,7 @@
 #include "platform/linux/base64.h"
 #include "platform/linux/plist_limits.h"
 #include "platform/linux/plist_scalar_text.h"
-#include "platform/linux/utf8.h"
+#include "platform/utf8.h"
 #include "platform/number_text.h"
 
 namespace tbdaily {
@@ -41,13 +41,6 @@ std::string_view escapeOf(char c) {
     default:
       return {};
   }
-}
-
-// The length of a character outside of ASCII that XML can carry, 0 for anything else.
-std::size_t carriedLength(std::string_view text) {
-  const std::size_t length = utf8CharacterLength(text);
-  const bool isNoCharacter = text.starts_with("\xEF\xBF\xBE") || text.starts_with("\xEF\xBF\xBF");
-  return length < 2 || isNoCharacter ? 0 : length;
 }
 
 class XmlWriter {
@@ -145,7 +138,7 @@ bool XmlWriter::writeText(std::string_view opening, std::string_view text, std::
       ++at;
       continue;
     }
-    if (const std::size_t length = carriedLength(text.substr(at)); length != 0) {
+    if (const std::size_t length = carriedCharacterLength(text.substr(at)); length > 1) {
       at += length;
       continue;
     }

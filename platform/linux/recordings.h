@@ -43,6 +43,7 @@ inline constexpr std::string_view kAnswers = "answers.plist";
 inline constexpr std::string_view kKernel = "kernel.plist";
 inline constexpr std::string_view kApps = "apps.plist";
 inline constexpr std::string_view kLocale = "locale.plist";
+inline constexpr std::string_view kUsage = "usage.plist";
 }  // namespace recording
 
 }  // namespace tbdaily

@@ -83,13 +83,26 @@ PlistDictionary sampleBundles() {
   return {{"bundles", PlistValue::array(std::move(bundles))}};
 }
 
+// Scheduled, not yet applied: keeps one group of the whitelist switched off and another one on.
+PlistDictionary sampleTasking() {
+  const auto item = [](std::string_view key, PlistValue value) {
+    return PlistValue::dictionary({{"Domain", text(preference_domain::kTaskingValues)},
+                                   {"Key", text(key)},
+                                   {"Value", std::move(value)}});
+  };
+  return {{"TaskingID", text("sample-tasking-1")},
+          {"TaskingDigest", text("6f1ed002ab5595859014ebf0951522d9")},
+          {"TaskingPayload", PlistValue::array({item("Experiments", PlistValue::boolean(false)),
+                                                item("Network", PlistValue::boolean(true))})}};
+}
+
 // A property list that the sample device begins with.
 struct SampleFile {
   std::string path;  // as the device sees it
   PlistDictionary root;
 };
 
-std::vector<SampleFile> sampleFiles(const Profile& profile) {
+std::vector<SampleFile> sampleFiles(const Profile& profile, DayNumber today) {
   const auto preferences = [](std::string_view domain) {
     return "/var/mobile/Library/Preferences/" + std::string(domain) + ".plist";
   };
@@ -98,8 +111,10 @@ std::vector<SampleFile> sampleFiles(const Profile& profile) {
           {"/System/Device/kernel.plist", sampleKernel()},
           {"/System/Device/locale.plist", sampleLocale()},
           {"/System/Device/apps.plist", sampleBundles()},
+          {"/System/Device/usage.plist", {{"records", PlistValue::array(sampleUsageRecords(today))}}},
           {preferences(preference_domain::kLogSubmission),
-           {{"DiagnosticLogSubmissionEnabled", PlistValue::boolean(true)}}},
+           {{"DiagnosticLogSubmissionEnabled", PlistValue::boolean(true)},
+            {"ScheduledTasking", PlistValue::dictionary(sampleTasking())}}},
           {preferences(preference_domain::kTaskingValues), {{"Experiments", PlistValue::boolean(false)}}},
           {preferences(preference_domain::kAnalytics), {{"DatabaseCorruptionCount", PlistValue::int32(1)}}}};
 }
@@ -123,10 +138,11 @@ class SampleDevice {
 
   // One line with the reason on failure.
   std::string make() {
-    std::error_code error;
-    fs::create_directories(host_.root(), error);
-    if (error) return host_.root().native() + " cannot be made: " + error.message();
-    const std::vector<SampleFile> files = sampleFiles(profile_);
+    if (const int error = makeFolders(host_.root()); error != 0) {
+      return host_.root().native() + " cannot be made: " + errorText(error);
+    }
+    const DayNumber today = tool_.platform().services().analyticsClient.currentDayNumber();
+    const std::vector<SampleFile> files = sampleFiles(profile_, today);
     const fs::path store = host_.devicePath(analyticsDatabasePath("/var/mobile"));
     if (const std::string taken = firstTaken(files, store); !taken.empty()) {
       return taken +
@@ -139,8 +155,7 @@ class SampleDevice {
     if (const int failure = host_.makeFolders(store.parent_path()); failure != 0)
       return store.native() + ": " + errorText(failure);
     AnalyticsStore analytics(store);
-    const DayNumber yesterday = dayBefore(tool_.platform().services().analyticsClient.currentDayNumber());
-    return addSampleHistory(analytics, yesterday).value_or("");
+    return addSampleHistory(analytics, dayBefore(today)).value_or("");
   }
 
  private:

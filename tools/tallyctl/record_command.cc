@@ -24,10 +24,7 @@ std::unique_ptr<AnalyticsStore> deviceStore(Tool& tool) {
     return nullptr;
   }
   // The store makes its own folders, but must not make a root that is not there.
-  if (const int error = host.makeFolders(host.root()); error != 0) {
-    tool.fail(host.root().native() + ": " + errorText(error));
-    return nullptr;
-  }
+  if (!tool.hasUsableRoot()) return nullptr;
   return std::make_unique<AnalyticsStore>(host.devicePath(analyticsDatabasePath(*home)));
 }
 
@@ -139,17 +136,16 @@ void addRecordCommand(CLI::App& app, Tool& tool) {
   distribution->callback([&tool, arguments] { runDistribution(tool, *arguments); });
 
   auto file = std::make_shared<std::string>("-");
-  CLI::App* import = command->add_subcommand(
+  CLI::App* importing = command->add_subcommand(
       "import",
       "Load tab-separated lines, 's KEY DAY VALUE' or 'd KEY DAY SECONDS VALUE': all of them or none");
-  import->add_option("FILE", *file, "Default: standard input");
-  import->callback([&tool, file] { runImport(tool, *file);
-});
+  importing->add_option("FILE", *file, "Default: standard input");
+  importing->callback([&tool, file] { runImport(tool, *file); });
 
-auto before = std::make_shared<DayNumber>(0);
-CLI::App* prune = command->add_subcommand("prune", "Delete the rows of older days");
-prune->add_option("--before", *before, "The first day to keep")->required()->type_name("DAY");
-prune->callback([&tool, before] { runPrune(tool, *before); });
-}  // namespace tbdaily
+  auto before = std::make_shared<DayNumber>(0);
+  CLI::App* prune = command->add_subcommand("prune", "Delete the rows of older days");
+  prune->add_option("--before", *before, "The first day to keep")->required()->type_name("DAY");
+  prune->callback([&tool, before] { runPrune(tool, *before); });
+}
 
 }  // namespace tbdaily

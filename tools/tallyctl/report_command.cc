@@ -63,8 +63,9 @@ void showFile(Tool& tool, std::string file) {
   if (file.empty()) {
     file = newestReport(tool).native();
     if (file.empty()) {
-      return tool.fail(
-          "there is no report yet; run tbdaily -f, or look at what it would write with --preview");
+      if (!tool.hasUsableRoot()) return;
+      return tool.fail("there is no report yet in " + tool.platform().host().root().native() +
+                       "; run tbdaily -f, or look at what it would write with --preview");
     }
   }
   const PlistParseResult parsed = readPlistFile(tool.platform().services().propertyListCodec, file);
@@ -73,6 +74,7 @@ void showFile(Tool& tool, std::string file) {
 }
 
 void showPreview(Tool& tool, std::optional<DayNumber> day) {
+  if (!tool.hasUsableRoot()) return;
   const ReportPreview preview = previewReport(tool.platform(), day);
   if (!preview.error.empty()) return tool.fail(preview.error);
   show(tool, preview.root);

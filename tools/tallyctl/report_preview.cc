@@ -101,6 +101,17 @@ class CapturedSubmission : public LogSubmission {
   LogSubmission& real_;
 };
 
+// Brings the copy to the state that the store has once a run has asked for its checkpoint. Why it cannot be
+// used, of the store itself; empty when it can, or is missing.
+std::string checkpointCopy(const StoreCopy& copy, const std::filesystem::path& store) {
+  std::error_code ignored;
+  if (!std::filesystem::exists(copy.path(), ignored)) return {};
+  std::string error = AnalyticsStore(copy.path()).checkpoint().error;
+  const std::size_t place = error.find(copy.path().native());
+  return place == std::string::npos ? error
+                                    : error.replace(place, copy.path().native().size(), store.native());
+}
+
 std::string whyNothing(const CapturedLog& log, DayNumber day) {
   const std::vector<std::string> errors = log.errors();
   if (!errors.empty()) return errors.front();
@@ -116,8 +127,8 @@ ReportPreview previewReport(LinuxPlatform& linux, std::optional<DayNumber> day) 
   const std::string storePath = home != nullptr ? analyticsDatabasePath(*home) : "";
   const StoreCopy copy(home != nullptr ? linux.host().devicePath(storePath) : std::filesystem::path());
   if (!copy.error().empty()) return {{}, copy.error()};
-  std::error_code ignored;
-  if (std::filesystem::exists(copy.path(), ignored)) AnalyticsStore(copy.path()).checkpoint();
+  if (const std::string fault = checkpointCopy(copy, linux.host().devicePath(storePath)); !fault.empty())
+    return {{}, fault};
 
   CapturedLog log;
   ReadOnlyPreferences preferences(real.preferences);

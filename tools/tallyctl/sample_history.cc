@@ -6,6 +6,8 @@
 #include <cstdint>
 #include <vector>
 
+#include "platform/usage_service.h"
+
 namespace tbdaily {
 
 namespace {
@@ -155,6 +157,34 @@ std::vector<SampleApp> sampleApps() {
   for (const char* name : kUserApps) apps.push_back({std::string("org.example.") + name, true});
   for (const char* name : kSystemApps) apps.push_back({std::string("com.velmora.") + name, false});
   return apps;
+}
+
+PlistArray sampleUsageRecords(DayNumber day) {
+  constexpr std::array<const char*, 8> kDaemons = {"mailsyncd", "updated", "pushd", "timesyncd",
+                                                   "mapsd",     "cloudd",  "dnsd",  "backupd"};
+  constexpr DayNumber kDaysSinceBoot = 3;
+  Random random(static_cast<std::uint64_t>(day) + 1);
+  PlistArray records;
+  const auto add = [&](const char* nameKey, const std::string& name, double scale, DayNumber since) {
+    const auto bytes = [&](double low, double high) {
+      return PlistValue::int64(std::llround(random.between(low, high) * scale));
+    };
+    records.push_back(PlistValue::dictionary(
+        {{nameKey, PlistValue::string(name)},
+         {std::string(kUsageSinceTimeKey),
+          PlistValue(PlistDate{dateOf(since).secondsSinceReference + measured(random.between(0, 86399))})},
+         {"wifiInBytes", bytes(1e5, 4e8)},
+         {"wifiOutBytes", bytes(1e4, 3e7)},
+         {"wwanInBytes", bytes(0, 9e7)},
+         {"wwanOutBytes", bytes(0, 6e6)}}));
+  };
+  // Apps restart now and then; daemons have counted since the device was started.
+  for (const SampleApp& app : sampleApps()) {
+    if (app.isUserApp)
+      add("bundleName", app.identifier, 1, day - static_cast<DayNumber>(random.between(0, 2)));
+  }
+  for (const char* daemon : kDaemons) add("procName", daemon, 0.2, day - kDaysSinceBoot);
+  return records;
 }
 
 std::optional<std::string> addSampleHistory(AnalyticsStore& store, DayNumber day) {

@@ -13,6 +13,10 @@ namespace tbdaily {
 // One line with the reason when the store cannot take them.
 std::optional<std::string> addSampleHistory(AnalyticsStore& store, DayNumber day);
 
+// Usage records of some dozen processes of the day, as the usage service delivers them: an array of
+// dictionaries.
+PlistArray sampleUsageRecords(DayNumber day);
+
 // The bundle identifiers of the sample device's applications, the user's first.
 struct SampleApp {
   std::string identifier;

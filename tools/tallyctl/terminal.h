@@ -14,7 +14,7 @@ enum class Style { Plain, Heading, Dim, Good, Bad };
 
 class Terminal {
  public:
-  Terminal();  // looks at standard output, NO_COLOR, TERM, COLUMNS and the locale variables
+  Terminal();  // looks at standard output, NO_COLOR, TERM and the locale variables
 
   void print(std::string_view text);
   void line(std::string_view text = {});

@@ -2,6 +2,7 @@
 
 #include <cstdio>
 #include <cstdlib>
+#include <filesystem>
 #include <limits>
 
 #include "platform/linux/plist_json.h"
@@ -23,6 +24,15 @@ LinuxPlatform& Tool::platform() {
 bool Tool::namesRoot() const {
   const char* root = std::getenv("TBDAILY_ROOT");
   return !options.root.empty() || (root != nullptr && *root != '\0');
+}
+
+bool Tool::hasUsableRoot() {
+  const std::filesystem::path& root = platform().host().root();
+  std::error_code error;
+  if (std::filesystem::is_directory(root, error)) return true;
+  fail("the device root " + root.native() +
+       " is no folder; make a device there with tallyctl init, or name another --root");
+  return false;
 }
 
 bool Tool::printedAsJson(const PlistValue& value) {

@@ -38,6 +38,8 @@ class Tool {
   // Made at the first call, when the options are known; `--root` then also stands in TBDAILY_ROOT, where the
   // support library looks.
   LinuxPlatform& platform();
+  // Whether the root is a folder that is there; says so when it is not.
+  bool hasUsableRoot();
   // Whether the user named a root, by option or in the environment.
   bool namesRoot() const;
 
@@ -62,5 +64,7 @@ void addWaitCommand(CLI::App& app, Tool& tool);
 void addReportCommand(CLI::App& app, Tool& tool);
 void addWhitelistCommand(CLI::App& app, Tool& tool);
 void addPlistCommand(CLI::App& app, Tool& tool);
+void addTaskingCommand(CLI::App& app, Tool& tool);
+void addUsageCommand(CLI::App& app, Tool& tool);
 
 }  // namespace tbdaily

@@ -69,7 +69,10 @@ void check(Tool& tool, const std::vector<std::string>& keys) {
     return tool.fail(log.errors().empty() ? "the whitelist cannot be loaded" : log.errors().front());
 
   std::vector<std::string> problems;
-  for (const CapturedLog::Message& message : log.messages) problems.push_back(message.text);
+  std::vector<std::string> disabled;  // groups that a tasking switched off: nothing odd, but good to know
+  for (const CapturedLog::Message& message : log.messages) {
+    (message.level == LogLevel::Error ? problems : disabled).push_back(message.text);
+  }
   const auto bytes = platform.fileSystem.readFile(kWhitelistPath);
   const PlistValue root = bytes ? platform.propertyListCodec.parse(*bytes).value : PlistValue();
   if (root.asDictionary() != nullptr) {
@@ -96,6 +99,7 @@ void check(Tool& tool, const std::vector<std::string>& keys) {
   out.line("  digest   " + config->configFileDigest());
   out.line(std::string("  device   ") +
            (config->isInternalDevice() ? "internal: every key is reported" : "ordinary"));
+  for (const std::string& line : disabled) out.line("  tasking  " + printable(line));
   out.line("  problems " + (problems.empty() ? "none" : std::to_string(problems.size())));
   for (const std::string& problem : problems) out.line("    " + out.styled(printable(problem), Style::Bad));
   if (!answers.empty()) out.line(out.styled("Keys", Style::Heading));

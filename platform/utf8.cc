@@ -1,4 +1,4 @@
-#include "platform/linux/utf8.h"
+#include "platform/utf8.h"
 
 namespace tbdaily {
 
@@ -20,6 +20,23 @@ std::size_t utf8CharacterLength(std::string_view text) {
   }
   const bool outside = lead > 0xF4 || (lead == 0xF0 && second < 0x90) || (lead == 0xF4 && second >= 0x90);
   return continues(1) && continues(2) && continues(3) && !outside ? 4 : 0;
+}
+
+std::size_t carriedCharacterLength(std::string_view text) {
+  const std::size_t length = utf8CharacterLength(text);
+  const std::string_view character = text.substr(0, length);
+  const bool isControl = length == 1 && static_cast<unsigned char>(character[0]) < 0x20 &&
+                         character != "\t" && character != "\n" && character != "\r";
+  return isControl || character == "\xEF\xBF\xBE" || character == "\xEF\xBF\xBF" ? 0 : length;
+}
+
+bool isCarriedText(std::string_view text) {
+  while (!text.empty()) {
+    const std::size_t length = carriedCharacterLength(text);
+    if (length == 0) return false;
+    text.remove_prefix(length);
+  }
+  return true;
 }
 
 void appendUtf8(std::string& out, char32_t codePoint) {

@@ -14,6 +14,13 @@ inline constexpr std::string_view kReplacementCharacter = "\xEF\xBF\xBD";
 // formed (overlong forms, surrogates and everything above U+10FFFF are not) or is empty.
 std::size_t utf8CharacterLength(std::string_view text);
 
+// The same for the characters that an XML document can carry: no control characters but tab, line feed and
+// carriage return, no U+FFFE and U+FFFF.
+std::size_t carriedCharacterLength(std::string_view text);
+
+// Whether all of the text can be stored and reported.
+bool isCarriedText(std::string_view text);
+
 // `codePoint` is a Unicode scalar value.
 void appendUtf8(std::string& out, char32_t codePoint);
 

@@ -1,0 +1,51 @@
+#include "tools/tallyctl/tasking_check.h"
+
+#include <algorithm>
+#include <array>
+
+#include "platform/linux/file_io.h"
+
+namespace tbdaily {
+
+namespace {
+
+constexpr std::array<std::string_view, 3> kEntries = {"TaskingID", "TaskingDigest", "TaskingPayload"};
+
+std::string itemFault(const PlistValue& element) {
+  const PlistDictionary* item = element.asDictionary();
+  if (item == nullptr) return "is no dictionary";
+  const PlistValue domain = item->get("Domain");
+  const PlistValue key = item->get("Key");
+  if (!domain.asString()) return "has no text as \"Domain\"";
+  if (!isSafeName(*domain.asString())) {
+    return "has a \"Domain\" that is none: 1 to 200 letters, digits, '.', '-' or '_', not beginning with '.'";
+  }
+  if (!key.asString() || key.asString()->empty()) return "has no text as \"Key\"";
+  if (!item->contains("Value")) return "has no \"Value\"";
+  return {};
+}
+
+}  // namespace
+
+std::string taskingFault(const PlistValue& tasking) {
+  const PlistDictionary* root = tasking.asDictionary();
+  if (root == nullptr) return "a tasking is a dictionary";
+  const PlistValue id = root->get("TaskingID");
+  if (!id.asString() || id.asString()->empty()) return "a tasking needs a text as \"TaskingID\"";
+  for (const auto& [name, value] : *root) {
+    if (std::find(kEntries.begin(), kEntries.end(), name) == kEntries.end()) {
+      return "a tasking has no entry \"" + name +
+             "\"; it has \"TaskingID\", \"TaskingDigest\" and \"TaskingPayload\"";
+    }
+  }
+  const PlistValue* payload = root->find("TaskingPayload");
+  if (payload == nullptr) return {};
+  if (payload->asArray() == nullptr) return "\"TaskingPayload\" is an array of items";
+  for (std::size_t i = 0; i < payload->asArray()->size(); ++i) {
+    const std::string fault = itemFault((*payload->asArray())[i]);
+    if (!fault.empty()) return "item " + std::to_string(i + 1) + " of the payload " + fault;
+  }
+  return {};
+}
+
+}  // namespace tbdaily
