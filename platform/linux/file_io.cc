@@ -9,6 +9,7 @@
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
+#include <ctime>
 #include <thread>
 
 namespace tbdaily {
@@ -31,13 +32,28 @@ std::optional<FileIdentity> fileIdentity(const fs::path& path) {
   return FileIdentity::of(status);
 }
 
-int readRegularFile(const fs::path& path, FileContents& contents) {
+namespace {
+// File times advance with the system's timer, by 10 ms at the coarsest; clocks of network file systems may be
+// ahead of ours.
+bool isSettled(const FileIdentity& identity) {
+  constexpr std::int64_t kSettlingNanoseconds = 50'000'000;
+  timespec now{};
+  ::clock_gettime(CLOCK_REALTIME, &now);
+  const std::int64_t seconds = now.tv_sec - identity.changedSeconds;
+  if (seconds < 0 || seconds > 1) return seconds > 1;
+  return seconds * 1'000'000'000 + now.tv_nsec - identity.changedNanoseconds > kSettlingNanoseconds;
+}
+}  // namespace
+
+int readRegularFile(const fs::path& path, FileContents& contents, std::size_t maximumSize) {
   const FileDescriptor fd(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
   if (!fd.isOpen()) return errno;
   struct stat status {};
   if (::fstat(fd.get(), &status) != 0) return errno;
   if (!S_ISREG(status.st_mode)) return EINVAL;
+  if (static_cast<std::uint64_t>(status.st_size) > maximumSize) return EFBIG;
   contents.identity = FileIdentity::of(status);
+  if (!isSettled(contents.identity)) contents.identity = {};
   contents.bytes.resize(static_cast<std::size_t>(status.st_size));
   std::size_t filled = 0;
   while (true) {
@@ -48,6 +64,7 @@ int readRegularFile(const fs::path& path, FileContents& contents) {
     if (count < 0) return errno;
     if (count == 0) break;
     filled += static_cast<std::size_t>(count);
+    if (filled > maximumSize) return EFBIG;
   }
   contents.bytes.resize(filled);
   return 0;

@@ -39,7 +39,7 @@ class FileDescriptor {
   int fd_ = -1;
 };
 
-// What tells one state of a file from another without reading it.
+// What tells one state of a file from another without reading it. The default one is that of no file.
 struct FileIdentity {
   std::uint64_t device = 0, inode = 0;
   std::int64_t size = -1;
@@ -54,11 +54,17 @@ std::optional<FileIdentity> fileIdentity(const std::filesystem::path& path);
 
 struct FileContents {
   std::vector<std::byte> bytes;
+  // The file's, by which a later look may tell that it is unchanged; that of no file where it may not, since
+  // the file had just been written and a second write could leave no trace in its times.
   FileIdentity identity;
 };
 
-// Reads a regular file whole. Anything else (a folder, a pipe) fails at once with EINVAL and never blocks.
-int readRegularFile(const std::filesystem::path& path, FileContents& contents);
+inline constexpr std::size_t kMaximumFileSize = std::size_t{1} << 30;
+
+// Reads a regular file whole. Anything else (a folder, a pipe) fails at once with EINVAL and never blocks; a
+// file of more than `maximumSize` bytes fails with EFBIG.
+int readRegularFile(const std::filesystem::path& path, FileContents& contents,
+                    std::size_t maximumSize = kMaximumFileSize);
 
 // Makes the folder and its missing parents, mode 0700.
 int makeFolders(const std::filesystem::path& folder);

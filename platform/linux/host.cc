@@ -14,6 +14,9 @@ namespace tbdaily {
 namespace fs = std::filesystem;
 
 namespace {
+// A peer or a file can cause as many different lines as it likes.
+constexpr std::size_t kMostNotes = 1000;
+
 fs::path below(const fs::path& base, std::string_view absolutePath) {
   return base / (fs::path("/") / absolutePath).lexically_normal().relative_path();
 }
@@ -49,11 +52,12 @@ void Host::noteOnce(const std::string& line) {
   static std::mutex mutex;
   static std::set<std::string> written;
   const std::lock_guard lock(mutex);
-  if (!written.insert(line).second) return;
+  if (written.size() >= kMostNotes || !written.insert(line).second) return;
   std::string text(program_invocation_short_name);
   text.append(": ").append(line);
   for (char& c : text) {
-    if (c == '\n' || c == '\r') c = ' ';
+    // What a line quotes may come from outside.
+    if ((c >= '\0' && c < ' ') || c == '\x7f') c = ' ';
   }
   text += '\n';
   // A standard error that cannot be written leaves nobody to tell.

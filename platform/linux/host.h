@@ -31,7 +31,7 @@ class Host {
   int makeFolders(const std::filesystem::path& folder) const;
 
   // One line on standard error, prefixed by the program's name. The same line is written once in the life of
-  // a process.
+  // a process, and no more than a thousand altogether.
   static void noteOnce(const std::string& line);
   // For a file or folder that could not be written: one line for each kind of failure in the life of a
   // process, since a root that cannot be written fails every write in the same way.

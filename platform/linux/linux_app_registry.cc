@@ -1,7 +1,7 @@
 #include "platform/linux/linux_app_registry.h"
 
+#include <algorithm>
 #include <array>
-#include <fstream>
 
 namespace tbdaily {
 
@@ -31,10 +31,15 @@ std::string_view trimmed(std::string_view text) {
 // An entry of type Application that its owner did not mark as deleted. NoDisplay is no reason: such a program
 // is installed.
 bool isVisibleApplication(const fs::path& desktopEntry) {
-  std::ifstream file(desktopEntry);
+  constexpr std::size_t kMaximumSize = std::size_t{1} << 20;  // anybody with a home may put files there
+  FileContents contents;
+  if (readRegularFile(desktopEntry, contents, kMaximumSize) != 0) return false;
+  std::string_view rest(reinterpret_cast<const char*>(contents.bytes.data()), contents.bytes.size());
   bool inEntry = false, isApplication = false;
-  for (std::string line; std::getline(file, line);) {
-    const std::string_view text = trimmed(line);
+  while (!rest.empty()) {
+    const std::size_t end = std::min(rest.find('\n'), rest.size());
+    const std::string_view text = trimmed(rest.substr(0, end));
+    rest.remove_prefix(std::min(end + 1, rest.size()));
     if (text.starts_with('[')) {
       if (inEntry) break;
       inEntry = text == "[Desktop Entry]";

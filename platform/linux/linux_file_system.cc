@@ -42,9 +42,11 @@ std::optional<std::vector<std::byte>> LinuxFileSystem::readFile(std::string_view
 
 LibraryHandle LinuxDynamicLoader::open(std::string_view path) {
   std::error_code error;
-  const std::filesystem::path place = std::filesystem::canonical(host_.devicePath(path), error);
-  if (error) return nullptr;
-  for (const std::filesystem::path& checked : {place, place.parent_path()}) {
+  const std::filesystem::path named = host_.devicePath(path);
+  const std::filesystem::path place = std::filesystem::canonical(named, error);
+  if (error || !std::filesystem::is_regular_file(place, error)) return nullptr;
+  // Where the name is a link, whoever can replace that chooses the library too.
+  for (const std::filesystem::path& checked : {place, place.parent_path(), named.parent_path()}) {
     if (const std::string reason = whyUntrusted(checked); !reason.empty()) {
       Host::noteOnce("library " + place.native() + " is not loaded: " + checked.native() + ": " + reason);
       return nullptr;

@@ -30,6 +30,7 @@ void LinuxPreferences::read(const fs::path& place, Domain& domain) {
   domain.values = PlistValue::dictionary({});
   FileContents contents;
   if (const int error = readRegularFile(place, contents); error != 0) {
+    domain.identity = FileIdentity{};  // tried again at the next look
     domain.state = error == ENOENT ? FileState::Missing : FileState::Unreadable;
     if (error != ENOENT)
       Host::noteOnce("cannot read preferences " + place.native() + ": " + errorText(error));
@@ -56,7 +57,6 @@ LinuxPreferences::Domain& LinuxPreferences::current(std::string_view name) {
   if (!identity) {
     domain = Domain{};
   } else if (identity != domain.identity) {
-    domain.identity = identity;
     read(place, domain);
   }
   return domain;
@@ -98,7 +98,7 @@ bool LinuxPreferences::store(std::string_view name, Domain& domain, const PlistD
     Host::noteWriteFailure(place, error);
     return false;
   }
-  domain = Domain{fileIdentity(place), FileState::Readable, std::move(root)};
+  domain = Domain{FileIdentity{}, FileState::Readable, std::move(root)};  // just written, so read once more
   return true;
 }
 

@@ -9,6 +9,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <limits>
+#include <thread>
 
 #include "platform/linux/unix_socket.h"
 
@@ -20,6 +21,7 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::size_t kLengthSize = 4;
 constexpr std::size_t kReadSize = std::size_t{64} << 10;
+constexpr auto kRestWithoutDescriptors = std::chrono::milliseconds(20);
 
 std::size_t messageLength(std::span<const std::byte> received) {
   std::size_t length = 0;
@@ -117,7 +119,12 @@ bool LinuxServiceListener::fail(ServiceConnection peer, const std::string& reaso
 bool LinuxServiceListener::acceptPeer(ServiceConnection listener) {
   FileDescriptor socket(
       ::accept4(connections_.at(listener).socket.get(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
-  if (!socket.isOpen()) return false;
+  if (!socket.isOpen()) {
+    // The peer stays in the queue and the listener ready: without a rest the loop would spin.
+    if (errno == EMFILE || errno == ENFILE || errno == ENOBUFS || errno == ENOMEM)
+      std::this_thread::sleep_for(kRestWithoutDescriptors);
+    return false;
+  }
   if (!isTrustedPeer(socket.get())) {
     Host::noteOnce("a peer of another user was refused at the endpoint");
     return false;

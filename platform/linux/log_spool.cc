@@ -48,6 +48,14 @@ class FileOutput : public LogOutput {
   int error_ = 0;
 };
 
+// All of the text or none of it: half a line would spoil the next one too. Callers hold the lock.
+int appendWhole(int fd, std::string_view text) {
+  struct stat before {};
+  if (::fstat(fd, &before) != 0) return errno;
+  const int error = writeAll(fd, text);
+  return error != 0 && ::ftruncate(fd, before.st_size) != 0 ? errno : error;
+}
+
 std::vector<fs::path> filesIn(const fs::path& folder) {
   std::vector<fs::path> files;
   std::error_code error;
@@ -80,12 +88,13 @@ int placePair(const fs::path& stem, std::string_view type, TemporaryFile& meta, 
     if (fs::exists(fs::symlink_status(place, ignored)) || fs::exists(fs::symlink_status(metaPlace, ignored)))
       continue;
     if (const int error = meta.placeNew(metaPlace); error != 0) return error;
-    const int error = log.placeNew(place);
-    if (error != 0) {
-      ::unlink(metaPlace.c_str());
-      return error;
+    int error = log.placeNew(place);
+    if (error == 0) {
+      error = syncFolder(stem.parent_path());
+      if (error != 0) ::unlink(place.c_str());
     }
-    return syncFolder(stem.parent_path());
+    if (error != 0) ::unlink(metaPlace.c_str());
+    return error;
   }
   return EEXIST;
 }
@@ -150,7 +159,7 @@ void LogSpool::appendStructured(int type, const PlistDictionary& data, PlistDate
   if (error == 0) {
     const FileDescriptor fd(
         ::open(place.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0600));
-    error = fd.isOpen() ? writeAll(fd.get(), line) : errno;
+    error = fd.isOpen() ? appendWhole(fd.get(), line) : errno;
   }
   if (error != 0) Host::noteWriteFailure(place, error);
 }
@@ -201,14 +210,19 @@ void LogSpool::submitPending(PlistDate now) {
 
 void LogSpool::rollCarewell() {
   const fs::path carewell = folder() / "Carewell";
+  std::error_code ignored;
+  if (!fs::is_directory(carewell, ignored)) return;
+  FileLock lock;
+  if (const int error = lockSpool(lock); error != 0) return Host::noteWriteFailure(carewell, error);
   for (const fs::path& file : filesIn(carewell)) {
     if (file.extension() != ".log") continue;
     for (int generation = kCarewellGenerations; generation >= 1; --generation) {
       const fs::path older = file.native() + "." + std::to_string(generation);
       const fs::path newer =
           generation == 1 ? file : fs::path(file.native() + "." + std::to_string(generation - 1));
-      if (::rename(newer.c_str(), older.c_str()) != 0 && errno != ENOENT)
-        Host::noteWriteFailure(older, errno);
+      if (::rename(newer.c_str(), older.c_str()) == 0 || errno == ENOENT) continue;
+      Host::noteWriteFailure(older, errno);
+      break;  // going on would replace the generation that could not move
     }
   }
 }

@@ -7,13 +7,16 @@ namespace tbdaily {
 namespace {
 
 // The file is a list of shell assignments: a value may be quoted, and a backslash takes the next character as
-// it is.
+// it is; in double quotes only one that would mean something there.
 std::string unquote(std::string_view text) {
   std::string value;
   char quote = '\0';
   for (std::size_t i = 0; i < text.size(); ++i) {
     const char c = text[i];
-    if (c == '\\' && quote != '\'' && i + 1 < text.size()) {
+    const std::string_view next = text.substr(i + 1, 1);
+    const bool escapes =
+        quote == '\0' || (quote == '"' && std::string_view("\"\\$`").find(next) != next.npos);
+    if (c == '\\' && escapes && !next.empty()) {
       value += text[++i];
     } else if (quote == '\0' && (c == '"' || c == '\'')) {
       quote = c;
@@ -32,13 +35,13 @@ std::optional<std::string> osReleaseValue(const Host& host, std::string_view var
   for (const std::string_view place : {"/etc/os-release", "/usr/lib/os-release"}) {
     std::ifstream file(host.livePath(place));
     if (!file) continue;
+    std::optional<std::string> last;  // of two assignments the later one holds
     for (std::string line; std::getline(file, line);) {
       const std::size_t equals = line.find('=');
       if (equals == std::string::npos || std::string_view(line).substr(0, equals) != variable) continue;
-      std::string value = unquote(std::string_view(line).substr(equals + 1));
-      if (!value.empty()) return value;
+      last = unquote(std::string_view(line).substr(equals + 1));
     }
-    return std::nullopt;
+    return last && !last->empty() ? last : std::nullopt;
   }
   return std::nullopt;
 }

@@ -16,9 +16,10 @@ PlistValue Recordings::load(std::string_view file) {
   const std::filesystem::path place = path(file);
   const auto identity = fileIdentity(place);
   if (identity == loaded.identity) return loaded.root;
-  loaded = Loaded{identity, PlistValue::dictionary({})};
+  loaded = Loaded{};
   if (!identity) return loaded.root;
 
+  loaded.identity = FileIdentity{};  // what could not be read is tried again
   FileContents contents;
   if (const int error = readRegularFile(place, contents); error != 0) {
     if (error != ENOENT) Host::noteOnce("recording " + place.native() + " is ignored: " + errorText(error));

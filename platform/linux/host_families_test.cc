@@ -1,0 +1,301 @@
+// Recordings before the live host; the answers of each family that reads.
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+
+#include <functional>
+
+#include "platform/app_registry.h"
+#include "platform/device_answers.h"
+#include "platform/dynamic_loader.h"
+#include "platform/kernel.h"
+#include "platform/linux/host_identity.h"
+#include "platform/linux/os_release.h"
+#include "platform/linux/test_host.h"
+#include "platform/locale_settings.h"
+#include "platform/log_submission.h"
+#include "platform/message_digest.h"
+#include "platform/preferences_store.h"
+#include "platform/system_log.h"
+
+namespace tbdaily {
+namespace {
+
+namespace fs = std::filesystem;
+using testing::TestPlatform;
+using Texts = std::vector<std::string>;
+
+PlistValue text(const char* t) {
+  return PlistValue::string(t);
+}
+
+std::string joined(const Texts& texts) {
+  std::string all;
+  for (const std::string& t : texts) all += t + " ";
+  return all;
+}
+
+std::string bundleTypes(Platform& host) {
+  Texts types;
+  host.appRegistry.enumerateBundles(BundleKind::Application,
+                                    [&](std::string_view t) { types.emplace_back(t); });
+  std::ranges::sort(types);
+  return joined(types);
+}
+
+TEST(RecordingsTest, AnswerBeforeTheLiveHostEachForItself) {
+  TestPlatform device(true);
+  device.putLive("/etc/os-release", "BUILD_ID=b\nVERSION_ID=12\nPRETTY_NAME=\"Some OS 12\"\n");
+  device.putLive("/etc/machine-id", "0123456789abcdef0123456789abcdef\n");
+  device.putLive("/sys/class/dmi/id/product_name", "Board 7 \n");
+  device.putLive("/usr/share/locale/pt_BR/x", "");
+  device.putLive("/usr/share/locale/ca@valencia/x", "");
+  device.putLive("/usr/share/applications/a.desktop", "[Desktop Entry]\nType=Application\n");
+  ::setenv("LC_ALL", "de_AT.UTF-8@euro", 1);
+  ::setenv("LANGUAGE", "fr:de_AT::C", 1);
+  struct Case {
+    std::string_view file, key;
+    PlistValue recorded, wrongKind;
+    std::function<std::string(Platform&)> answer;
+    std::string whenRecorded, whenLive;
+  };
+  const PlistValue list = PlistValue::array({text("xx"), PlistValue::int64(1), text("yy")});
+  const PlistValue bundles =
+      PlistValue::array({PlistValue::dictionary({{"type", text("T")}}), text("no bundle")});
+  const PlistValue number = PlistValue::int64(5);
+  const std::vector<Case> cases{
+      {"answers.plist", "ProductBuildVersion", text("r"), number,
+       [](Platform& p) { return p.deviceAnswers.currentOSBuildVersion().value_or("-"); }, "r", "b"},
+      {"answers.plist", "ProductVersion", text("r"), number,
+       [](Platform& p) { return p.logSubmission.currentOSVersion(); }, "r", "12"},
+      {"answers.plist", "SystemVersion", text("r"), number,
+       [](Platform& p) { return p.logSubmission.systemVersion(); }, "r", "Some OS 12"},
+      // The keyed hash was computed with another implementation.
+      {"answers.plist", "SystemIdentifier", text("r"), number,
+       [](Platform& p) { return p.logSubmission.systemIdentifier(); }, "r",
+       "2224bb468643497eb065e4d7b56562ed"},
+      {"answers.plist", "HardwareModel", text("r"), number,
+       [](Platform& p) { return p.logSubmission.hardwareModel(); }, "r", "Board 7"},
+      {"answers.plist", "DiskUsage", text("r"), PlistValue(),
+       [](Platform& p) {
+         return std::string(p.deviceAnswers.copyAnswer("DiskUsage").asString().value_or("live"));
+       },
+       "r", "live"},
+      {"answers.plist", "MultiUser", PlistValue::boolean(true), PlistValue(),
+       [](Platform& p) { return std::to_string(p.deviceAnswers.multiUserMode().value_or(false)); }, "1", "0"},
+      {"locale.plist", "preferredLanguages", list, number,
+       [](Platform& p) { return joined(p.localeSettings.preferredLanguages()); }, "xx yy ", "fr de-AT "},
+      {"locale.plist", "systemLanguages", list, number,
+       [](Platform& p) { return joined(p.localeSettings.systemLanguages()); }, "xx yy ", "pt-BR "},
+      {"locale.plist", "countryCode", text("XX"), number,
+       [](Platform& p) { return p.localeSettings.countryCode().value_or("-"); }, "XX", "AT"},
+      {"apps.plist", "bundles", bundles, number, bundleTypes, "T ", "System "},
+  };
+  for (const Case& c : cases) {
+    EXPECT_EQ(c.answer(device.services), c.whenLive) << c.key;
+    device.record(c.file, c.key, c.recorded);
+    EXPECT_EQ(c.answer(device.services), c.whenRecorded) << c.key;
+    device.record(c.file, c.key, c.wrongKind);
+    EXPECT_EQ(c.answer(device.services), c.whenLive) << c.key;
+  }
+  ::unsetenv("LC_ALL");
+  ::unsetenv("LANGUAGE");
+  device.record("answers.plist", "MultiUser", number);
+  EXPECT_FALSE(device.services.deviceAnswers.multiUserMode());
+}
+
+TEST(RecordingsTest, AreReadAgainWhenTheyChangeOrCouldNotBeRead) {
+  TestPlatform device;
+  const auto build = [&] { return device.services.deviceAnswers.currentOSBuildVersion().value_or("-"); };
+  for (const char* same :
+       {"1", "2", "3", "4", "5", "6", "7", "8", "9"}) {  // in the same file, of the same length
+    device.record("answers.plist", "ProductBuildVersion", text(same));
+    EXPECT_EQ(build(), same);
+  }
+  device.put("/System/Device/answers.plist", "<plist><dict>");
+  EXPECT_EQ(build(), "-");
+  fs::remove(device.host.devicePath("/System/Device/answers.plist"));
+  fs::create_directory(device.host.devicePath("/System/Device/answers.plist"));
+  EXPECT_EQ(build(), "-");
+  fs::remove(device.host.devicePath("/System/Device/answers.plist"));
+  device.record("answers.plist", "ProductBuildVersion", text("x"));
+  device.services.preferences.setValue("k", text("v"), "d");
+
+  TestPlatform other;
+  LinuxPlatform late(device.host);
+  rlimit before{};
+  ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
+  const rlimit none{0, before.rlim_max};
+  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &none), 0);  // no descriptor is to be had for a moment
+  const auto buildThen = late.services().deviceAnswers.currentOSBuildVersion();
+  const PlistValue valueThen = late.services().preferences.getValue("k", "d");
+  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &before), 0);
+  EXPECT_TRUE(!buildThen && valueThen.isNone());
+  EXPECT_EQ(late.services().deviceAnswers.currentOSBuildVersion(), "x");
+  EXPECT_EQ(late.services().preferences.getValue("k", "d"), text("v"));
+}
+
+TEST(LinuxKernelTest, FillsSysctlsFromIntegersErrorsAndEvents) {
+  TestPlatform device;
+  Kernel& kernel = device.services.kernel;
+  const auto read = [&](const char* name, std::size_t room) {
+    PlistData buffer(room);
+    std::size_t length = room;
+    const int error = kernel.sysctlByName(name, buffer, length);
+    if (error != 0) return "errno " + std::to_string(error);
+    buffer.resize(length);
+    return plistText(PlistValue::data(buffer));
+  };
+  device.record(
+      "kernel.plist", "sysctl",
+      PlistValue::dictionary({{"int", PlistValue::int64(-2)}, {"text", text("x")}, {"bad", text("x")}}));
+  device.record(
+      "kernel.plist", "eccEvents",
+      PlistValue::array({PlistValue::data(PlistData(3, std::byte{1})), PlistValue::data({std::byte{2}})}));
+  const auto setErrors = [&](std::int64_t number) {
+    device.record("kernel.plist", "errno",
+                  PlistValue::dictionary({{"bad", PlistValue::int64(number)},
+                                          {"kern.next_ecc_event", PlistValue::int64(number)}}));
+  };
+  setErrors(5);
+  EXPECT_EQ(read("int", 4), "<feffffff>");
+  EXPECT_EQ(read("int", 8), "<feffffffffffffff>");
+  EXPECT_EQ(read("int", 5), "errno 22");
+  EXPECT_EQ(read("text", 8), "errno 2");
+  EXPECT_EQ(read("bad", 8), "errno 5");
+  EXPECT_EQ(read("vm.swapusage", 32), "errno 2");
+  EXPECT_EQ(read("kern.next_ecc_event", 8), "<010101>");
+  EXPECT_EQ(read("kern.next_ecc_event", 8), "<02>");
+  EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 5");
+  setErrors(std::int64_t{1} << 40);  // no error number
+  EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 2");
+
+  TestPlatform live(true);
+  Kernel& running = live.services.kernel;
+  PlistData swap(40);
+  std::size_t length = swap.size();
+  EXPECT_EQ(running.sysctlByName("vm.swapusage", swap, length), 0);
+  EXPECT_EQ(length, 32U);
+  live.record("clock.plist", "numerator", PlistValue::int64(std::int64_t{1} << 32));
+  const std::uint64_t ticks = running.tickCount();
+  EXPECT_LT(ticks, running.tickCount());
+  EXPECT_EQ(running.timebase()->numerator, 1U);
+  EXPECT_GT(running.currentTime().secondsSinceReference, 7e8);
+}
+
+TEST(HostIdentityTest, ReadsTextsAsTheirWritersMeantThem) {
+  testing::TestHost device(true);
+  EXPECT_EQ(osReleaseValue(device.host, "V"), std::nullopt);
+  device.putLive("/usr/lib/os-release", "V=fallback\n");
+  EXPECT_EQ(osReleaseValue(device.host, "V"), "fallback");
+  const std::vector<std::pair<std::string, std::optional<std::string>>> cases{
+      {"V=plain", "plain"},     {"V=\"a b\"\n", "a b"},
+      {"V='a \"b'\n", "a \"b"}, {"V=\"a\\\"\\$b\"", "a\"$b"},
+      {"V=\"a\\nb\"", "a\\nb"}, {"V='a\\b'", "a\\b"},
+      {"V=a\\ b", "a b"},       {"V=", std::nullopt},
+      {"V", std::nullopt},      {"#V=c\nVV=d", std::nullopt},
+      {"V=\"open", "open"},     {"V=first\nV=last\n", "last"},
+      {"V=a\\", "a\\"},
+  };
+  for (const auto& [file, value] : cases) {
+    device.putLive("/etc/os-release", file);
+    EXPECT_EQ(osReleaseValue(device.host, "V"), value) << file;
+  }
+  for (const char* bad :
+       {"", "uninitialized\n", "0123456789ABCDEF0123456789abcdef", "0123456789abcdef0123456789abcde"}) {
+    device.putLive("/etc/machine-id", bad);
+    EXPECT_EQ(hashedMachineIdentifier(device.host), "") << bad;
+  }
+  EXPECT_EQ(hardwareModelName(device.host), "");
+  device.putLive("/proc/device-tree/model", std::string("Board\0", 6));
+  EXPECT_EQ(hardwareModelName(device.host), "Board");
+  const std::string uuid = randomUuid();
+  EXPECT_TRUE(uuid.size() == 36 && uuid[14] == '4' &&
+              std::string_view("89AB").find(uuid[19]) != std::string::npos)
+      << uuid;
+}
+
+TEST(LinuxLocaleSettingsTest, ChoosesTheBestLocalizations) {
+  TestPlatform device;
+  struct Case {
+    Texts available, preferred;
+    std::string best;
+  };
+  for (const Case& c : {
+           Case{{"de", "en"}, {"en-GB"}, "en "},
+           Case{{"en", "en-GB"}, {"en-GB", "en-US"}, "en-GB en "},
+           Case{{"zh", "zh_Hant", "zh_Hant_TW"}, {"zh-Hant-TW"}, "zh_Hant_TW "},
+           Case{{"zh", "ZH_hant"}, {"zh-Hant-TW"}, "ZH_hant "},
+           Case{{"pt-BR"}, {"pt", "PT_br"}, "pt-BR "},
+           Case{{"de", "en"}, {"en-GB", "de", "en-US"}, "en de "},
+           Case{{"", "de"}, {"fr", ""}, ""},
+           Case{{}, {"fr"}, ""},
+       }) {
+    EXPECT_EQ(joined(device.services.localeSettings.bestLocalizations(c.available, c.preferred)), c.best);
+  }
+}
+
+TEST(LinuxAppRegistryTest, CountsTheApplicationsAmongTheDesktopEntries) {
+  TestPlatform device(true);
+  const std::string application = "[Desktop Entry]\nName=a\nType = Application \r\n[Other]\nHidden=true\n";
+  const std::string shared = "/usr/share/applications/";
+  device.putLive(shared + "a.desktop", application);
+  device.putLive(shared + "kde/b.desktop", "# c\n\n" + application);
+  device.putLive(shared + "link.desktop", "[Desktop Entry]\nType=Link\n");
+  device.putLive(shared + "hidden.desktop", "[Desktop Entry]\nType=Application\nHidden=true");
+  device.putLive(shared + "late.desktop", "[Other]\nType=Application\n");
+  device.putLive(shared + "a.desktop.bak", application);
+  device.putLive("/usr/local/share/applications/c.desktop", application);
+  device.putLive("/var/lib/flatpak/exports/share/applications/d.desktop", application);
+  device.putLive("/home/me/.local/share/applications/e.desktop", application);
+  device.putLive("/home/me/.local/share/applications/huge.desktop", application);
+  fs::resize_file(device.host.livePath("/home/me/.local/share/applications/huge.desktop"),
+                  std::uintmax_t{1} << 40);
+  ASSERT_EQ(::mkfifo(device.host.livePath("/home/me/.local/share/applications/pipe.desktop").c_str(), 0600),
+            0);
+  EXPECT_EQ(bundleTypes(device.services), "System System User User User ");
+}
+
+TEST(LinuxDynamicLoaderTest, RefusesWhatOthersCanWrite) {
+  TestPlatform device;
+  const fs::path folder = device.host.devicePath("/lib"), library = folder / "Support";
+  fs::create_directory(folder);
+  fs::copy_file(SUPPORT_LIBRARY, library);
+  const auto opens = [&](const char* path) { return device.services.dynamicLoader.open(path) != nullptr; };
+  for (const auto& [place, mode] :
+       {std::pair(library, 0722U), {library, 0702U}, {folder, 0720U}, {folder, 0707U}}) {
+    fs::permissions(place, static_cast<fs::perms>(mode));
+    EXPECT_FALSE(opens("/lib/Support")) << place << mode;
+    fs::permissions(place, static_cast<fs::perms>(0700));
+  }
+  if (::geteuid() == 0) {
+    ASSERT_EQ(::chown(library.c_str(), 4711, 0), 0);
+    EXPECT_FALSE(opens("/lib/Support"));
+    ASSERT_EQ(::chown(library.c_str(), 0, 0), 0);
+  }
+  fs::create_directory(device.host.devicePath("/open"));
+  fs::permissions(device.host.devicePath("/open"), static_cast<fs::perms>(0777));
+  fs::create_symlink(library, device.host.devicePath("/open/link"));
+  EXPECT_FALSE(opens("/open/link"));
+  fs::create_symlink(library, folder / "link");
+  EXPECT_TRUE(opens("/lib/link"));
+  ASSERT_EQ(::mkfifo((folder / "pipe").c_str(), 0600), 0);
+  EXPECT_FALSE(opens("/lib/pipe"));  // and does not wait for a writer
+  EXPECT_FALSE(opens("/lib"));
+}
+
+TEST(LinuxMessageDigestTest, IsMd5) {
+  TestPlatform device;
+  for (const auto& [message, digest] :
+       {std::pair("", "<d41d8cd98f00b204e9800998ecf8427e>"),
+        {"message digest", "<f96b697d7cb7938d525a2f31aaf161d0>"},
+        {"12345678901234567890123456789012345678901234567890123456789012345678901234567890",
+         "<57edf4a22be3c955ac49da2e2107b67a>"}}) {
+    const Md5Digest md5 =
+        device.services.messageDigest.md5(std::as_bytes(std::span(std::string_view(message))));
+    EXPECT_EQ(plistText(PlistValue::data({md5.begin(), md5.end()})), digest);
+  }
+}
+
+}  // namespace
+}  // namespace tbdaily

@@ -1,0 +1,69 @@
+// A device root and a made-up live host in a folder of their own, for one test.
+#pragma once
+
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <vector>
+
+#include "platform/linux/linux_platform.h"
+#include "platform/linux/property_list_codec.h"
+#include "platform/linux/recordings.h"
+#include "testing/temporary_folder.h"
+
+namespace tbdaily::testing {
+
+struct TestHost {
+  explicit TestHost(bool live = false) : host(folder.path() / "root", live, folder.path() / "live") {
+    std::filesystem::create_directories(host.root());
+  }
+
+  TemporaryFolder folder;
+  Host host;
+  LinuxPropertyListCodec codec;
+
+  static void putAt(const std::filesystem::path& place, std::string_view contents) {
+    std::filesystem::create_directories(place.parent_path());
+    std::ofstream(place, std::ios::binary) << contents;
+  }
+  void put(std::string_view path, std::string_view contents) { putAt(host.devicePath(path), contents); }
+  void putLive(std::string_view path, std::string_view contents) { putAt(host.livePath(path), contents); }
+  std::string text(std::string_view path) {
+    std::ifstream file(host.devicePath(path), std::ios::binary);
+    return {std::istreambuf_iterator<char>(file), {}};
+  }
+  // The names in a folder of the device, in byte order.
+  std::vector<std::string> names(std::string_view path) {
+    std::vector<std::string> all;
+    std::error_code ignored;
+    for (const auto& entry : std::filesystem::directory_iterator(host.devicePath(path), ignored))
+      all.push_back(entry.path().filename());
+    std::ranges::sort(all);
+    return all;
+  }
+
+  PlistValue parse(std::string_view list) { return codec.parse(std::as_bytes(std::span(list))).value; }
+
+  // Replaces one entry of a recording; a none value takes it away.
+  void record(std::string_view file, std::string_view key, const PlistValue& value) {
+    const std::string place = "/System/Device/" + std::string(file);
+    const PlistValue before = parse(text(place));
+    PlistDictionary root = before.asDictionary() != nullptr ? *before.asDictionary() : PlistDictionary();
+    root.set(key, value);
+    put(place, codec.write(PlistValue::dictionary(std::move(root))).bytes);
+  }
+  void setClock(double unixSeconds) {
+    record(recording::kClock, "now", PlistValue(PlistDate::fromUnixSeconds(unixSeconds)));
+  }
+};
+
+// A Linux platform over it.
+struct TestPlatform : TestHost {
+  explicit TestPlatform(bool live = false) : TestHost(live) {}
+  LinuxPlatform linuxPlatform{host};
+  Platform& services = linuxPlatform.services();
+};
+
+}  // namespace tbdaily::testing
