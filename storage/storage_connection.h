@@ -1,0 +1,141 @@
+// Finding the storage controller in the driver registry, talking to it, and fetching its statistics. Each
+// call finds, opens, closes and releases on its own; troubles are told on standard error and end in "none" or
+// false.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <span>
+
+#include "platform/driver_registry.h"
+#include "storage/diagnostics.h"
+#include "storage/exporters.h"
+#include "storage/stx_request.h"
+
+namespace tbdaily {
+
+// The first service of the first row that has one, or 0. Always writes the descriptor: the row where the
+// search stopped, which is the empty one when nothing matched. The caller releases the service.
+KdHandle findNandExporter(DriverRegistry& registry, const NandExporter*& descriptor,
+                          NandExporterTable exporters = nand_exporters);
+
+// The same as an owner: the destructor releases the service.
+class StorageService {
+ public:
+  explicit StorageService(DriverRegistry& registry, NandExporterTable exporters = nand_exporters);
+  ~StorageService();
+  StorageService(const StorageService&) = delete;
+  StorageService& operator=(const StorageService&) = delete;
+
+  explicit operator bool() const { return handle_ != 0; }
+  KdHandle handle() const { return handle_; }
+  // Never null: the empty row when there is no service.
+  const NandExporter& descriptor() const { return *descriptor_; }
+  DriverRegistry& registry() const { return registry_; }
+
+ private:
+  DriverRegistry& registry_;
+  const NandExporter* descriptor_ = nullptr;
+  KdHandle handle_ = 0;
+};
+
+// A page-aligned buffer that a driver fills. Its bytes are indeterminate until then.
+class StorageBuffer {
+ public:
+  // No memory: a buffer that is false.
+  explicit StorageBuffer(std::size_t size);
+
+  explicit operator bool() const { return memory_ != nullptr; }
+  std::span<std::byte> all() { return {memory_.get(), size_}; }
+  // What the last fetch filled; only these bytes may be read.
+  std::span<const std::byte> filled() const { return {memory_.get(), filled_}; }
+  // More than the buffer holds counts as all of it.
+  void setFilled(std::size_t size) { filled_ = size < size_ ? size : size_; }
+
+ private:
+  struct Release {
+    void operator()(std::byte* memory) const;
+  };
+  std::unique_ptr<std::byte, Release> memory_;
+  std::size_t size_;
+  std::size_t filled_ = 0;
+};
+
+// A connection of user-client type 0. The destructor closes it, and says so when that fails. Borrows the
+// service, which outlives it, and the diagnostics.
+class StorageConnection {
+ public:
+  // Says "Could not get connection to service\n" and is false when the service does not open.
+  StorageConnection(const StorageService& service, Diagnostics& diagnostics);
+  ~StorageConnection();
+  StorageConnection(const StorageConnection&) = delete;
+  StorageConnection& operator=(const StorageConnection&) = delete;
+
+  explicit operator bool() const { return handle_ != 0; }
+
+  // One call; `request` may be null (no input structure). `outputSize` is the number of bytes filled. Says
+  // nothing.
+  KdStatus call(std::uint32_t method, const StxRequest* request, std::span<std::byte> output,
+                std::size_t& outputSize) const;
+  // How many bytes the buffer holds, through the descriptor's size method; bytes that the driver does not
+  // answer are 0. Says nothing.
+  KdStatus querySize(const StxRequest* request, std::uint32_t& size) const;
+  // The buffer itself, through the descriptor's data method. Says nothing.
+  KdStatus fetch(const StxRequest* request, StorageBuffer& buffer) const;
+
+ private:
+  const StorageService& service_;
+  Diagnostics& diagnostics_;
+  KdHandle handle_ = 0;
+};
+
+// Fetches the statistics buffer and has the descriptor's function parse it into the context, which the caller
+// provides zero-filled. Always writes the descriptor. True when the buffer was fetched and accepted; the
+// context may hold values after a refusal too.
+bool FetchStatsContext(DriverRegistry& registry, const NandExporter*& descriptor, StatsContext& context,
+                       Diagnostics& diagnostics = standardDiagnostics(),
+                       NandExporterTable exporters = nand_exporters);
+
+// FetchStatsContext as an owner: the destructor releases the context through its descriptor, whether the
+// fetch succeeded or not.
+class FetchedStats {
+ public:
+  explicit FetchedStats(DriverRegistry& registry, Diagnostics& diagnostics = standardDiagnostics(),
+                        NandExporterTable exporters = nand_exporters);
+  ~FetchedStats();
+  FetchedStats(const FetchedStats&) = delete;
+  FetchedStats& operator=(const FetchedStats&) = delete;
+
+  explicit operator bool() const { return fetched_; }
+  const StatsContext& context() const { return context_; }
+
+ private:
+  const NandExporter* descriptor_ = nullptr;
+  StatsContext context_;
+  bool fetched_;
+};
+
+// A connection by hand, for callers that keep it open: 0, or a handle that FlashDisconnect closes. Writes the
+// descriptor as findNandExporter does.
+KdHandle FlashConnect(DriverRegistry& registry, const NandExporter*& descriptor,
+                      Diagnostics& diagnostics = standardDiagnostics(),
+                      NandExporterTable exporters = nand_exporters);
+void FlashDisconnect(DriverRegistry& registry, KdHandle connection,
+                     Diagnostics& diagnostics = standardDiagnostics());
+
+// Service and connection by hand. Zero handles mean none.
+struct StxConnection {
+  KdHandle service = 0;
+  KdHandle connection = 0;
+  const NandExporter* descriptor = nullptr;
+};
+
+// Fills a record that holds nothing. False, and nothing held, when there is no controller of this family.
+bool openSTXConnection(DriverRegistry& registry, StxConnection& connection,
+                       Diagnostics& diagnostics = standardDiagnostics(),
+                       NandExporterTable exporters = nand_exporters);
+// Closes and releases what the record holds, and zeroes the handles.
+void closeSTXConnection(DriverRegistry& registry, StxConnection& connection);
+
+}  // namespace tbdaily
