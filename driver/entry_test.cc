@@ -43,6 +43,7 @@ class EntryTest : public ::testing::Test {
     gEnvironmentProbeCache = {};
     fake_.analyticsClient.today = kToday;
     fake_.logSubmission.enabled = true;
+    fake_.usageService.records = PlistValue::array({});  // a reply at once
     fake_.analyticsHistory.addScalar("k", kToday - 1, 1);
     fake_.analyticsHistory.addScalar("k", kToday, 2);
     fake_.putPlist(

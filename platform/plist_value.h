@@ -140,6 +140,13 @@ class PlistDictionary {
   // A key that is there keeps its place and takes the new value. A none value removes the key.
   void set(std::string_view key, PlistValue value);
   void remove(std::string_view key);
+  // Removes every key for which the predicate holds, at the cost of one pass.
+  template <typename Predicate>
+  void removeIf(const Predicate& isRemoved) {
+    std::erase_if(entries_,
+                  [&isRemoved](const Entry& entry) { return isRemoved(std::string_view(entry.first)); });
+    rebuildIndex();
+  }
 
   bool empty() const { return entries_.empty(); }
   std::size_t size() const { return entries_.size(); }

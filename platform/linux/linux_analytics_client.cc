@@ -55,6 +55,21 @@ void LinuxAnalyticsClient::addValueForScalarKey(std::string_view key, std::int64
   if (!result.ok()) noteLostWrite(*target, key, result);
 }
 
+void LinuxAnalyticsClient::addValuesForScalarKeys(std::span<const ScalarIncrement> increments) {
+  AnalyticsStore* target = store();
+  if (target == nullptr || increments.empty()) return;
+  const DayNumber today = currentDayNumber();
+  if (const StoreResult begun = target->beginLoad(); !begun.ok()) {
+    return noteLostWrite(*target, increments.front().key, begun);
+  }
+  for (const auto& [key, increment] : increments) {
+    const StoreResult result = target->addScalar(key, today, increment);
+    if (!result.ok()) noteLostWrite(*target, key, result);
+  }
+  const StoreResult committed = target->commitLoad();
+  if (!committed.ok()) noteLostWrite(*target, increments.front().key, committed);
+}
+
 AnalyticsStore* LinuxAnalyticsClient::store() {
   const std::lock_guard lock(mutex_);
   if (!store_) {

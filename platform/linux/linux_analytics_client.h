@@ -25,6 +25,8 @@ class LinuxAnalyticsClient : public AnalyticsClient {
   void checkpoint() override;
   void setValueForScalarKey(std::string_view key, std::int64_t value) override;
   void addValueForScalarKey(std::string_view key, std::int64_t increment) override;
+  // In one transaction; an increment that is refused does not keep the others from being written.
+  void addValuesForScalarKeys(std::span<const ScalarIncrement> increments) override;
 
  private:
   // Null while the store has no place.

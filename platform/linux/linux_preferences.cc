@@ -3,7 +3,10 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
+#include <unordered_map>
+#include <vector>
 
 namespace tbdaily {
 
@@ -64,6 +67,7 @@ LinuxPreferences::Domain& LinuxPreferences::current(std::string_view name) {
 
 PlistValue LinuxPreferences::getValue(std::string_view key, std::string_view domain) {
   if (!acceptsDomain(domain)) return {};
+  const std::lock_guard guard(mutex_);
   return current(domain).values.asDictionary()->get(key);
 }
 
@@ -85,39 +89,87 @@ bool LinuxPreferences::moveAside(const fs::path& place) {
   return false;
 }
 
-bool LinuxPreferences::store(std::string_view name, Domain& domain, const PlistDictionary& values) {
-  const fs::path place = file(name);
-  PlistValue root = PlistValue::dictionary(values);
-  const PlistWriteResult written = codec_.write(root, PlistForm::Exact);
-  if (!written.ok) {
+bool LinuxPreferences::isWritable(const Change& change, std::string_view name) {
+  PlistDictionary alone;
+  alone.set(change.key, change.value);
+  const PlistWriteResult written = codec_.write(PlistValue::dictionary(std::move(alone)), PlistForm::Exact);
+  if (!written.ok)
     Host::noteOnce("a preference of " + std::string(name) + " cannot be written: " + written.error);
-    return false;
-  }
-  if (domain.state == FileState::Damaged && !moveAside(place)) return false;
-  if (const int error = replaceFile(place, written.bytes); error != 0) {
-    Host::noteWriteFailure(place, error);
-    return false;
-  }
-  domain = Domain{FileIdentity{}, FileState::Readable, std::move(root)};  // just written, so read once more
-  return true;
+  return written.ok;
 }
 
-void LinuxPreferences::setValue(std::string_view key, const PlistValue& value, std::string_view name) {
+PlistDictionary LinuxPreferences::changed(PlistDictionary values, std::span<const Change> changes) {
+  // The last change of a key decides; all removals at once, since each costs a pass over the domain.
+  std::unordered_map<std::string_view, const PlistValue*> last;
+  for (const Change& change : changes) last[change.key] = &change.value;
+  values.removeIf([&last](std::string_view key) {
+    const auto found = last.find(key);
+    return found != last.end() && found->second->isNone();
+  });
+  for (const Change& change : changes) {
+    if (!last[change.key]->isNone()) values.set(change.key, *last[change.key]);
+  }
+  return values;
+}
+
+std::string LinuxPreferences::bytesOf(std::string_view name, Domain& domain,
+                                      std::span<const Change> changes) {
+  const PlistDictionary before = *domain.values.asDictionary();
+  domain.values = PlistValue::dictionary(changed(before, changes));
+  PlistWriteResult result = codec_.write(domain.values, PlistForm::Exact);
+  if (result.ok) return std::move(result.bytes);
+  // One value that no file can hold must not cost the others their place.
+  std::vector<Change> writable;
+  for (const Change& change : changes) {
+    if (isWritable(change, name)) writable.push_back(change);
+  }
+  domain.values = PlistValue::dictionary(changed(before, writable));
+  return codec_.write(domain.values, PlistForm::Exact).bytes;
+}
+
+void LinuxPreferences::changeDomain(std::string_view name, std::span<const Change> changes) {
   if (!acceptsDomain(name)) return;
-  const fs::path lockFile = file(name).native() + ".lock";
-  if (value.isNone() && !fileIdentity(file(name))) return;  // nothing to remove, nothing to make
+  const fs::path place = file(name);
+  const bool onlyRemoves =
+      std::all_of(changes.begin(), changes.end(), [](const Change& c) { return c.value.isNone(); });
+  if (onlyRemoves && !fileIdentity(place)) return;  // nothing to remove, nothing to make
   if (const int error = host_.makeFolders(folder()); error != 0)
     return Host::noteWriteFailure(folder(), error);
+  const fs::path lockFile = place.native() + ".lock";
   FileLock lock;
   if (const int error = lock.acquire(lockFile); error != 0) return Host::noteWriteFailure(lockFile, error);
 
   Domain& domain = current(name);
   if (domain.state == FileState::Unreadable)
     return;  // named when it was read; replacing it would lose what it holds
-  PlistDictionary values = *domain.values.asDictionary();
-  if (value.isNone() && !values.contains(key) && domain.state != FileState::Damaged) return;
-  values.set(key, value);
-  store(name, domain, values);
+  const PlistDictionary& stored = *domain.values.asDictionary();
+  const bool changesNothing =
+      onlyRemoves && std::none_of(changes.begin(), changes.end(),
+                                  [&stored](const Change& c) { return stored.contains(c.key); });
+  if (changesNothing && domain.state != FileState::Damaged) return;
+  if (domain.state == FileState::Damaged && !moveAside(place)) return;
+  const std::string bytes = bytesOf(name, domain, changes);
+  domain.identity = FileIdentity{};  // read anew at the next look, whatever becomes of the write
+  if (bytes.empty()) return;
+  if (const int error = replaceFile(place, bytes); error != 0) Host::noteWriteFailure(place, error);
+}
+
+void LinuxPreferences::setValue(std::string_view key, const PlistValue& value, std::string_view name) {
+  const std::lock_guard guard(mutex_);
+  const Change change{key, value};
+  changeDomain(name, std::span(&change, 1));
+}
+
+void LinuxPreferences::applyChanges(std::span<const PreferenceChange> changes) {
+  const std::lock_guard guard(mutex_);
+  std::map<std::string_view, std::vector<Change>> byDomain;
+  std::vector<std::string_view> inOrder;
+  for (const PreferenceChange& change : changes) {
+    std::vector<Change>& series = byDomain[change.domain];
+    if (series.empty()) inOrder.push_back(change.domain);
+    series.push_back({change.key, change.value});
+  }
+  for (const std::string_view domain : inOrder) changeDomain(domain, byDomain[domain]);
 }
 
 void LinuxPreferences::synchronize(std::string_view name) {

@@ -6,6 +6,7 @@
 #pragma once
 
 #include <map>
+#include <mutex>
 #include <optional>
 #include <string>
 
@@ -22,6 +23,8 @@ class LinuxPreferences : public PreferencesStore {
 
   PlistValue getValue(std::string_view key, std::string_view domain) override;
   void setValue(std::string_view key, const PlistValue& value, std::string_view domain) override;
+  // Writes each domain once. A value that no file can hold is left out and named.
+  void applyChanges(std::span<const PreferenceChange> changes) override;
   void synchronize(std::string_view domain) override;
 
   std::filesystem::path folder() const;
@@ -39,11 +42,21 @@ class LinuxPreferences : public PreferencesStore {
   // The domain as its file stands now; parsed anew only when the file changed.
   Domain& current(std::string_view domain);
   void read(const std::filesystem::path& place, Domain& domain);
-  bool store(std::string_view name, Domain& domain, const PlistDictionary& values);
+  struct Change {
+    std::string_view key;
+    PlistValue value;  // none removes the key
+  };
+  // A read-modify-write of the domain's file, under its lock.
+  void changeDomain(std::string_view name, std::span<const Change> changes);
+  static PlistDictionary changed(PlistDictionary values, std::span<const Change> changes);
+  // The file's contents after the changes; empty when they cannot be written.
+  std::string bytesOf(std::string_view name, Domain& domain, std::span<const Change> changes);
+  bool isWritable(const Change& change, std::string_view name);
   static bool moveAside(const std::filesystem::path& place);
 
   const Host& host_;
   PropertyListCodec& codec_;
+  std::mutex mutex_;  // over what follows: a usage reply is processed on a thread of its own
   std::map<std::string, Domain, std::less<>> domains_;
 };
 

@@ -58,6 +58,7 @@ bool LinuxSystemLog::isEnabled(LogLevel level) {
 }
 
 bool LinuxSystemLog::showsPrivate() {
+  const std::lock_guard guard(mutex_);
   if (!showsPrivate_) {
     showsPrivate_ = environmentIs("TBDAILY_LOG_PRIVATE", "show") || answers_.booleanAnswer("InternalBuild");
   }
@@ -87,6 +88,7 @@ void LinuxSystemLog::writeLine(LogLevel level, std::string_view message) {
 }
 
 void LinuxSystemLog::append(const std::string& lines) {
+  const std::lock_guard guard(mutex_);
   if (toStandardError_) {
     writeAll(STDERR_FILENO, lines);
     return;

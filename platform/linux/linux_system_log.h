@@ -2,6 +2,7 @@
 // TBDAILY_LOG=stderr.
 #pragma once
 
+#include <mutex>
 #include <optional>
 #include <string>
 
@@ -33,6 +34,7 @@ class LinuxSystemLog : public SystemLog {
   bool toStandardError_;
   bool journal_;
   bool debug_;
+  std::mutex mutex_;  // over what follows
   std::optional<bool> showsPrivate_;
   FileDescriptor file_;
 };

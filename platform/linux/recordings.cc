@@ -9,6 +9,7 @@ std::filesystem::path Recordings::path(std::string_view file) const {
 }
 
 PlistValue Recordings::load(std::string_view file) {
+  const std::lock_guard guard(mutex_);
   auto found = loaded_.find(file);
   if (found == loaded_.end()) found = loaded_.emplace(std::string(file), Loaded{}).first;
   Loaded& loaded = found->second;

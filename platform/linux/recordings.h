@@ -2,6 +2,7 @@
 #pragma once
 
 #include <map>
+#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -34,6 +35,7 @@ class Recordings {
 
   const Host& host_;
   PropertyListCodec& codec_;
+  std::mutex mutex_;  // a usage reply is processed on a thread of its own
   std::map<std::string, Loaded, std::less<>> loaded_;
 };
 

@@ -1,0 +1,107 @@
+#include "driver/data_usage.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <limits>
+
+#include "testing/fake_platform.h"
+
+namespace tbdaily {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+constexpr DayNumber kToday = 20781;
+const PlistDate kMorning = PlistDate::fromUnixSeconds(kToday * 86400.0 + 0.125);
+constexpr const char* kOwn = "com.velmora.sysmetrics.tbdaily";
+
+PlistValue record(const char* nameKey, const char* name, PlistDate since,
+                  std::vector<std::int64_t> counters) {
+  PlistDictionary entries{{nameKey, PlistValue::string(name)}, {"since", PlistValue(since)}};
+  for (std::size_t i = 0; i < counters.size(); ++i)
+    entries.set(kTrafficFields[i], PlistValue::int64(counters[i]));
+  return PlistValue::dictionary(std::move(entries));
+}
+
+class DataUsageTest : public ::testing::Test {
+ protected:
+  DataUsageTest() { fake_.analyticsClient.today = kToday; }
+  // The increments of one run.
+  std::vector<std::string> run(PlistArray records) {
+    fake_.usageService.records = PlistValue::array(std::move(records));
+    fake_.analyticsClient.calls.clear();
+    CollectDataUsage(fake_.platform);
+    fake_.usageService.waitForReplies();
+    return fake_.analyticsClient.calls;
+  }
+  PlistValue baseline() { return fake_.preferences.getValue(kUsageBaselineKey, kOwn); }
+
+  testing::FakePlatform fake_;
+};
+
+TEST_F(DataUsageTest, FirstRunsCountInFullOnlyWhatBeganSinceYesterday) {
+  const PlistDate old = dateOf(kToday - 2);
+  EXPECT_THAT(run({record("bundleName", "b", kMorning, {1024, 1023, -2048}),
+                   record("procName", "p", old, {5000, 5000, 5000, 5000}),
+                   record("procName", "y", dateOf(kToday - 1), {2048})}),
+              ElementsAre("add datausage.wifiInKB.b 1", "add datausage.wwanInKB.b -2",
+                          "add datausage.olddata.com.velmora.p 1", "add datausage.wifiInKB.com.velmora.y 2"));
+  EXPECT_EQ(baseline().asDictionary()->get("b"),
+            PlistValue::array({PlistValue(kMorning), PlistValue::int64(1024), PlistValue::int64(1023),
+                               PlistValue::int64(-2048), PlistValue::int64(0)}));
+  EXPECT_EQ(fake_.preferences.writes.back(), std::string("synchronize ") + kOwn);
+}
+
+TEST_F(DataUsageTest, LaterRunsCountTheDifference) {
+  run({record("bundleName", "b", kMorning, {1000, 9000, 500, 500}),
+       record("bundleName", "gone", kMorning, {1})});
+  EXPECT_THAT(run({record("bundleName", "b", kMorning, {6000, 100, 1523, 500})}),
+              ElementsAre("add datausage.wifiInKB.b 4", "add datausage.baddata.b 1"));
+  EXPECT_EQ(baseline().asDictionary()->size(), 1U);  // who is not in the reply is forgotten
+  EXPECT_THAT(run({record("bundleName", "b", kMorning, {6000, 100, 2600, 500})}),
+              ElementsAre("add datausage.wwanInKB.b 1"));
+  const PlistDate restarted{kMorning.secondsSinceReference + 0.5};
+  EXPECT_THAT(run({record("bundleName", "b", restarted, {4096, 0, 0, 0})}),
+              ElementsAre("add datausage.wifiInKB.b 4"));
+  // The difference wraps at 64 bits.
+  EXPECT_THAT(run({record("bundleName", "b", restarted, {std::numeric_limits<std::int64_t>::min()})}),
+              ElementsAre("add datausage.wifiInKB.b 9007199254740988"));
+  EXPECT_THAT(run({record("bundleName", "b", restarted, {std::numeric_limits<std::int64_t>::max()})}),
+              ElementsAre("add datausage.baddata.b 1"));
+}
+
+TEST_F(DataUsageTest, WhatIsNotAsItShouldBeIsSkipped) {
+  const auto odd = PlistValue::dictionary({{"bundleName", PlistValue::int64(5)},
+                                           {"procName", PlistValue::string("p")},
+                                           {"since", PlistValue(kMorning)},
+                                           {"wifiInBytes", PlistValue::string("x")},
+                                           {"wwanOutBytes", PlistValue::float64(2048.9)}});
+  fake_.preferences.domains[kOwn] = {
+      {std::string(kUsageBaselineKey),
+       PlistValue::dictionary(
+           {{"p", PlistValue::array({PlistValue::int64(1)})}, {"b", PlistValue::array({})}})}};
+  EXPECT_THAT(run({PlistValue::string("no record"), odd, record("other", "n", kMorning, {4096}),
+                   PlistValue::dictionary({{"procName", PlistValue::string("no since")}}),
+                   record("procName", "bad\x01name", kMorning, {4096}),
+                   record("bundleName", "b", kMorning, {1024}), record("bundleName", "b", kMorning, {2048})}),
+              ElementsAre("add datausage.wwanOutKB.com.velmora.p 2", "add datausage.wifiInKB.b 1",
+                          "add datausage.wifiInKB.b 2"));
+  EXPECT_EQ(baseline().asDictionary()->size(), 2U);
+  fake_.preferences.domains[kOwn] = {{std::string(kUsageBaselineKey), PlistValue::string("no dictionary")}};
+  EXPECT_THAT(run({record("bundleName", "b", kMorning, {1024})}), ElementsAre("add datausage.wifiInKB.b 1"));
+}
+
+TEST_F(DataUsageTest, AReplyAfterTheWaitIsProcessedAllTheSame) {
+  fake_.usageService.delay = std::chrono::milliseconds(10300);
+  fake_.usageService.records = PlistValue::array({record("bundleName", "b", kMorning, {4096})});
+  CollectDataUsage(fake_.platform);
+  EXPECT_TRUE(fake_.systemLog.has("default: Netwatch timed out, no datausage available"));
+  fake_.usageService.waitForReplies();
+  EXPECT_THAT(fake_.analyticsClient.calls, ElementsAre("add datausage.wifiInKB.b 4"));
+  EXPECT_TRUE(baseline().asDictionary()->contains("b"));
+}
+
+}  // namespace
+}  // namespace tbdaily

@@ -1,0 +1,132 @@
+#include "driver/tasking.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "testing/fake_platform.h"
+
+namespace tbdaily {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+const std::string kJob = "com.velmora.tallyd.tbdaily";
+constexpr DayNumber kToday = 20781;
+
+PlistValue text(const char* t) {
+  return PlistValue::string(t);
+}
+PlistValue item(const char* domain, const char* key, PlistValue value) {
+  PlistDictionary entries{{"Domain", text(domain)}, {"Key", text(key)}};
+  entries.set("Value", std::move(value));
+  return PlistValue::dictionary(std::move(entries));
+}
+
+class TaskingTest : public ::testing::Test {
+ protected:
+  TaskingTest() {
+    fake_.analyticsClient.today = kToday;
+    fake_.deviceAnswers.build = "A1";
+  }
+  void schedule(const char* id, PlistValue payload) {
+    PlistDictionary tasking{{"TaskingID", text(id)}, {"TaskingDigest", PlistValue::int64(7)}};
+    tasking.set("TaskingPayload", std::move(payload));
+    fake_.preferences.domains["com.velmora.Crashferry"] = {
+        {"ScheduledTasking", PlistValue::dictionary(tasking)}};
+  }
+  // What a run writes, posts and logs.
+  std::vector<std::string> run() {
+    fake_.preferences.writes.clear();
+    fake_.systemLog.lines.clear();
+    fake_.notifications.posts.clear();
+    HandleTaskingAndOSChange(fake_.platform);
+    return fake_.preferences.writes;
+  }
+  PlistValue job(const char* key) { return fake_.preferences.getValue(key, kJob); }
+
+  testing::FakePlatform fake_;
+};
+
+TEST_F(TaskingTest, AppliesWithdrawsAndAppliesAgainInOrder) {
+  schedule("t1", PlistValue::array(
+                     {item("b", "x", PlistValue::int64(1)), text("malformed"), item("a", "y", text("v"))}));
+  EXPECT_THAT(run(), ElementsAre("set " + kJob + "/LastOSUpdate", "set b/x", "set a/y",
+                                 "set " + kJob + "/TaskingID", "set " + kJob + "/TaskingOS",
+                                 "set " + kJob + "/TaskingDigest", "set " + kJob + "/TaskingPayload",
+                                 "synchronize a", "synchronize b", "synchronize " + kJob));
+  EXPECT_THAT(fake_.notifications.posts, ElementsAre("com.velmora.da.tasking_changed"));
+  EXPECT_THAT(fake_.systemLog.lines, ElementsAre("default: OS change since last run ((null) -> A1)"));
+  EXPECT_EQ(job("LastOSUpdate"),
+            PlistValue::dictionary({{"version", text("A1")}, {"day", PlistValue::int32(kToday)}}));
+  EXPECT_EQ(job("TaskingDigest").asInteger(), 7);
+
+  EXPECT_THAT(run(), IsEmpty());
+  EXPECT_THAT(fake_.notifications.posts, IsEmpty());
+
+  fake_.deviceAnswers.build = "A2";
+  EXPECT_EQ(run().size(), 15U);
+  EXPECT_THAT(fake_.systemLog.lines, ElementsAre("default: OS change since last run (A1 -> A2)",
+                                                 "default: Tasking update (t1 -> t1, A1 -> A2)"));
+  EXPECT_EQ(job("TaskingOS").asString(), "A2");
+  EXPECT_EQ(fake_.preferences.getValue("x", "b").asInteger(), 1);
+
+  schedule("t2", {});  // no payload: withdrawn, nothing new, and announced every time
+  run();
+  EXPECT_TRUE(fake_.preferences.getValue("x", "b").isNone());
+  EXPECT_TRUE(job("TaskingID").isNone() && job("TaskingPayload").isNone());
+  EXPECT_EQ(job("TaskingOS").asString(), "A2");
+  EXPECT_THAT(run(), IsEmpty());
+  EXPECT_THAT(fake_.notifications.posts, ElementsAre("com.velmora.da.tasking_changed"));
+}
+
+TEST_F(TaskingTest, WithoutABuildATaskingIsAppliedOnEveryRun) {
+  fake_.deviceAnswers.build.reset();
+  schedule("t1", PlistValue::array({item("a", "x", PlistValue::int64(1))}));
+  run();
+  EXPECT_TRUE(job("LastOSUpdate").isNone());
+  EXPECT_THAT(run().front(), "remove a/x");
+  EXPECT_THAT(fake_.systemLog.lines, ElementsAre("default: Tasking update (t1 -> t1, (null) -> (null))"));
+}
+
+TEST_F(TaskingTest, ATaskingWithoutAnIdentifierIsIgnoredAndNothingIsSubmitted) {
+  fake_.logSubmission.taskingValues.set("AggressiveSubmissionDays", PlistValue::int64(100));
+  for (const PlistValue& tasking :
+       {PlistValue(), text("?"), PlistValue::dictionary({{"TaskingID", PlistValue::int64(1)}})}) {
+    fake_.preferences.domains["com.velmora.Crashferry"] = PlistDictionary();
+    fake_.preferences.domains["com.velmora.Crashferry"].set("ScheduledTasking", tasking);
+    run();
+    EXPECT_THAT(fake_.notifications.posts, IsEmpty());
+  }
+  EXPECT_THAT(fake_.logSubmission.calls, IsEmpty());
+}
+
+TEST_F(TaskingTest, SubmitsOnTheFirstDaysAfterAnUpdate) {
+  schedule("t1", PlistValue::array({}));
+  fake_.logSubmission.taskingValues.set("AggressiveSubmissionDays", text(" 3 days"));
+  std::vector<DayNumber> submitted;
+  for (const DayNumber day : {kToday, kToday + 1, kToday + 2, kToday + 3, kToday - 2, kToday - 3}) {
+    fake_.analyticsClient.today = day;
+    fake_.logSubmission.calls.clear();
+    run();
+    if (!fake_.logSubmission.calls.empty()) submitted.push_back(day);
+  }
+  EXPECT_THAT(submitted, ElementsAre(kToday, kToday + 1, kToday + 2, kToday - 2));
+  fake_.analyticsClient.today = kToday + 1;
+  run();
+  EXPECT_TRUE(fake_.systemLog.has("default: Aggressive submission day 1 of 3; triggering log submission"));
+}
+
+TEST(AggressiveDays, ReadsNumbersAndDecimalTexts) {
+  EXPECT_EQ(aggressiveDays({}), 0);
+  EXPECT_EQ(aggressiveDays(PlistValue::float64(2.9)), 2);
+  EXPECT_EQ(aggressiveDays(PlistValue::boolean(true)), 0);
+  EXPECT_EQ(aggressiveDays(PlistValue::int64(1LL << 40)), 2147483647);
+  for (const auto& [given, days] :
+       {std::pair{"+7", 7}, {"-2", -2}, {"x", 0}, {"", 0}, {"99999999999999999999", 2147483647}}) {
+    EXPECT_EQ(aggressiveDays(text(given)), days) << given;
+  }
+}
+
+}  // namespace
+}  // namespace tbdaily

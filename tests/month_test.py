@@ -1,0 +1,238 @@
+"""A month of days on a recorded clock: tasking, updates and network usage, each day held against a state machine of its own."""
+
+import copy
+import datetime
+import plistlib
+import random
+import subprocess
+import time
+import unittest
+
+from harness import BIN, EPOCH, NOW, TODAY, Device
+
+JOB = "com.velmora.tallyd.tbdaily"
+OWN = "com.velmora.sysmetrics.tbdaily"
+CRASHFERRY = "com.velmora.Crashferry"
+
+
+class TaskingModel:
+    """Preferences by domain, and what a run does to them."""
+
+    def __init__(self):
+        self.domains, self.posts, self.submissions = {}, 0, 0
+
+    def domain(self, name):
+        return self.domains.setdefault(name, {})
+
+    def run(self, today, build, scheduled, aggressive_days):
+        job = self.domain(JOB)
+        last = job.get("LastOSUpdate")
+        if build is not None and (last is None or last["version"] != build):
+            last = job["LastOSUpdate"] = {"version": build, "day": today}
+        if scheduled is None or "TaskingID" not in scheduled:
+            return
+        unchanged = job.get("TaskingID") == scheduled["TaskingID"] and build is not None and job.get("TaskingOS") == build
+        if not unchanged:
+            if "TaskingID" in job:
+                for item in job.get("TaskingPayload", []):
+                    self.domain(item["Domain"]).pop(item["Key"], None)
+                for key in ("TaskingID", "TaskingDigest", "TaskingPayload"):
+                    job.pop(key, None)
+            if "TaskingPayload" in scheduled:
+                for item in scheduled["TaskingPayload"]:
+                    self.domain(item["Domain"])[item["Key"]] = item["Value"]
+                job.update(TaskingID=scheduled["TaskingID"], TaskingDigest=scheduled["TaskingDigest"],
+                           TaskingPayload=scheduled["TaskingPayload"])
+                job["TaskingOS"] = build
+                if build is None:
+                    del job["TaskingOS"]
+            self.posts += 1
+        if abs(today - (last["day"] if last else 0)) < aggressive_days:
+            self.submissions += 1
+
+
+class UsageModel:
+    FIELDS = ("wifiInBytes", "wifiOutBytes", "wwanInBytes", "wwanOutBytes")
+
+    def __init__(self):
+        self.baseline, self.keys = {}, {}
+
+    def add(self, key, increment):
+        self.keys[key] = self.keys.get(key, 0) + increment
+
+    def run(self, today, records):
+        new = {}
+        for record in records:
+            name = record.get("bundleName", record.get("procName"))
+            shown = name if "bundleName" in record else "com.velmora." + name
+            counters = [record.get(field, 0) for field in self.FIELDS]
+            known = self.baseline.get(name)
+            fresh = (record["since"] - EPOCH).days >= today - 1
+            for index, value in enumerate(counters):
+                if known and known[0] == record["since"]:
+                    change = value - known[1 + index]
+                    if change < 0:
+                        self.add(f"datausage.baddata.{shown}", 1)
+                        continue
+                elif fresh:
+                    change = value
+                else:
+                    continue
+                if change // 1024:
+                    self.add(f"datausage.{self.FIELDS[index][:-5]}KB.{shown}", change // 1024)
+            if not (known and known[0] == record["since"]) and not fresh:
+                self.add(f"datausage.olddata.{shown}", 1)
+            new[name] = [record["since"], *counters]
+        self.baseline = new
+
+
+def tasking(identifier, items, digest="d"):
+    scheduled = {"TaskingID": identifier, "TaskingDigest": digest}
+    if items is not None:
+        scheduled["TaskingPayload"] = [{"Domain": d, "Key": k, "Value": v} for d, k, v in items]
+    return scheduled
+
+
+class Month(unittest.TestCase):
+    def device(self):
+        device = Device()
+        self.addCleanup(device.close)
+        return device
+
+    def set_day(self, device, day, build):
+        device.record("clock", {"now": EPOCH + datetime.timedelta(days=day, hours=3)})
+        device.record("answers", {"ProductVersion": "1", **({"ProductBuildVersion": build} if build else {})})
+
+    def test_tasking(self):
+        device, model = self.device(), TaskingModel()
+        first = tasking("one", [("com.velmora.da", "Group", False), ("org.example.a", "x", [1, {"y": b"z"}])])
+        second = tasking("two", [("com.velmora.da", "AggressiveSubmissionDays", 3), ("org.example.b", "x", 2.5)])
+        builds = ["A"] * 6 + ["B"] * 9 + [None] * 3 + ["B"] * 4 + ["C"] * 8
+        for index, build in enumerate(builds):
+            today = TODAY + index - (20 if index in (24, 25) else 0)  # on two days the clock is wrong
+            scheduled = (None if index < 2 or index in (20, 21) else first if index < 5 else second if index < 12
+                         else tasking("three", None) if index < 15 else second)
+            crashferry = model.domains[CRASHFERRY] = {"DiagnosticLogSubmissionEnabled": False}
+            if scheduled is not None:
+                crashferry["ScheduledTasking"] = scheduled
+            device.preferences(CRASHFERRY, crashferry)
+            device.write("var/mobile/Library/Logs/Pending/waits.txt", b"to be submitted")
+            self.set_day(device, today, build)
+            aggressive = model.domain("com.velmora.da").get("AggressiveSubmissionDays", 0)
+            outbox = len(list(device.path("var/mobile/Library/Logs/Outbox").glob("*")))
+            expected = copy.deepcopy(model)
+            # A tasking that is applied in this run counts at once.
+            for item in (scheduled or {}).get("TaskingPayload", []):
+                if item["Key"] == "AggressiveSubmissionDays":
+                    aggressive = item["Value"]
+            expected.run(today, build, scheduled, 0)
+            aggressive = expected.domain("com.velmora.da").get("AggressiveSubmissionDays", 0)
+            model.run(today, build, scheduled, aggressive)
+            device.run("-f")
+            for name, values in model.domains.items():
+                self.assertEqual(device.preferences(name), values, (index, name))
+            place = device.path("var/run/notifications/com.velmora.da.tasking_changed")
+            self.assertEqual(int(place.read_text()) if place.exists() else 0, model.posts, index)
+            self.assertEqual(len(list(device.path("var/mobile/Library/Logs/Outbox").glob("*"))), model.submissions,
+                             (index, outbox))
+        self.assertGreater(model.submissions, 4)
+        self.assertGreater(model.posts, 5)
+
+    def test_hostile_tasking(self):
+        device = self.device()
+        before = {p for p in device.base.rglob("*")}
+        domains = ["../escape", "/etc/absolute", "", ".", "..", "a/b", "a" * 201, "a\x00b", "ok.domain", "with space"]
+        items = [(d, "k", 1) for d in domains if "\x00" not in d] + [("ok.domain", f"key{i}", i) for i in range(100000)]
+        device.preferences(CRASHFERRY, {"ScheduledTasking": tasking("big", items)})
+        self.set_day(device, TODAY, "A")
+        started = time.monotonic()
+        device.run("-f")
+        self.assertLess(time.monotonic() - started, 60)
+        self.assertEqual(len(device.preferences("ok.domain")), 100001)
+        allowed = [device.path("var"), device.path("System")]
+        for place in set(device.base.rglob("*")) - before:
+            self.assertTrue(any(place == a or a in place.parents for a in allowed), place)
+        self.assertFalse((device.base / "escape.plist").exists())
+        device.preferences(CRASHFERRY, {"ScheduledTasking": tasking("small", [])})
+        device.run("-f")
+        self.assertEqual(device.preferences("ok.domain"), {})
+
+    def test_usage(self):
+        device, model, chance = self.device(), UsageModel(), random.Random(5)
+        processes = {f"org.example.app{i}" if i % 2 else f"daemon{i}": None for i in range(16)}
+        for index in range(30):
+            today = TODAY + index
+            now = EPOCH + datetime.timedelta(days=today, hours=3)
+            records = []
+            for name in list(processes):
+                state = processes[name]
+                if state is None or chance.random() < 0.15:  # starts anew, now and then in the past
+                    began = now - datetime.timedelta(seconds=chance.randrange(4 * 86400), microseconds=chance.randrange(10 ** 6))
+                    state = processes[name] = {"since": began.replace(microsecond=0), **{f: 0 for f in UsageModel.FIELDS}}
+                for field in UsageModel.FIELDS:
+                    state[field] += chance.choice((0, 500, 1500, 10 ** 6, -300))
+                if chance.random() < 0.85:  # else it is not in today's reply
+                    records.append({"bundleName" if "." in name else "procName": name, **state})
+            chance.shuffle(records)
+            for record in records:
+                for field in UsageModel.FIELDS:
+                    record[field] = max(record[field], 0)
+            self.set_day(device, today, "A")
+            device.record("usage", {"records": records, "delay": 0.01})
+            self.assertEqual(device.tally_json("usage", "show")["baseline"].keys(), model.baseline.keys())
+            device.run("-f")
+            model.run(today, records)
+            self.assertEqual(device.preferences(OWN)["netUsageBaseline"], model.baseline)
+            rows = dict(device.store().execute("SELECT name, SUM(value) FROM scalars JOIN keys ON id = key_id GROUP BY name"))
+            self.assertEqual({k: v for k, v in rows.items() if k.startswith("datausage.")}, model.keys)
+        self.assertTrue(any(k.startswith("datausage.baddata") for k in model.keys))
+        self.assertTrue(any(k.startswith("datausage.olddata") for k in model.keys))
+
+    def test_fractions_of_a_second_count(self):
+        device = self.device()
+        xml = ('<?xml version="1.0"?><plist version="1.0"><dict><key>records</key><array><dict><key>bundleName</key><string>b</string>'
+               '<key>since</key><date>2026-11-24T01:02:03.%sZ</date><key>wifiInBytes</key><integer>%d</integer></dict></array></dict>'
+               '</plist>')
+        for fraction, count in (("123456", 4096), ("123456", 6144), ("123457", 8192)):
+            device.write("System/Device/usage.plist", (xml % (fraction, count)).encode())
+            device.run("-f")
+        rows = dict(device.store().execute("SELECT name, value FROM scalars JOIN keys ON id = key_id"))
+        self.assertEqual(rows, {"datausage.wifiInKB.b": 4 + 2 + 8})
+
+    def test_a_pending_reply_does_not_hold_the_job_up(self):
+        device = self.device()
+        device.record("usage", {"records": [], "delay": 3600})
+        job = subprocess.Popen([BIN / "tbdaily", "-f"], env=device.env, stderr=subprocess.PIPE)
+        errors = job.communicate(timeout=60)[1]
+        self.assertEqual((job.returncode, errors), (0, b""))
+        self.assertIn("Netwatch timed out, no datausage available", device.log())
+        self.assertEqual(device.preferences(OWN), {})
+
+    def test_tool(self):
+        device = self.device()
+        for malformed, reason in (([], "dictionary"), ({}, "TaskingID"), ({"TaskingID": "x", "TaskingPayload": {}}, "array"),
+                                  (tasking("x", [("../x", "k", 1)]), "item 1"), (tasking("x", [("d", "", 1)]), "Key"),
+                                  ({"TaskingID": "x", "Tasking": 1}, "no entry")):
+            place = device.base / "tasking.plist"
+            place.write_bytes(plistlib.dumps(malformed))
+            self.assertIn(reason, device.tally("tasking", "schedule", str(place), status=1))
+        self.assertEqual(device.preferences(CRASHFERRY), {})
+        self.assertEqual(device.tally_json("tasking", "show"), {"scheduled": None, "applied": None, "lastOSUpdate": None,
+                                                                "aggressiveDays": 0, "aggressiveDaysLeft": 0})
+        scheduled = tasking("x", [("com.velmora.da", "AggressiveSubmissionDays", 3)])
+        place.write_bytes(plistlib.dumps(scheduled))
+        device.tally("tasking", "schedule", str(place))
+        self.set_day(device, TODAY, "A")
+        device.run("-f")
+        self.set_day(device, TODAY + 1, "A")
+        self.assertEqual(device.tally_json("tasking", "show"), {
+            "scheduled": scheduled, "applied": {"id": "x", "os": "A", "digest": "d", "payload": scheduled["TaskingPayload"]},
+            "lastOSUpdate": {"version": "A", "day": TODAY}, "aggressiveDays": 3, "aggressiveDaysLeft": 2})
+        self.assertIn("2 of them are left", device.tally("tasking", "show"))
+        device.tally("tasking", "clear")
+        self.assertIsNone(device.tally_json("tasking", "show")["scheduled"])
+        self.assertEqual(device.preferences("com.velmora.da"), {"AggressiveSubmissionDays": 3})
+
+
+if __name__ == "__main__":
+    unittest.main()
