@@ -28,64 +28,57 @@ class WordReader {
   ByteReader reader_;
 };
 
-// The fields that are read off one statistic each.
-void storeField(StatsContext& context, std::uint32_t id, std::uint64_t value) {
-  const auto low = static_cast<std::uint32_t>(value);
-  switch (id) {
-    case 4:
-      context.hostWrites = value;
-      break;
-    case 7:
-      context.hostReads = value;
-      break;
-    case 12:
-      context.IND_pool_free = value;
-      break;
-    case 13:
-      context.IND_pool_count = value;
-      break;
-    case 17:
-      context.wearLevMoves = value;
-      break;
-    case 18:
-      context.nandWrites = value;
-      break;
-    case 19:
-      context.nandReads = value;
-      break;
-    case 20:
-      context.bandErases = value;
-      break;
-    case 28:
-      context.numSleepOps = value;
-      break;
-    case 45:
-      context.maxHighEnduranceBlockErases = value;
-      break;
-    case 48:
-      context.numFreeVirtualBlocks = value;
-      break;
-    case 49:
-      context.bytesPerPage = low;
-      break;
-    case 50:
-      context.pagesPerVirtualBlock = low;
-      break;
-    case 51:
-      context.blocksPerVirtualBlock = low;
-      break;
-    case 52:
-      context.numVirtualBlocks = low;
-      break;
-    case 53:
-      context.exportVersion = low;
-      break;
-    case 56:
-      context.utilFormatTime = value;
-      break;
-    default:
-      break;
-  }
+// The fields that hold one statistic each.
+struct WideField {
+  std::uint32_t id;
+  std::uint64_t StatsContext::*field;
+};
+constexpr std::array<WideField, 12> kWideFields = {{
+    {4, &StatsContext::hostWrites},
+    {7, &StatsContext::hostReads},
+    {12, &StatsContext::IND_pool_free},
+    {13, &StatsContext::IND_pool_count},
+    {17, &StatsContext::wearLevMoves},
+    {18, &StatsContext::nandWrites},
+    {19, &StatsContext::nandReads},
+    {20, &StatsContext::bandErases},
+    {28, &StatsContext::numSleepOps},
+    {45, &StatsContext::maxHighEnduranceBlockErases},
+    {48, &StatsContext::numFreeVirtualBlocks},
+    {56, &StatsContext::utilFormatTime},
+}};
+struct NarrowField {
+  std::uint32_t id;
+  std::uint32_t StatsContext::*field;
+};
+constexpr std::array<NarrowField, 5> kNarrowFields = {{
+    {49, &StatsContext::bytesPerPage},
+    {50, &StatsContext::pagesPerVirtualBlock},
+    {51, &StatsContext::blocksPerVirtualBlock},
+    {52, &StatsContext::numVirtualBlocks},
+    {53, &StatsContext::exportVersion},
+}};
+
+// Where the first value of a record of each row of kStats goes besides the list; null for most.
+struct RowFields {
+  std::uint64_t StatsContext::*wide = nullptr;
+  std::uint32_t StatsContext::*narrow = nullptr;
+};
+constexpr auto kFieldsOfRow = [] {
+  std::array<RowFields, kStats.size()> fields{};
+  const auto fieldsOf = [&fields](std::uint32_t id) -> RowFields& {
+    const auto stat = std::ranges::lower_bound(kStats, id, {}, &StatDefinition::id);
+    return fields[static_cast<std::size_t>(stat - kStats.begin())];
+  };
+  for (const WideField& row : kWideFields) fieldsOf(row.id).wide = row.field;
+  for (const NarrowField& row : kNarrowFields) fieldsOf(row.id).narrow = row.field;
+  return fields;
+}();
+
+void storeField(StatsContext& context, std::uint16_t row, std::uint64_t value) {
+  const auto [wide, narrow] = kFieldsOfRow[row];
+  if (wide != nullptr) context.*wide = value;
+  if (narrow != nullptr) context.*narrow = static_cast<std::uint32_t>(value);
 }
 
 void AppendStatNode(StatsContext& context, const StatNode& node) {
@@ -100,12 +93,12 @@ void AppendStatNode(StatsContext& context, const StatNode& node) {
 void RecordStat(StatsContext& context, std::uint16_t row, const WordReader& words, std::size_t first,
                 std::size_t count) {
   if (count == 0) return;
-  const std::uint32_t id = kStats[row].id;
-  storeField(context, id, words[first]);
+  storeField(context, row, words[first]);
+  const bool isReadCountHisto = kStats[row].id == kReadCountHisto;
   if (count == 1) AppendStatNode(context, {words[first], row, StatNode::kBareName});
   for (std::size_t i = 0; i < count; ++i) {
     const std::uint64_t value = words[first + i];
-    if (id == kReadCountHisto) context.readCountHisto[i] = value;
+    if (isReadCountHisto) context.readCountHisto[i] = value;
     if (count > 1) AppendStatNode(context, {value, row, static_cast<std::uint16_t>(i)});
   }
 }

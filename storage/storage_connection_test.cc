@@ -1,0 +1,161 @@
+#include "storage/storage_connection.h"
+
+#include <gmock/gmock.h>
+
+#include <cstdlib>
+#include <new>
+
+#include "storage/storage_test_support.h"
+
+namespace {
+bool memoryIsOut = false;
+}
+
+// Buffers for a driver are the only allocations of this kind; here they fail when asked to.
+void* operator new(std::size_t size, std::align_val_t alignment, const std::nothrow_t&) noexcept {
+  const auto step = static_cast<std::size_t>(alignment);
+  return memoryIsOut ? nullptr : std::aligned_alloc(step, (size / step + 1) * step);
+}
+void operator delete(void* memory, std::align_val_t) noexcept {
+  std::free(memory);
+}
+
+namespace tbdaily {
+namespace {
+
+using ::testing::ElementsAre;
+using testing::StatsBuffer;
+
+std::vector<std::uint64_t> wordsOf(std::span<const std::byte> request) {
+  std::vector<std::uint64_t> words;
+  for (std::size_t at = 0; at < request.size(); at += 8)
+    words.push_back(ByteReader(request).at<std::uint64_t>(at).value_or(~0ULL));
+  return words;
+}
+
+TEST(NandExporters, CarryTheCodesOfTheWireProtocol) {
+  for (const NandExporter& e : std::span(nand_exporters).first(2)) {
+    std::vector<std::uint32_t> codes;
+    for (const SelectorGetter getter :
+         {e.statsSelectors, e.defectsListSelectors, e.telemetryListSelectors, e.taskSchedulerSelectors,
+          e.snapshotSelectors, e.snapshotHeaderSelectors, e.bandStatsSelectors}) {
+      EXPECT_EQ(getter()->sizeQuery, getter()->dataFetch);
+      codes.push_back(getter()->sizeQuery);
+    }
+    EXPECT_THAT(codes, ElementsAre(13, 15, 17, 39, 22, 145, 11));
+  }
+}
+
+TEST(StxRequest, HasItsLayout) {
+  constexpr STXSelectorPair kPair = {0x01020304, 0xA1B2C3D4};
+  EXPECT_THAT(wordsOf(StxRequest::sizeQuery(kPair).bytes()), ElementsAre(0x1'01020304, 0, 0));
+  EXPECT_THAT(wordsOf(StxRequest::dataFetch(kPair, {2, true}).bytes()), ElementsAre(0xA'A1B2C3D4, 0, 0));
+  EXPECT_EQ(StxRequest::sizeQuery(kPair, {0xFFFF, false}).flags, 0x3FD);
+}
+
+struct Fetch {
+  explicit Fetch(const char* serviceClass = "STXStorage") : controller(registry, serviceClass) {
+    for (const std::uint32_t code : {0U, 1U, 2U, 13U})
+      controller.buffers[code] = StatsBuffer().record(53, {0x20002}).record(4, {77}).bytes;
+  }
+  ~Fetch() { EXPECT_EQ(registry.openHandles(), 0U); }
+  bool run(NandExporterTable exporters = nand_exporters) {
+    return FetchStatsContext(registry, descriptor, context, said, exporters);
+  }
+
+  testing::FakeDriverRegistry registry;
+  testing::ScriptedController controller;
+  const NandExporter* descriptor = nullptr;
+  StatsContext context;
+  testing::CapturedDiagnostics said;
+};
+
+TEST(FetchStatsContext, AsksEachControllerThroughItsOwnMethods) {
+  Fetch first, second("VelmoraEmbeddedNVMeController"), none("Other");
+  EXPECT_TRUE(first.run());
+  EXPECT_EQ(first.descriptor, &nand_exporters[0]);
+  EXPECT_THAT(first.controller.methods, ElementsAre(8, 8));
+  EXPECT_THAT(wordsOf(first.controller.requests[0]), ElementsAre(0x1'0000000D, 0, 0));
+  EXPECT_THAT(wordsOf(first.controller.requests[1]), ElementsAre(13, 0, 0));
+  EXPECT_EQ(first.context.hostWrites, 77U);
+  EXPECT_TRUE(second.run());
+  EXPECT_EQ(second.descriptor, &nand_exporters[1]);
+  EXPECT_THAT(second.controller.methods, ElementsAre(9, 9));
+  EXPECT_FALSE(none.run());
+  EXPECT_EQ(none.descriptor, &nand_exporters[2]);
+  EXPECT_EQ(none.said.errors, "Could not get matching KdKit service for exporting classes\n");
+}
+
+TEST(FetchStatsContext, TellsEachTroubleAndReleasesEverything) {
+  struct Case {
+    std::function<void(Fetch&)> prepare;
+    bool fetched;
+    const char* errors;
+  };
+  const std::vector<Case> cases = {
+      {[](Fetch& f) { f.registry.openStatus = -1; }, false, "Could not get connection to service\n"},
+      {[](Fetch& f) { f.controller.sizeStatus = -2; }, false, "KdConnectCallStructMethod: -2"},
+      {[](Fetch& f) { f.controller.sizeAnswer = 0xFFFFFFFF, memoryIsOut = true; }, false,
+       "Could not valloc 4294967295 bytes"},
+      {[](Fetch& f) { f.controller.dataStatus = f.registry.closeStatus = -1; }, false,
+       "Could not retrieve data from driver for selector d\nCould not close connection to service\n"},
+      {[](Fetch& f) { f.registry.closeStatus = -1; }, true, "Could not close connection to service\n"},
+      // Sizes and fills that are not what they should be.
+      {[](Fetch& f) { f.controller.sizeAnswer = 0; }, false, ""},
+      {[](Fetch& f) { f.controller.sizeAnswer = 0xFFFFFFFF; }, true, ""},
+      {[](Fetch& f) { f.controller.filled = 16; }, true, ""},
+      {[](Fetch& f) { f.controller.filled = 24; }, false, ""},
+      {[](Fetch& f) { f.controller.filled = 1 << 20; }, true, ""},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(&c - cases.data());
+    Fetch fetch;
+    c.prepare(fetch);
+    EXPECT_EQ(fetch.run(), c.fetched);
+    EXPECT_EQ(fetch.said.errors, c.errors);
+    memoryIsOut = false;
+  }
+}
+
+TEST(FetchStatsContext, FollowsTheSelectorsOfTheDescriptor) {
+  static constexpr STXSelectorPair kUnequal = {1, 2}, kUnserved = {kNoSelector, 13};
+  const auto requests = [](SelectorGetter getter) {
+    std::array<NandExporter, 2> table = {nand_exporters[0], {}};
+    table[0].statsSelectors = getter;
+    Fetch fetch;
+    const bool fetched = fetch.run(table);
+    EXPECT_EQ(fetched, !fetch.controller.requests.empty());
+    EXPECT_EQ(fetch.said.errors, "");
+    return fetch.controller.requests;
+  };
+  EXPECT_TRUE(requests([]() -> const STXSelectorPair* { return nullptr; }).empty());
+  EXPECT_TRUE(requests([] { return &kUnserved; }).empty());
+  const auto unequal = requests([] { return &kUnequal; });
+  EXPECT_THAT(wordsOf(unequal.at(0)), ElementsAre(0x1'00000001, 0, 0));
+  EXPECT_THAT(wordsOf(unequal.at(1)), ElementsAre(2, 0, 0));
+  EXPECT_THAT(requests(nullptr), ElementsAre(std::vector<std::byte>(), std::vector<std::byte>()));
+}
+
+TEST(StxConnection, OpensAndClosesByHand) {
+  Fetch fetch, none("Other");
+  StxConnection connection;
+  EXPECT_TRUE(openSTXConnection(fetch.registry, connection, fetch.said));
+  EXPECT_EQ(fetch.registry.openHandles(), 2U);
+  closeSTXConnection(fetch.registry, connection);
+  EXPECT_FALSE(openSTXConnection(none.registry, connection, none.said));
+  EXPECT_EQ(FlashConnect(none.registry, none.descriptor, none.said), 0U);
+  EXPECT_EQ(none.said.errors, "Can't get STX Connection, no matching service!\nNo class found");
+
+  FlashDisconnect(fetch.registry, 99, fetch.said);
+  std::array<NandExporter, 2> stranger = {nand_exporters[0], {}};
+  stranger[0].statsSelectors = STXGetBandStatsSelectors;
+  EXPECT_FALSE(openSTXConnection(fetch.registry, connection, fetch.said, stranger));
+  fetch.registry.openStatus = kKdBadArgument;
+  EXPECT_FALSE(openSTXConnection(fetch.registry, connection, fetch.said));
+  EXPECT_EQ(fetch.said.errors,
+            "closing connection to service failed\nCan't get STX Connection!\n"
+            "KdServiceOpen failed for class 'STXStorage', result 0xe00002c2\nCan't get STX Connection!\n");
+}
+
+}  // namespace
+}  // namespace tbdaily
