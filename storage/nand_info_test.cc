@@ -57,12 +57,11 @@ TEST(NandInfo, PutsEachFieldUnderItsKey) {
                                 "28 NumSleepOps",         "45 HighEnduranceBlockEraseCount",
                                 "48 NumFreeVirtualBlocks"};
   const auto check = [](std::string_view field, bool wide) {
-    const int id = std::stoi(std::string(field));
-    const std::uint64_t value = 0x1'80000000ULL + static_cast<std::uint64_t>(id);
-    const auto info = infoOf(full().record(static_cast<std::uint32_t>(id), {value}));
+    const auto id = static_cast<std::uint32_t>(std::stoul(std::string(field)));
+    const std::uint32_t low = 0x80000000 + id;
+    const auto info = infoOf(full().record(id, {std::uint64_t{1} << 32 | low}));
     EXPECT_EQ(under(info, field.substr(field.find(' ') + 1)),
-              wide ? PlistValue::int64(0x1'80000000 + id)
-                   : PlistValue::int32(std::numeric_limits<std::int32_t>::min() + id))
+              wide ? PlistValue::int64(0x1'80000000 + id) : PlistValue::int32(static_cast<std::int32_t>(low)))
         << field;
   };
   for (const char* field : kNarrow) check(field, false);
