@@ -1,0 +1,48 @@
+// Statistics buffers: parsing with release, and the NAND info of a parsed one.
+
+#include <benchmark/benchmark.h>
+
+#include <vector>
+
+#include "storage/nand_info.h"
+#include "storage/stats_context.h"
+#include "storage/stats_table.h"
+#include "storage/storage_test_support.h"
+#include "testing/fake_platform.h"
+
+namespace tbdaily {
+namespace {
+
+// Every statistic in full, as often as it takes to reach the size.
+std::vector<std::byte> buffer(std::size_t size) {
+  testing::StatsBuffer once;
+  for (const StatDefinition& stat : kStats)
+    once.record(stat.id, std::vector<std::uint64_t>(stat.limit, 0x20002 + stat.id));
+  std::vector<std::byte> bytes = once.bytes;
+  while (bytes.size() < size) bytes.insert(bytes.end(), once.bytes.begin(), once.bytes.end());
+  return bytes;
+}
+
+void parseAndRelease(benchmark::State& state) {
+  const std::vector<std::byte> bytes = buffer(static_cast<std::size_t>(state.range(0)));
+  for (auto _ : state) {
+    StatsContext context;
+    benchmark::DoNotOptimize(STXParseBufferToCxt(context, bytes));
+    STXReleaseContext(context);
+  }
+  state.SetBytesProcessed(state.iterations() * static_cast<std::int64_t>(bytes.size()));
+}
+// One of each statistic, then the same over and over.
+BENCHMARK(parseAndRelease)->Arg(1)->Arg(1 << 20)->Arg(64 << 20)->Unit(benchmark::kMicrosecond);
+
+void nandInfo(benchmark::State& state) {
+  testing::FakePlatform fake;
+  StatsContext context;
+  STXParseBufferToCxt(context, buffer(1));
+  for (auto _ : state) benchmark::DoNotOptimize(NandInfoFromContext(fake.preferences, context, false));
+  state.SetItemsProcessed(state.iterations() * static_cast<std::int64_t>(context.nodes.size()));
+}
+BENCHMARK(nandInfo)->Unit(benchmark::kMicrosecond);
+
+}  // namespace
+}  // namespace tbdaily
