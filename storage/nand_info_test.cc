@@ -34,10 +34,10 @@ PlistValue under(const std::optional<PlistDictionary>& info, std::string_view su
 TEST(KeyMap, HoldsEveryRowAndReachesEveryListedName) {
   std::string rows, listed;
   for (const KeyMapRow& row : keyMap) rows += std::string(row.statName) + ":" + std::string(row.key) + "\n";
-  for (std::uint16_t row = 0; row < kStats.size(); ++row) {
-    const int elements = kStats[row].limit > 1 ? kStats[row].limit : 0;
-    for (int element = -1; element < elements; ++element) {
-      const StatNode node{0, row, element < 0 ? StatNode::kBareName : static_cast<std::uint16_t>(element)};
+  for (const StatDefinition& stat : kStats) {
+    StatNode node{0, findStat(stat.id).value()};
+    for (int element = -1; element < (stat.limit > 1 ? stat.limit : 0); ++element) {
+      if (element >= 0) node.element = static_cast<std::uint16_t>(element);
       const std::string key(nandInfoTarget(node).key);
       if (!key.empty()) listed += node.name() + ":" + key + "\n";
     }

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <new>
+#include <type_traits>
+#include <variant>
 
 #include "platform/byte_reader.h"
 #include "storage/stats_context.h"
@@ -28,12 +30,12 @@ class WordReader {
   ByteReader reader_;
 };
 
-// The fields that hold one statistic each.
-struct WideField {
+// The fields that hold the first value of one statistic each; narrow ones hold its low 32 bits.
+struct FieldRow {
   std::uint32_t id;
-  std::uint64_t StatsContext::*field;
+  std::variant<std::uint64_t StatsContext::*, std::uint32_t StatsContext::*> field;
 };
-constexpr std::array<WideField, 12> kWideFields = {{
+constexpr std::array<FieldRow, 17> kFields = {{
     {4, &StatsContext::hostWrites},
     {7, &StatsContext::hostReads},
     {12, &StatsContext::IND_pool_free},
@@ -45,40 +47,35 @@ constexpr std::array<WideField, 12> kWideFields = {{
     {28, &StatsContext::numSleepOps},
     {45, &StatsContext::maxHighEnduranceBlockErases},
     {48, &StatsContext::numFreeVirtualBlocks},
-    {56, &StatsContext::utilFormatTime},
-}};
-struct NarrowField {
-  std::uint32_t id;
-  std::uint32_t StatsContext::*field;
-};
-constexpr std::array<NarrowField, 5> kNarrowFields = {{
     {49, &StatsContext::bytesPerPage},
     {50, &StatsContext::pagesPerVirtualBlock},
     {51, &StatsContext::blocksPerVirtualBlock},
     {52, &StatsContext::numVirtualBlocks},
     {53, &StatsContext::exportVersion},
+    {56, &StatsContext::utilFormatTime},
 }};
+constexpr std::size_t kNoField = kFields.size();
 
-// Where the first value of a record of each row of kStats goes besides the list; null for most.
-struct RowFields {
-  std::uint64_t StatsContext::*wide = nullptr;
-  std::uint32_t StatsContext::*narrow = nullptr;
-};
-constexpr auto kFieldsOfRow = [] {
-  std::array<RowFields, kStats.size()> fields{};
-  const auto fieldsOf = [&fields](std::uint32_t id) -> RowFields& {
-    const auto stat = std::ranges::lower_bound(kStats, id, {}, &StatDefinition::id);
-    return fields[static_cast<std::size_t>(stat - kStats.begin())];
-  };
-  for (const WideField& row : kWideFields) fieldsOf(row.id).wide = row.field;
-  for (const NarrowField& row : kNarrowFields) fieldsOf(row.id).narrow = row.field;
+// Which field belongs to each row of kStats. Numbers, since the compiler confuses a null pointer to a member
+// in a large constexpr table with one to the first member.
+constexpr auto kFieldOfRow = [] {
+  std::array<std::uint8_t, kStats.size()> fields{};
+  fields.fill(kNoField);
+  for (std::size_t i = 0; i < kFields.size(); ++i) {
+    const auto stat = std::ranges::lower_bound(kStats, kFields[i].id, {}, &StatDefinition::id);
+    fields[static_cast<std::size_t>(stat - kStats.begin())] = static_cast<std::uint8_t>(i);
+  }
   return fields;
 }();
 
 void storeField(StatsContext& context, std::uint16_t row, std::uint64_t value) {
-  const auto [wide, narrow] = kFieldsOfRow[row];
-  if (wide != nullptr) context.*wide = value;
-  if (narrow != nullptr) context.*narrow = static_cast<std::uint32_t>(value);
+  if (kFieldOfRow[row] == kNoField) return;
+  std::visit(
+      [&](auto member) {
+        auto& field = context.*member;
+        field = static_cast<std::remove_reference_t<decltype(field)>>(value);
+      },
+      kFields[kFieldOfRow[row]].field);
 }
 
 void AppendStatNode(StatsContext& context, const StatNode& node) {

@@ -2,7 +2,6 @@
 
 #include <gmock/gmock.h>
 
-#include <cstdlib>
 #include <new>
 
 #include "storage/storage_test_support.h"
@@ -13,11 +12,7 @@ bool memoryIsOut = false;
 
 // Buffers for a driver are the only allocations of this kind; here they fail when asked to.
 void* operator new(std::size_t size, std::align_val_t alignment, const std::nothrow_t&) noexcept {
-  const auto step = static_cast<std::size_t>(alignment);
-  return memoryIsOut ? nullptr : std::aligned_alloc(step, (size / step + 1) * step);
-}
-void operator delete(void* memory, std::align_val_t) noexcept {
-  std::free(memory);
+  return memoryIsOut ? nullptr : ::operator new(size, alignment);
 }
 
 namespace tbdaily {
