@@ -1,5 +1,6 @@
 #include "platform/number_text.h"
 
+#include <algorithm>
 #include <array>
 #include <charconv>
 #include <cmath>
@@ -140,6 +141,17 @@ std::string dateText(PlistDate date, DateFraction fraction) {
     if (!digits.empty()) text.append(".").append(digits);
   }
   return text += 'Z';
+}
+
+std::string stampText(PlistDate date, unsigned fractionDigits) {
+  // Digits that are not wanted are cut, but a double holds a microsecond only nearly: one that it falls short
+  // of by less than its resolution is meant.
+  constexpr double kResolution = 0.125;  // microseconds, for dates of this century
+  const auto microseconds =
+      std::min(999999U, static_cast<unsigned>(civilTime(date).fraction * 1e6 + kResolution));
+  std::string digits = std::to_string(1000000 + microseconds);  // seven, the first of them no part of it
+  std::string text = dateText(date, DateFraction::Drop);
+  return text.replace(text.size() - 1, 1, "." + digits.substr(1, fractionDigits) + "Z");
 }
 
 }  // namespace tbdaily

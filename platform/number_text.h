@@ -23,6 +23,9 @@ enum class DateFraction { Drop, Keep };
 // need.
 std::string dateText(PlistDate date, DateFraction fraction);
 
+// The same with a fraction of exactly so many digits, 1 to 6: "2026-11-24T09:07:04.123Z".
+std::string stampText(PlistDate date, unsigned fractionDigits);
+
 // Whether a date can be written and read back: finite and within some 35 million years of the reference.
 bool isRepresentable(PlistDate date);
 

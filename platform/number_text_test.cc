@@ -57,6 +57,13 @@ TEST(DateText, IsUtcWithTheFractionOnlyWhereAsked) {
             "-5877641-06-23T00:00:00Z");
 }
 
+TEST(StampText, ShowsTheMicrosecondThatTheDoubleMeans) {
+  const PlistDate date = PlistDate::fromUnixSeconds(1795597624.123456);
+  EXPECT_EQ(stampText(date, 6), "2026-11-25T09:07:04.123456Z");
+  EXPECT_EQ(stampText(date, 3), "2026-11-25T09:07:04.123Z");
+  EXPECT_EQ(stampText(PlistDate{-1e-9}, 3), "2000-12-31T23:59:59.999Z");
+}
+
 TEST(CivilTime, IsTheInverseOfItself) {
   std::mt19937_64 random(11);
   std::uniform_real_distribution<double> seconds(-1e11, 1e11);

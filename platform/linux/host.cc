@@ -75,7 +75,8 @@ int Host::makeFolders(const fs::path& folder) const {
 
 void Host::noteWriteFailure(const fs::path& path, int error) {
   if (!isFirstOfKind(error)) return;
-  noteOnce("cannot write " + path.native() + ": " + errorText(error));
+  noteOnce("cannot write " + path.native() + ": " +
+           (error == EWOULDBLOCK ? "another program keeps it locked" : errorText(error)));
 }
 
 std::string errorText(int error) {

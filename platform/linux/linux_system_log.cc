@@ -5,8 +5,6 @@
 
 #include <array>
 #include <cerrno>
-#include <cmath>
-#include <cstdio>
 #include <cstdlib>
 
 #include "platform/number_text.h"
@@ -31,16 +29,6 @@ constexpr std::array<LevelText, 4> kLevels = {{
 bool environmentIs(const char* variable, std::string_view value) {
   const char* text = std::getenv(variable);
   return text != nullptr && text == value;
-}
-
-// "2026-11-24T09:07:04.123456Z"
-std::string stamp(PlistDate now) {
-  std::string text = dateText(now, DateFraction::Drop);
-  std::array<char, 16> fraction;
-  const auto microseconds = static_cast<unsigned>(civilTime(now).fraction * 1e6);
-  std::snprintf(fraction.data(), fraction.size(), ".%06uZ", microseconds);
-  text.replace(text.size() - 1, 1, fraction.data());
-  return text;
 }
 
 }  // namespace
@@ -77,7 +65,7 @@ void LinuxSystemLog::writeLine(LogLevel level, std::string_view message) {
   const LevelText& text = kLevels[static_cast<std::size_t>(level)];
   const std::string_view prefix = journal_ ? text.journalPrefix : "";
   std::string lines(prefix);
-  lines.append(stamp(kernel_.currentTime())).append(" ").append(kernel_.processName());
+  lines.append(stampText(kernel_.currentTime(), 6)).append(" ").append(kernel_.processName());
   lines.append("[").append(std::to_string(kernel_.processIdentifier())).append("] ");
   lines.append(text.name).append(": ");
   for (const char c : message) {

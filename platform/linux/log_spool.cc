@@ -26,14 +26,6 @@ std::string dayText(PlistDate now) {
   return dateText(now, DateFraction::Drop).substr(0, 10);
 }
 
-std::string millisecondStamp(PlistDate now) {
-  std::string text = dateText(now, DateFraction::Drop);
-  std::array<char, 8> fraction;
-  std::snprintf(fraction.data(), fraction.size(), ".%03uZ",
-                static_cast<unsigned>(civilTime(now).fraction * 1e3));
-  return text.replace(text.size() - 1, 1, fraction.data());
-}
-
 class FileOutput : public LogOutput {
  public:
   explicit FileOutput(int fd) : fd_(fd) {}
@@ -151,8 +143,8 @@ bool LogSpool::writePending(std::string_view type, std::string_view name, const 
 
 void LogSpool::appendStructured(int type, const PlistDictionary& data, PlistDate now) {
   const fs::path place = folder() / "Structured" / std::to_string(type) / (dayText(now) + ".jsonl");
-  const std::string line = "{\"time\": \"" + millisecondStamp(now) +
-                           "\", \"data\": " + jsonText(PlistValue::dictionary(data)) + "}\n";
+  const std::string line =
+      "{\"time\": \"" + stampText(now, 3) + "\", \"data\": " + jsonText(PlistValue::dictionary(data)) + "}\n";
   FileLock lock;
   int error = lockSpool(lock);
   if (error == 0) error = host_.makeFolders(place.parent_path());

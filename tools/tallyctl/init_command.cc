@@ -188,7 +188,7 @@ class SampleDevice {
       return place.native() + ": " + errorText(error);
     std::error_code error;
     fs::copy_file(built, place, error);
-    if (!error) fs::permissions(place, fs::perms::owner_all, error);
+    if (!error) fs::permissions(place, fs::perms::owner_read | fs::perms::owner_write, error);
     return error ? place.native() + ": " + error.message() : "";
   }
 
