@@ -2,6 +2,8 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
+
 #include "platform/preferences_store.h"
 #include "storage/nand_key_map.h"
 #include "storage/stats_table.h"
@@ -71,14 +73,13 @@ TEST(NandInfo, HoldsEachFieldAsFarAsTheExportVersionAllows) {
     for (const std::uint32_t id : {49U, 50U, 51U, 52U}) buffer.record(id, {0x1'FFFFFF00 + std::uint64_t{id}});
     return textOf(infoOf(buffer, logVariant).value());
   };
-  const std::string head = "ExportVersion:i131073 DriverVersion:i-1 DemoMode:l0 ";
   const std::string base =
       "NumVirtualBlocks:i-204 PagesPerVirtualBlock:i-206 BytesPerPage:i-207 NumLogicalReads:l6442450951 "
       "NumLogicalWrites:l6442450948 NumFreeVirtualBlocks:l6442450992 NumWearLevelOps:l6442450961 "
       "NumPhysicalReads:l6442450963 NumPhysicalWrites:l6442450962 NumPhysicalErases:l6442450964 "
       "NodesFree:l6442450956 NodesTotal:l6442450957 ";
   EXPECT_EQ(info(0x20001, true), base);
-  EXPECT_EQ(info(0x20001, false), head + base);
+  EXPECT_EQ(info(0x20001, false), "ExportVersion:i131073 DriverVersion:i-1 DemoMode:l0 " + base);
   EXPECT_EQ(info(0x20002, true),
             base +
                 "formatDaysSince2000:l0 NumSleepOps:l6442450972 HighEnduranceBlockEraseCount:l6442450989 "
@@ -91,14 +92,9 @@ TEST(NandInfo, HoldsEachFieldAsFarAsTheExportVersionAllows) {
 }
 
 TEST(NandInfo, DerivesItsOwnValues) {
-  struct Case {
-    StatsBuffer buffer;
-    const char* suffix;
-    std::optional<std::int64_t> value;
-  };
   const auto choke = [](std::uint64_t value) { return full().record(142, {value}); };
   const auto formatted = [](std::uint64_t time) { return full().record(56, {time}); };
-  const std::vector<Case> cases = {
+  const std::vector<std::tuple<StatsBuffer, const char*, std::optional<std::int64_t>>> cases = {
       {formatted(946684799), "formatDaysSince2000", 0},
       {formatted(946684800 + 604799), "formatDaysSince2000", 0},
       {formatted(946684800 + 604800), "formatDaysSince2000", 1},
@@ -120,10 +116,8 @@ TEST(NandInfo, DerivesItsOwnValues) {
       {full().record(114, {1, 2, 3, 4, 5}), "BandsPerInternalFlow3", 5},
       {full().record(124, {9}), "ColdestCycle", {}},
   };
-  for (const Case& c : cases) {
-    EXPECT_EQ(under(infoOf(c.buffer), c.suffix), c.value ? PlistValue::int64(*c.value) : PlistValue())
-        << c.suffix;
-  }
+  for (const auto& [buffer, suffix, value] : cases)
+    EXPECT_EQ(under(infoOf(buffer), suffix), value ? PlistValue::int64(*value) : PlistValue()) << suffix;
 }
 
 TEST(NandInfo, IsCopiedFromTheControllerAndMergedIntoALog) {

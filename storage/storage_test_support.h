@@ -2,7 +2,6 @@
 // command code.
 #pragma once
 
-#include <initializer_list>
 #include <map>
 #include <string>
 #include <vector>
