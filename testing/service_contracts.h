@@ -108,8 +108,27 @@ TYPED_TEST_P(PreferencesContract, ReadsNumbersAndBooleansAsTheirKindsAlone) {
     EXPECT_TRUE(boolean.value == c.boolean && boolean.valid == c.isBoolean) << c.integer;
   }
 }
+
+TYPED_TEST_P(PreferencesContract, ASeriesOfChangesComesToTheSameAsOneAfterTheOther) {
+  this->service.setValue("old", PlistValue::int64(1), "a");
+  const PlistValue one = PlistValue::int32(1), two = PlistValue::int32(2);
+  this->service.applyChanges(std::vector<PreferenceChange>{{"old", PlistValue(), "a"},
+                                                           {"k", one, "a"},
+                                                           {"k", one, "b"},
+                                                           {"k", two, "a"},
+                                                           {"back", PlistValue(), "b"},
+                                                           {"back", one, "b"},
+                                                           {"gone", one, "a"},
+                                                           {"gone", PlistValue(), "a"}});
+  PreferencesStore& there = this->subject.another();
+  EXPECT_EQ(there.getValue("k", "a"), two);
+  EXPECT_EQ(there.getValue("k", "b"), one);
+  EXPECT_EQ(there.getValue("back", "b"), one);
+  EXPECT_TRUE(there.getValue("old", "a").isNone() && there.getValue("gone", "a").isNone());
+}
 REGISTER_TYPED_TEST_SUITE_P(PreferencesContract, KeepsValuesByDomainVisibleAtOnceUntilTheyAreRemoved,
-                            ReadsNumbersAndBooleansAsTheirKindsAlone);
+                            ReadsNumbersAndBooleansAsTheirKindsAlone,
+                            ASeriesOfChangesComesToTheSameAsOneAfterTheOther);
 
 template <typename Subject>
 struct DeviceAnswersContract : ServiceContract<Subject> {};

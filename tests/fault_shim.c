@@ -1,8 +1,8 @@
 // Preloaded into a program, makes its Nth call that changes something under the device root go wrong.
 //
-// TBDAILY_ROOT is the root, FAULT_AT is N, and FAULT_MODE says how: "error" (the call fails with EIO), "full" (the Nth
-// call and all later ones that need room fail with ENOSPC, a write after half of its bytes), "kill" (the process ends
-// with status 77 in place of the call). The file FAULT_MARK is made when it happens.
+// TBDAILY_ROOT is the root, FAULT_AT is N, and FAULT_MODE says how: "error" (the call fails with EIO), "full"
+// (the Nth call and all later ones that need room fail with ENOSPC, a write after half of its bytes), "kill"
+// (the process ends with status 77 in place of the call). The file FAULT_MARK is made when it happens.
 #define _GNU_SOURCE
 #include <dlfcn.h>
 #include <errno.h>
@@ -64,8 +64,12 @@ int ftruncate(int fd, off_t size) {
 }
 int ftruncate64(int fd, off_t size) __attribute__((alias("ftruncate")));
 
-int fsync(int fd) { return descriptorGoesWrong(fd, NEEDS_NOTHING) ? -1 : (int)syscall(SYS_fsync, fd); }
-int fdatasync(int fd) { return descriptorGoesWrong(fd, NEEDS_NOTHING) ? -1 : (int)syscall(SYS_fdatasync, fd); }
+int fsync(int fd) {
+  return descriptorGoesWrong(fd, NEEDS_NOTHING) ? -1 : (int)syscall(SYS_fsync, fd);
+}
+int fdatasync(int fd) {
+  return descriptorGoesWrong(fd, NEEDS_NOTHING) ? -1 : (int)syscall(SYS_fdatasync, fd);
+}
 
 int open(const char* path, int flags, ...) {
   va_list arguments;

@@ -82,6 +82,10 @@ TEST_F(PreferencesTest, MoveDamagedFilesAsideAndNeverOverwriteThem) {
   const std::string before = device.text(path("d.plist"));
   preferences.setValue("k", PlistValue::string("\x01"), "d");  // XML has no such character
   EXPECT_EQ(device.text(path("d.plist")), before);
+  preferences.applyChanges(std::vector<PreferenceChange>{{"k", PlistValue::string("\x01"), "d"},
+                                                         {"n", PlistValue::int64(2), "d"}});
+  EXPECT_EQ(preferences.getInteger("k", "d"), 1);
+  EXPECT_EQ(preferences.getInteger("n", "d"), 2);
 }
 
 TEST_F(PreferencesTest, TouchNoFileForAHostileDomain) {
