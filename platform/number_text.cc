@@ -151,7 +151,8 @@ std::string stampText(PlistDate date, unsigned fractionDigits) {
       std::min(999999U, static_cast<unsigned>(civilTime(date).fraction * 1e6 + kResolution));
   std::string digits = std::to_string(1000000 + microseconds);  // seven, the first of them no part of it
   std::string text = dateText(date, DateFraction::Drop);
-  return text.replace(text.size() - 1, 1, "." + digits.substr(1, fractionDigits) + "Z");
+  text.back() = '.';
+  return text.append(digits, 1, fractionDigits).append("Z");
 }
 
 }  // namespace tbdaily

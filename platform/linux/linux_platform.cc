@@ -2,12 +2,12 @@
 
 #include <utility>
 
-#include "platform/driver_registry.h"
 #include "platform/linux/analytics_history.h"
 #include "platform/linux/analytics_home.h"
 #include "platform/linux/linux_analytics_client.h"
 #include "platform/linux/linux_app_registry.h"
 #include "platform/linux/linux_device_answers.h"
+#include "platform/linux/linux_driver_registry.h"
 #include "platform/linux/linux_file_system.h"
 #include "platform/linux/linux_kernel.h"
 #include "platform/linux/linux_locale_settings.h"
@@ -15,11 +15,11 @@
 #include "platform/linux/linux_notifications.h"
 #include "platform/linux/linux_preferences.h"
 #include "platform/linux/linux_service_listener.h"
+#include "platform/linux/linux_stack_snapshot.h"
 #include "platform/linux/linux_system_log.h"
 #include "platform/linux/linux_usage_service.h"
 #include "platform/linux/property_list_codec.h"
 #include "platform/linux/recordings.h"
-#include "platform/stack_snapshot.h"
 
 namespace tbdaily {
 
@@ -45,8 +45,8 @@ struct LinuxPlatform::Families {
   LinuxSystemLog systemLog{host, kernel, deviceAnswers};
   LinuxDynamicLoader dynamicLoader{host};
   LinuxMessageDigest messageDigest;
-  AbsentDriverRegistry driverRegistry;
-  AbsentStackSnapshot stackSnapshot;
+  LinuxDriverRegistry driverRegistry{recordings};
+  LinuxStackSnapshot stackSnapshot{recordings};
   LinuxUsageService usageService{recordings};  // last: it ends before what its replies use
 
   Platform services{driverRegistry,   preferences,     deviceAnswers, logSubmission, analyticsClient,

@@ -1,5 +1,6 @@
 #include "platform/linux/recordings.h"
 
+#include <algorithm>
 #include <cerrno>
 
 namespace tbdaily {
@@ -35,6 +36,19 @@ PlistValue Recordings::load(std::string_view file) {
     Host::noteOnce("recording " + place.native() + " is ignored: " + reason);
   }
   return loaded.root;
+}
+
+bool Recordings::readFile(std::string_view file, FileContents& contents) {
+  const std::filesystem::path folder = path("").parent_path();
+  const std::filesystem::path place = (folder / file).lexically_normal();
+  // What a recording names comes from outside: it leads nowhere else.
+  if (std::mismatch(folder.begin(), folder.end(), place.begin(), place.end()).first != folder.end()) {
+    Host::noteOnce("recorded file " + place.native() + " is ignored: it lies outside of " + folder.native());
+    return false;
+  }
+  const int error = readRegularFile(place, contents);
+  if (error != 0) Host::noteOnce("recorded file " + place.native() + " is ignored: " + errorText(error));
+  return error == 0;
 }
 
 PlistValue Recordings::entry(std::string_view file, std::string_view key) {

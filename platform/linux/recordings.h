@@ -24,6 +24,10 @@ class Recordings {
   // An entry of the recording's root, or none.
   PlistValue entry(std::string_view file, std::string_view key);
 
+  // The bytes of a file below System/Device/; false when it cannot be read (named once) or does not lie
+  // there.
+  bool readFile(std::string_view file, FileContents& contents);
+
   // The place of a file under System/Device/.
   std::filesystem::path path(std::string_view file) const;
 
@@ -46,6 +50,8 @@ inline constexpr std::string_view kKernel = "kernel.plist";
 inline constexpr std::string_view kApps = "apps.plist";
 inline constexpr std::string_view kLocale = "locale.plist";
 inline constexpr std::string_view kUsage = "usage.plist";
+inline constexpr std::string_view kRegistry = "registry.plist";
+inline constexpr std::string_view kStackSnapshot = "snapshot.kcdata";
 }  // namespace recording
 
 }  // namespace tbdaily
