@@ -6,7 +6,10 @@
 #include "platform/linux/linux_platform.h"
 
 int main(int argc, char** argv) {
-  std::signal(SIGPIPE, SIG_IGN);  // a reader of our output that went away is no reason to die
+  // A reader of our output that went away, or a limit on the size of files, is an error like others and no
+  // reason to die.
+  std::signal(SIGPIPE, SIG_IGN);
+  std::signal(SIGXFSZ, SIG_IGN);
   try {
     tbdaily::LinuxPlatform platform(tbdaily::Host::fromEnvironment());
     return tbdaily::runEntry(platform.services(), argc, argv);

@@ -10,8 +10,8 @@
 
 #include "platform/linux/big_endian_reader.h"
 #include "platform/linux/plist_limits.h"
-#include "platform/utf8.h"
 #include "platform/number_text.h"
+#include "platform/utf8.h"
 
 namespace tbdaily {
 

@@ -13,8 +13,8 @@
 #include "platform/linux/plist_builder.h"
 #include "platform/linux/plist_limits.h"
 #include "platform/linux/plist_scalar_text.h"
-#include "platform/utf8.h"
 #include "platform/linux/xml_doctype.h"
+#include "platform/utf8.h"
 
 namespace tbdaily {
 

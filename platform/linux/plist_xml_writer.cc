@@ -9,8 +9,8 @@
 #include "platform/linux/base64.h"
 #include "platform/linux/plist_limits.h"
 #include "platform/linux/plist_scalar_text.h"
-#include "platform/utf8.h"
 #include "platform/number_text.h"
+#include "platform/utf8.h"
 
 namespace tbdaily {
 

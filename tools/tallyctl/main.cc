@@ -38,7 +38,8 @@ std::string reasonOf(const CLI::App& app, const CLI::ParseError& error, int argc
     if (word == "--root") ++i;
     if (word.empty() || word[0] == '-') continue;
     const bool isKnown =
-        !app.get_subcommands([&word](const CLI::App* command) { return command->get_name() == word; }).empty();
+        !app.get_subcommands([&word](const CLI::App* command) { return command->get_name() == word; })
+             .empty();
     return isKnown ? std::string(error.what()) : "there is no command \"" + word + "\"";
   }
   return error.what();
