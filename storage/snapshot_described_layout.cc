@@ -1,0 +1,145 @@
+// Snapshot records whose layout a header describes field by field.
+
+#include <algorithm>
+#include <array>
+#include <cstring>
+#include <optional>
+
+#include "platform/byte_reader.h"
+#include "storage/snapshot_format.h"
+#include "storage/snapshot_layout.h"
+#include "storage/snapshot_renderer.h"
+#include "storage/snapshot_text.h"
+
+namespace tbdaily {
+
+namespace {
+
+constexpr std::size_t kTitleOffset = 36;
+constexpr std::size_t kFieldsOffset = 8;  // within the field table
+constexpr std::size_t kFieldSize = 28;
+constexpr std::size_t kMostFields = 1024;
+constexpr std::uint32_t kFirstVersionWithTitle = 6;
+constexpr std::size_t kTripleSize = kPriorityTripleWords * sizeof(std::uint32_t);
+
+enum class FieldKind : std::uint16_t { kValue = 0, kPlainValue = 1, kThousands = 2, kPriorities = 3 };
+
+struct Field {
+  FieldKind kind{};
+  std::uint32_t offset = 0;     // within the record
+  std::uint32_t arraySize = 0;  // in bytes; of priority triples only
+  std::array<char, kSnapshotFormatSize> format{};
+};
+
+// A header's contents, each checked against its end. Numbers outside are 0.
+class SnapshotHeader {
+ public:
+  explicit SnapshotHeader(std::span<const std::byte> bytes) : bytes_(bytes), reader_(bytes) {}
+
+  std::uint32_t version() const { return word(4); }
+  std::uint32_t recordSize() const { return word(8); }
+  std::uint32_t slots() const { return word(12); }
+  std::span<const std::byte> title() const {
+    const auto rest = bytes_.subspan(std::min(bytes_.size(), kTitleOffset));
+    return {rest.begin(), std::ranges::find(rest, std::byte{0})};
+  }
+  std::size_t fieldCount() const {
+    const std::size_t first = fieldTable() + kFieldsOffset;
+    if (first > bytes_.size()) return 0;
+    return std::min({std::size_t{word(fieldTable())}, (bytes_.size() - first) / kFieldSize, kMostFields});
+  }
+  // The index is below fieldCount().
+  Field field(std::size_t index) const {
+    const std::size_t at = fieldTable() + kFieldsOffset + index * kFieldSize;
+    Field field{
+        static_cast<FieldKind>(reader_.at<std::uint16_t>(at).value_or(0)), word(at + 4), word(at + 8), {}};
+    std::memcpy(field.format.data(), bytes_.subspan(at + 12).data(), kSnapshotFormatSize);
+    return field;
+  }
+
+ private:
+  std::uint32_t word(std::size_t at) const { return reader_.at<std::uint32_t>(at).value_or(0); }
+  std::size_t fieldTable() const { return word(24); }
+
+  std::span<const std::byte> bytes_;
+  ByteReader reader_;
+};
+
+void renderHeading(SnapshotText& out, const SnapshotHeader& header) {
+  if (header.version() < kFirstVersionWithTitle) return out.append(kSnapshotLegend);
+  out.append("- STX Snapshot - \n");
+  out.appendBytes(header.title());
+  out.append("\n");
+}
+
+void renderPriorities(SnapshotText& out, std::span<const std::byte> record, const Field& field) {
+  const std::size_t inside = record.size() - std::min<std::size_t>(record.size(), field.offset);
+  const std::size_t priorities = std::min<std::size_t>(field.arraySize, inside) / kTripleSize;
+  const ByteReader reader(record);
+  for (const SnapshotColumn& column : kDescribedPriorityColumns) {
+    appendFormatted(out, field.format, column.label);
+    const std::size_t first = field.offset + column.word * sizeof(std::uint32_t);
+    for (std::size_t i = 0; i < priorities && out.fits(); ++i) {
+      if (i > 0) out.append("/");
+      out.appendNumber(reader.at<std::uint32_t>(first + i * kTripleSize).value_or(0), column.width);
+    }
+  }
+}
+
+// `record` begins with the record and ends with the buffer: a header may place a value behind its record.
+void renderField(SnapshotText& out, std::span<const std::byte> record, const Field& field) {
+  if (field.kind == FieldKind::kPriorities) return renderPriorities(out, record, field);
+  const auto value = ByteReader(record).at<std::uint32_t>(field.offset);
+  if (!value) return;
+  if (field.kind == FieldKind::kValue || field.kind == FieldKind::kPlainValue) {
+    appendFormatted(out, field.format, std::array{*value});
+  } else if (field.kind == FieldKind::kThousands) {
+    const auto [whole, hundredths] = splitThousands(*value);
+    appendFormatted(out, field.format, std::array{whole, hundredths});
+  }
+}
+
+// A history being rendered into a text.
+struct Walk {
+  SnapshotHeader header;
+  std::span<const std::byte> records;
+  SnapshotText out;
+  std::size_t kept = 0;  // characters up to the last complete line
+};
+
+// True when the last slot was reached, false when a record did not fit.
+bool renderRecords(Walk& walk, std::uint32_t& cursor) {
+  const std::uint32_t lastSlot = std::max(walk.header.slots(), 1U) - 1;
+  const std::size_t stride = walk.header.recordSize();
+  const std::size_t fields = walk.header.fieldCount();
+  const std::size_t whole = stride == 0 || fields == 0 ? 0 : walk.records.size() / stride;
+  const auto end = static_cast<std::uint32_t>(std::min<std::size_t>(lastSlot, whole));
+  const std::size_t marker = fields == 0 ? 0 : walk.header.field(0).offset;
+  while (cursor < end) {
+    const auto record = walk.records.subspan(cursor++ * stride);
+    if (ByteReader(record).at<std::uint32_t>(marker).value_or(0) == 0) continue;
+    for (std::size_t i = 0; i < fields && walk.out.fits(); ++i)
+      renderField(walk.out, record, walk.header.field(i));
+    walk.out.append("\n");
+    if (!walk.out.fits()) return false;
+    walk.kept = walk.out.length();
+  }
+  cursor = std::max(cursor, lastSlot);
+  return true;
+}
+
+}  // namespace
+
+bool STXParseSnapshotBufferWithInplaceParser(std::span<const std::byte> records, char* text,
+                                             std::size_t& size, std::span<const std::byte> header,
+                                             std::uint32_t& cursor) {
+  if (header.empty()) return false;
+  Walk walk{SnapshotHeader(header), records, SnapshotText(text, size)};
+  if (cursor == 0) renderHeading(walk.out, walk.header);
+  const bool finished = walk.out.fits() && renderRecords(walk, cursor);
+  walk.out.endAt(walk.kept);
+  size = walk.kept + 1;
+  return finished;
+}
+
+}  // namespace tbdaily
