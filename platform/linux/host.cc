@@ -1,9 +1,9 @@
 #include "platform/linux/host.h"
 
-#include <errno.h>  // program_invocation_short_name
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>  // program_invocation_short_name too
 #include <cstdlib>
 #include <utility>
 

@@ -1,11 +1,11 @@
 #include "platform/linux/linux_kernel.h"
 
-#include <errno.h>  // program_invocation_short_name
 #include <sys/sysinfo.h>
-#include <time.h>  // clock_gettime
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>  // program_invocation_short_name too
+#include <ctime>
 #include <limits>
 
 namespace tbdaily {

@@ -1,0 +1,156 @@
+#include "storage/structured_logs.h"
+
+#include <array>
+#include <memory>
+#include <new>
+#include <vector>
+
+#include "platform/preferences_store.h"
+#include "storage/storage_connection.h"
+#include "storage/write_amplification.h"
+
+namespace tbdaily {
+
+StorageLogState gStorageLogState;
+
+namespace {
+
+using ListHandler = bool (*)(Platform&, const FetchedList&, Diagnostics&);
+
+// A list that is fetched, and what handles it. `unsupported` is said, once, when the controller cannot serve
+// the list.
+struct SelectorFunctionEntry {
+  SelectorGetter NandExporter::*getter;
+  ListHandler handler;
+  std::uint16_t list;
+};
+
+struct ListKind {
+  SelectorGetter NandExporter::*getter;
+  ListHandler handler;
+  std::uint16_t lists;  // how many sub-lists
+  const char* unsupported;
+};
+
+constexpr std::array<ListKind, 3> kListKinds = {{
+    {&NandExporter::bandStatsSelectors, HandleValidityList, 1, "Validity list"},
+    {&NandExporter::telemetryListSelectors, HandleTelemetryList, 3, "Telemetry list"},
+    {&NandExporter::defectsListSelectors, HandleDefectsList, 1, "Defects list"},
+}};
+
+// Zeros when the statistics cannot be had.
+WriteAmplification currentWriteAmplification(Platform& platform, Diagnostics& diagnostics,
+                                             NandExporterTable exporters) {
+  const std::unique_ptr<FetchedStats> stats(
+      new (std::nothrow) FetchedStats(platform.driverRegistry, diagnostics, exporters));
+  if (stats == nullptr) {
+    diagnostics.error("not enough memory?");
+    return {};
+  }
+  return *stats ? computeWriteAmplification(stats->context()) : WriteAmplification{};
+}
+
+void updateState(Platform& platform, Diagnostics& diagnostics, NandExporterTable exporters) {
+  StorageLogState& state = gStorageLogState;
+  const WriteAmplification amplification = currentWriteAmplification(platform, diagnostics, exporters);
+  state.gCurrentUserWamp = amplification.user;
+  state.gCurrentSysWamp = amplification.system;
+  state.gNeedValidityList =
+      state.gForceCollectionSet || isAboveThreshold(amplification.user, platform.preferences);
+}
+
+std::vector<SelectorFunctionEntry> selectorFunctions(const NandExporter& descriptor,
+                                                     Diagnostics& diagnostics) {
+  std::vector<SelectorFunctionEntry> entries;
+  for (const ListKind& kind : kListKinds) {
+    if (descriptor.*kind.getter == nullptr) {
+      diagnostics.error("%s retrieval is not supported\n", kind.unsupported);
+      continue;
+    }
+    for (std::uint16_t list = 0; list < kind.lists; ++list)
+      entries.push_back({kind.getter, kind.handler, list});
+  }
+  return entries;
+}
+
+// The lists of one open controller.
+class ListCollection {
+ public:
+  ListCollection(Platform& platform, const StorageService& service, const StorageConnection& connection,
+                 PlistValue characteristics, bool extended, Diagnostics& diagnostics)
+      : platform_(platform),
+        descriptor_(service.descriptor()),
+        connection_(connection),
+        characteristics_(std::move(characteristics)),
+        extended_(extended),
+        diagnostics_(diagnostics) {}
+
+  bool run() {
+    bool result = true;
+    int index = 0;
+    for (const SelectorFunctionEntry& entry : selectorFunctions(descriptor_, diagnostics_)) {
+      result = collect(entry, index++) && result;
+    }
+    return result;
+  }
+
+ private:
+  // False when the list makes the whole result false; a query or a fetch that fails does not.
+  bool collect(const SelectorFunctionEntry& entry, int index) {
+    const STXSelectorPair* selectors = (descriptor_.*entry.getter)();
+    if (selectors == nullptr) return false;
+    const StxRequestOptions options{entry.list, extended_};
+    const StxRequest query = StxRequest::sizeQuery(*selectors, options);
+    std::uint32_t size = 0;
+    if (const KdStatus status = connection_.querySize(&query, size); status != kKdSuccess) {
+      diagnostics_.error("KdConnectCallStructMethod failed with status 0x%x on selector index %d\n",
+                         static_cast<unsigned>(status), index);
+      return true;
+    }
+    if (size == 0) return true;
+    StorageBuffer buffer(size);
+    if (!buffer) {
+      diagnostics_.error("Could not malloc %zd bytes", static_cast<ssize_t>(size));
+      return false;
+    }
+    const StxRequest fetch = StxRequest::dataFetch(*selectors, options);
+    if (connection_.fetch(&fetch, buffer) != kKdSuccess) {
+      diagnostics_.error("Could not retrieve data from driver for selector %u\n", fetch.command);
+      return true;
+    }
+    return entry.handler(platform_, {buffer.filled(), size, characteristics_, descriptor_.className},
+                         diagnostics_);
+  }
+
+  Platform& platform_;
+  const NandExporter& descriptor_;
+  const StorageConnection& connection_;
+  const PlistValue characteristics_;
+  const bool extended_;
+  Diagnostics& diagnostics_;
+};
+
+}  // namespace
+
+bool DumpStorageStructuredLog(Platform& platform, bool extended, Diagnostics& diagnostics,
+                              NandExporterTable exporters) {
+  updateState(platform, diagnostics, exporters);
+  const StorageService service(platform.driverRegistry, exporters);
+  if (!service) {
+    diagnostics.error("Could not get matching KdKit service for exporting classes\n");
+    return false;
+  }
+  const StorageConnection connection(service, diagnostics);
+  if (!connection) return false;
+  PlistValue characteristics = platform.driverRegistry.KdRegistryEntrySearchCFProperty(
+      service.handle(), KdRegistryPlane::KdService, service.descriptor().characteristicsKey,
+      KdSearchOptions::RecursivelyTowardsParents);
+  if (characteristics.isNone()) {
+    diagnostics.error("failed to create dictionary");
+    return false;
+  }
+  return ListCollection(platform, service, connection, std::move(characteristics), extended, diagnostics)
+      .run();
+}
+
+}  // namespace tbdaily
