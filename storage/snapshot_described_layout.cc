@@ -18,7 +18,7 @@ namespace {
 constexpr std::size_t kTitleOffset = 36;
 constexpr std::size_t kFieldsOffset = 8;  // within the field table
 constexpr std::size_t kFieldSize = 28;
-constexpr std::size_t kMostFields = 1024;
+constexpr std::size_t kMostFields = 512;
 constexpr std::uint32_t kFirstVersionWithTitle = 6;
 constexpr std::size_t kTripleSize = kPriorityTripleWords * sizeof(std::uint32_t);
 
@@ -28,8 +28,14 @@ struct Field {
   FieldKind kind{};
   std::uint32_t offset = 0;     // within the record
   std::uint32_t arraySize = 0;  // in bytes; of priority triples only
-  std::array<char, kSnapshotFormatSize> format{};
+  SnapshotFormat format;
 };
+
+SnapshotFormat::Arguments argumentsOf(FieldKind kind) {
+  if (kind == FieldKind::kPriorities) return SnapshotFormat::Arguments::kText;
+  return kind == FieldKind::kThousands ? SnapshotFormat::Arguments::kTwoValues
+                                       : SnapshotFormat::Arguments::kValue;
+}
 
 // A header's contents, each checked against its end. Numbers outside are 0.
 class SnapshotHeader {
@@ -51,10 +57,10 @@ class SnapshotHeader {
   // The index is below fieldCount().
   Field field(std::size_t index) const {
     const std::size_t at = fieldTable() + kFieldsOffset + index * kFieldSize;
-    Field field{
-        static_cast<FieldKind>(reader_.at<std::uint16_t>(at).value_or(0)), word(at + 4), word(at + 8), {}};
-    std::memcpy(field.format.data(), bytes_.subspan(at + 12).data(), kSnapshotFormatSize);
-    return field;
+    const auto kind = static_cast<FieldKind>(reader_.at<std::uint16_t>(at).value_or(0));
+    std::array<char, SnapshotFormat::kSize> format;
+    std::memcpy(format.data(), bytes_.subspan(at + 12).data(), format.size());
+    return {kind, word(at + 4), word(at + 8), SnapshotFormat(format, argumentsOf(kind))};
   }
 
  private:
@@ -77,7 +83,7 @@ void renderPriorities(SnapshotText& out, std::span<const std::byte> record, cons
   const std::size_t priorities = std::min<std::size_t>(field.arraySize, inside) / kTripleSize;
   const ByteReader reader(record);
   for (const SnapshotColumn& column : kDescribedPriorityColumns) {
-    appendFormatted(out, field.format, column.label);
+    field.format.append(out, column.label);
     const std::size_t first = field.offset + column.word * sizeof(std::uint32_t);
     for (std::size_t i = 0; i < priorities && out.fits(); ++i) {
       if (i > 0) out.append("/");
@@ -92,37 +98,42 @@ void renderField(SnapshotText& out, std::span<const std::byte> record, const Fie
   const auto value = ByteReader(record).at<std::uint32_t>(field.offset);
   if (!value) return;
   if (field.kind == FieldKind::kValue || field.kind == FieldKind::kPlainValue) {
-    appendFormatted(out, field.format, std::array{*value});
+    field.format.append(out, {*value});
   } else if (field.kind == FieldKind::kThousands) {
     const auto [whole, hundredths] = splitThousands(*value);
-    appendFormatted(out, field.format, std::array{whole, hundredths});
+    field.format.append(out, {whole, hundredths});
   }
 }
 
-// A history being rendered into a text.
-struct Walk {
-  SnapshotHeader header;
-  std::span<const std::byte> records;
-  SnapshotText out;
-  std::size_t kept = 0;  // characters up to the last complete line
+// The fields of a header, read once for all records.
+class Fields {
+ public:
+  explicit Fields(const SnapshotHeader& header) : count_(header.fieldCount()) {
+    for (std::size_t i = 0; i < count_; ++i) fields_[i] = header.field(i);
+  }
+  std::span<const Field> all() const { return {fields_.data(), count_}; }
+
+ private:
+  std::size_t count_;
+  std::array<Field, kMostFields> fields_;
 };
 
-// True when the last slot was reached, false when a record did not fit.
-bool renderRecords(Walk& walk, std::uint32_t& cursor) {
-  const std::uint32_t lastSlot = std::max(walk.header.slots(), 1U) - 1;
-  const std::size_t stride = walk.header.recordSize();
-  const std::size_t fields = walk.header.fieldCount();
-  const std::size_t whole = stride == 0 || fields == 0 ? 0 : walk.records.size() / stride;
-  const auto end = static_cast<std::uint32_t>(std::min<std::size_t>(lastSlot, whole));
-  const std::size_t marker = fields == 0 ? 0 : walk.header.field(0).offset;
-  while (cursor < end) {
-    const auto record = walk.records.subspan(cursor++ * stride);
-    if (ByteReader(record).at<std::uint32_t>(marker).value_or(0) == 0) continue;
-    for (std::size_t i = 0; i < fields && walk.out.fits(); ++i)
-      renderField(walk.out, record, walk.header.field(i));
-    walk.out.append("\n");
-    if (!walk.out.fits()) return false;
-    walk.kept = walk.out.length();
+// True when the last slot was reached, false when a record did not fit. `kept` becomes the length up to the
+// last complete line.
+bool renderRecords(SnapshotText& out, std::span<const std::byte> records, const SnapshotHeader& header,
+                   std::uint32_t& cursor, std::size_t& kept) {
+  const Fields described(header);
+  const std::span<const Field> fields = described.all();
+  const std::uint32_t lastSlot = std::max(header.slots(), 1U) - 1;
+  const std::size_t stride = header.recordSize();
+  const std::size_t whole = stride == 0 || fields.empty() ? 0 : records.size() / stride;
+  while (cursor < std::min<std::size_t>(lastSlot, whole)) {
+    const auto record = records.subspan(cursor++ * stride);
+    if (ByteReader(record).at<std::uint32_t>(fields.front().offset).value_or(0) == 0) continue;
+    for (std::size_t i = 0; i < fields.size() && out.fits(); ++i) renderField(out, record, fields[i]);
+    out.append("\n");
+    if (!out.fits()) return false;
+    kept = out.length();
   }
   cursor = std::max(cursor, lastSlot);
   return true;
@@ -134,11 +145,13 @@ bool STXParseSnapshotBufferWithInplaceParser(std::span<const std::byte> records,
                                              std::size_t& size, std::span<const std::byte> header,
                                              std::uint32_t& cursor) {
   if (header.empty()) return false;
-  Walk walk{SnapshotHeader(header), records, SnapshotText(text, size)};
-  if (cursor == 0) renderHeading(walk.out, walk.header);
-  const bool finished = walk.out.fits() && renderRecords(walk, cursor);
-  walk.out.endAt(walk.kept);
-  size = walk.kept + 1;
+  SnapshotText out(text, size);
+  const SnapshotHeader description(header);
+  if (cursor == 0) renderHeading(out, description);
+  std::size_t kept = 0;
+  const bool finished = out.fits() && renderRecords(out, records, description, cursor, kept);
+  out.endAt(kept);
+  size = kept + 1;
   return finished;
 }
 

@@ -1,47 +1,31 @@
 #include "storage/snapshot_format.h"
 
 #include <algorithm>
-#include <array>
 #include <charconv>
-#include <optional>
 
 namespace tbdaily {
 
 namespace {
 
-constexpr std::string_view kIntegerConversions = "diuoxX";
-constexpr std::string_view kTextConversions = "s";
+using Conversion = SnapshotFormat::Conversion;
 
-// One stretch of a format: plain text, or a conversion.
-struct FormatPiece {
-  std::string_view plain;
-  char conversion = '\0';  // none: plain text
-  bool left = false;
-  bool plus = false;
-  bool space = false;
-  bool alternative = false;
-  bool zero = false;
-  std::size_t width = 0;
-  std::optional<std::size_t> precision;
-};
-
-void readFlags(std::string_view& rest, FormatPiece& piece) {
+void readFlags(std::string_view& rest, Conversion& conversion) {
   for (; !rest.empty(); rest.remove_prefix(1)) {
     switch (rest.front()) {
       case '-':
-        piece.left = true;
+        conversion.left = true;
         break;
       case '+':
-        piece.plus = true;
+        conversion.plus = true;
         break;
       case ' ':
-        piece.space = true;
+        conversion.space = true;
         break;
       case '#':
-        piece.alternative = true;
+        conversion.alternative = true;
         break;
       case '0':
-        piece.zero = true;
+        conversion.zero = true;
         break;
       default:
         return;
@@ -50,117 +34,81 @@ void readFlags(std::string_view& rest, FormatPiece& piece) {
 }
 
 // No digits are 0; nothing when the number is too large.
-std::optional<std::size_t> readSize(std::string_view& rest) {
+std::optional<std::uint8_t> readSize(std::string_view& rest) {
   std::size_t size = 0;
   for (; !rest.empty() && rest.front() >= '0' && rest.front() <= '9'; rest.remove_prefix(1)) {
     size = size * 10 + static_cast<std::size_t>(rest.front() - '0');
     if (size > SnapshotText::kWidest) return std::nullopt;
   }
-  return size;
+  return static_cast<std::uint8_t>(size);
 }
 
-// A conversion, from behind its percent sign. False when it is none that can be printed.
-bool readConversion(std::string_view& rest, std::string_view conversions, FormatPiece& piece) {
-  readFlags(rest, piece);
+// A conversion, from behind its percent sign. False when it is none of the types.
+bool readConversion(std::string_view& rest, std::string_view types, Conversion& conversion) {
+  readFlags(rest, conversion);
   const auto width = readSize(rest);
   if (!width) return false;
-  piece.width = *width;
+  conversion.width = *width;
   if (rest.starts_with('.')) {
     rest.remove_prefix(1);
-    piece.precision = readSize(rest);
-    if (!piece.precision) return false;
+    conversion.precision = readSize(rest);
+    if (!conversion.precision) return false;
   }
-  if (rest.empty() || conversions.find(rest.front()) == conversions.npos) return false;
-  piece.conversion = rest.front();
+  if (rest.empty() || types.find(rest.front()) == types.npos) return false;
+  conversion.type = rest.front();
   rest.remove_prefix(1);
   return true;
 }
 
-// Takes the next piece from a format that is not empty.
-std::optional<FormatPiece> readPiece(std::string_view& rest, std::string_view conversions) {
-  FormatPiece piece;
-  if (rest.starts_with("%%")) {
-    piece.plain = rest.substr(0, 1);
-    rest.remove_prefix(2);
-  } else if (rest.front() == '%') {
-    rest.remove_prefix(1);
-    if (!readConversion(rest, conversions, piece)) return std::nullopt;
-  } else {
-    piece.plain = rest.substr(0, rest.find('%'));
-    rest.remove_prefix(piece.plain.size());
-  }
-  return piece;
-}
-
-bool canPrint(std::string_view format, std::string_view conversions, std::size_t arguments) {
-  while (!format.empty()) {
-    const auto piece = readPiece(format, conversions);
-    if (!piece) return false;
-    if (piece->conversion != '\0' && arguments-- == 0) return false;
-  }
-  return true;
-}
-
-// `print` appends one conversion; it is called for the first, the second ... in turn.
-template <typename Print>
-void appendPieces(SnapshotText& out, std::span<const char, kSnapshotFormatSize> raw,
-                  std::string_view conversions, std::size_t arguments, const Print& print) {
-  const auto end = std::ranges::find(raw, '\0');
-  std::string_view format(raw.begin(), end);
-  if (end == raw.end() || !canPrint(format, conversions, arguments)) return out.append(format);
-  while (!format.empty()) {
-    const auto piece = readPiece(format, conversions);
-    if (piece->conversion == '\0')
-      out.append(piece->plain);
-    else
-      print(*piece);
-  }
-}
-
 // Adds the spaces of a width around what `body` appends.
 template <typename Body>
-void appendPadded(SnapshotText& out, const FormatPiece& piece, std::size_t length, const Body& body) {
-  const std::size_t spaces = piece.width > length ? piece.width - length : 0;
-  if (!piece.left) out.appendFill(' ', spaces);
+void appendPadded(SnapshotText& out, const Conversion& conversion, std::size_t length, const Body& body) {
+  const std::size_t spaces = conversion.width > length ? conversion.width - length : 0;
+  if (!conversion.left) out.appendFill(' ', spaces);
   body();
-  if (piece.left) out.appendFill(' ', spaces);
+  if (conversion.left) out.appendFill(' ', spaces);
+}
+
+bool isHexadecimal(const Conversion& conversion) {
+  return conversion.type == 'x' || conversion.type == 'X';
 }
 
 // What stands before the digits.
-std::string_view prefixOf(const FormatPiece& piece, bool isSigned, bool negative, std::uint32_t magnitude) {
-  if (isSigned) return negative ? "-" : piece.plus ? "+" : piece.space ? " " : "";
-  if (!piece.alternative || magnitude == 0) return "";
-  return piece.conversion == 'x' ? "0x" : piece.conversion == 'X' ? "0X" : "";
+std::string_view prefixOf(const Conversion& conversion, bool isSigned, bool negative,
+                          std::uint32_t magnitude) {
+  if (isSigned) return negative ? "-" : conversion.plus ? "+" : conversion.space ? " " : "";
+  if (!conversion.alternative || !isHexadecimal(conversion) || magnitude == 0) return "";
+  return conversion.type == 'x' ? "0x" : "0X";
 }
 
-std::size_t leadingZeros(const FormatPiece& piece, std::size_t prefix, std::string_view digits) {
-  const std::size_t wanted = piece.precision.value_or(0);
+std::size_t leadingZeros(const Conversion& conversion, std::size_t prefix, std::string_view digits) {
+  const std::size_t wanted = conversion.precision.value_or(0);
   std::size_t zeros = wanted > digits.size() ? wanted - digits.size() : 0;
-  if (piece.alternative && piece.conversion == 'o' && zeros == 0 && !digits.starts_with('0')) zeros = 1;
-  const std::size_t fixed = prefix + zeros + digits.size();
+  if (conversion.alternative && conversion.type == 'o' && zeros == 0 && !digits.starts_with('0')) zeros = 1;
+  const std::size_t length = prefix + zeros + digits.size();
   // A precision and left alignment both turn zero filling off.
-  if (piece.zero && !piece.left && !piece.precision && piece.width > fixed) zeros += piece.width - fixed;
-  return zeros;
+  const bool fills = conversion.zero && !conversion.left && !conversion.precision;
+  return fills && conversion.width > length ? zeros + conversion.width - length : zeros;
 }
 
-void appendInteger(SnapshotText& out, const FormatPiece& piece, std::uint32_t value) {
-  if (piece.conversion == 'u' && !piece.left && !piece.precision)
-    return out.appendNumber(value, piece.width, piece.zero ? '0' : ' ');
-  const bool isSigned = piece.conversion == 'd' || piece.conversion == 'i';
+void appendInteger(SnapshotText& out, const Conversion& conversion, std::uint32_t value) {
+  if (conversion.type == 'u' && !conversion.left && !conversion.precision)
+    return out.appendNumber(value, conversion.width, conversion.zero ? '0' : ' ');
+  const bool isSigned = conversion.type == 'd' || conversion.type == 'i';
   const bool negative = isSigned && value >> 31 != 0;
   const std::uint32_t magnitude = negative ? 0 - value : value;
-  std::array<char, 11> storage{};  // the longest: 32 bits in octal
-  const int base = piece.conversion == 'o' ? 8 : piece.conversion == 'x' || piece.conversion == 'X' ? 16 : 10;
-  char* const end = std::to_chars(storage.begin(), storage.end(), magnitude, base).ptr;
-  if (piece.conversion == 'X')
+  std::array<char, 11> storage;  // the longest: 32 bits in octal
+  const int base = conversion.type == 'o' ? 8 : isHexadecimal(conversion) ? 16 : 10;
+  char* end = std::to_chars(storage.begin(), storage.end(), magnitude, base).ptr;
+  if (conversion.type == 'X')
     std::transform(storage.begin(), end, storage.begin(),
                    [](char c) { return c >= 'a' ? static_cast<char>(c - 'a' + 'A') : c; });
   // A value of 0 in a precision of 0 has no digits.
-  const std::string_view digits(storage.begin(),
-                                magnitude == 0 && piece.precision == 0U ? storage.begin() : end);
-  const std::string_view prefix = prefixOf(piece, isSigned, negative, magnitude);
-  const std::size_t zeros = leadingZeros(piece, prefix.size(), digits);
-  appendPadded(out, piece, prefix.size() + zeros + digits.size(), [&] {
+  if (magnitude == 0 && conversion.precision == 0) end = storage.begin();
+  const std::string_view digits(storage.begin(), end);
+  const std::string_view prefix = prefixOf(conversion, isSigned, negative, magnitude);
+  const std::size_t zeros = leadingZeros(conversion, prefix.size(), digits);
+  appendPadded(out, conversion, prefix.size() + zeros + digits.size(), [&] {
     out.append(prefix);
     out.appendFill('0', zeros);
     out.append(digits);
@@ -169,18 +117,54 @@ void appendInteger(SnapshotText& out, const FormatPiece& piece, std::uint32_t va
 
 }  // namespace
 
-void appendFormatted(SnapshotText& out, std::span<const char, kSnapshotFormatSize> format,
-                     std::span<const std::uint32_t> values) {
-  std::size_t next = 0;
-  appendPieces(out, format, kIntegerConversions, values.size(),
-               [&](const FormatPiece& piece) { appendInteger(out, piece, values[next++]); });
+SnapshotFormat::SnapshotFormat(std::span<const char, kSize> raw, Arguments arguments) {
+  const auto end = std::ranges::find(raw, '\0');
+  if (end != raw.end() && read({raw.begin(), end}, arguments)) return;
+  std::copy(raw.begin(), end, plain_.begin());
+  plainLength_ = static_cast<std::uint8_t>(end - raw.begin());
+  conversionCount_ = 0;
 }
 
-void appendFormatted(SnapshotText& out, std::span<const char, kSnapshotFormatSize> format,
-                     std::string_view argument) {
-  appendPieces(out, format, kTextConversions, 1, [&](const FormatPiece& piece) {
-    const std::string_view shown = argument.substr(0, piece.precision.value_or(argument.size()));
-    appendPadded(out, piece, shown.size(), [&] { out.append(shown); });
+bool SnapshotFormat::read(std::string_view rest, Arguments arguments) {
+  const std::string_view types = arguments == Arguments::kText ? "s" : "diuoxX";
+  const std::size_t most = arguments == Arguments::kTwoValues ? 2 : 1;
+  while (!rest.empty()) {
+    const char next = rest.front();
+    rest.remove_prefix(1);
+    if (next != '%' || rest.starts_with('%')) {
+      if (next == '%') rest.remove_prefix(1);
+      plain_[plainLength_++] = next;
+      continue;
+    }
+    if (conversionCount_ == most) return false;
+    Conversion& conversion = conversions_[conversionCount_++];
+    conversion.at = plainLength_;
+    if (!readConversion(rest, types, conversion)) return false;
+  }
+  return true;
+}
+
+// `print` appends a conversion, given its index.
+template <typename Print>
+void SnapshotFormat::appendPieces(SnapshotText& out, const Print& print) const {
+  const std::string_view plain(plain_.data(), plainLength_);
+  std::size_t done = 0;
+  for (std::size_t i = 0; i < conversionCount_; ++i) {
+    out.append(plain.substr(done, conversions_[i].at - done));
+    done = conversions_[i].at;
+    print(i);
+  }
+  out.append(plain.substr(done));
+}
+
+void SnapshotFormat::append(SnapshotText& out, const std::array<std::uint32_t, kMostValues>& values) const {
+  appendPieces(out, [&](std::size_t i) { appendInteger(out, conversions_[i], values[i]); });
+}
+
+void SnapshotFormat::append(SnapshotText& out, std::string_view argument) const {
+  appendPieces(out, [&](std::size_t i) {
+    const std::string_view shown = argument.substr(0, conversions_[i].precision.value_or(argument.size()));
+    appendPadded(out, conversions_[i], shown.size(), [&] { out.append(shown); });
   });
 }
 

@@ -34,7 +34,7 @@ bool STXParseSnapshotBuffer(std::span<const std::byte> records, char* text, std:
 // - The walk ends, with true and the cursor at the last slot, at the first record that is not wholly inside.
 //   So it does, without a line, for a header without slots, with a record size of 0 or without fields.
 // - A value outside is left out; a record whose first value is outside counts as empty.
-// - Fields after the 1024th are left out, so that a hostile header cannot make each line arbitrarily slow.
+// - Fields after the 512th are left out, so that a hostile header cannot make each line arbitrarily slow.
 // - A field's format prints its value only if it asks for the arguments of the field's kind and no others, in
 //   plain C conversions (d, i, u, o, x, X; s for the letter of a priority group) with a width and a precision
 //   of at most 64. Any other format, and one without a NUL in its 16 bytes, is printed as it stands.
