@@ -127,7 +127,7 @@ class DailyRun(unittest.TestCase):
         for version in ("1", "1", "2"):
             device.record("answers", {"ProductVersion": version})
             device.run("-f")
-        metas = [plistlib.loads(p.read_bytes()) for p in device.pending(".meta.plist")]
+        metas = [plistlib.loads(p.read_bytes()) for p in device.pending(".193.meta.plist")]
         self.assertEqual([m.get("options") for m in metas],
                          [{"previous_os_version": "<unknown>"}, None, {"previous_os_version": "1"}])
         self.assertEqual([p.name[-6:] for p in device.pending()], ["-0.193", "-1.193", "-2.193"])

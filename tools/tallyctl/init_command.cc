@@ -12,6 +12,7 @@
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
 #include "report/tb_config.h"
+#include "tools/tallyctl/sample_controller.h"
 #include "tools/tallyctl/sample_history.h"
 #include "tools/tallyctl/sample_whitelist.h"
 #include "tools/tallyctl/tool.h"
@@ -24,6 +25,8 @@ namespace {
 
 constexpr std::string_view kSupportLibrary =
     "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
+
+constexpr std::string_view kStackSnapshot = "/System/Device/snapshot.kcdata";
 
 // The controllers that a sample device can have, and the model that carries each.
 struct Profile {
@@ -65,7 +68,8 @@ PlistDictionary sampleKernel() {
                           {"kern.memorystatus_freeze_pageouts", PlistValue::int64(812'334)},
                           {"kern.memorystatus_freeze_budget_pages_remaining", PlistValue::int64(51'200)},
                           {"kern.memorystatus_thaw_count", PlistValue::int64(29)},
-                          {"vm.swapusage", PlistValue::data(std::move(swap))}})}};
+                          {"vm.swapusage", PlistValue::data(std::move(swap))}})},
+          {"eccEvents", PlistValue::array(sampleEccEvents())}};
 }
 
 PlistDictionary sampleLocale() {
@@ -111,6 +115,7 @@ std::vector<SampleFile> sampleFiles(const Profile& profile, DayNumber today) {
           {"/System/Device/kernel.plist", sampleKernel()},
           {"/System/Device/locale.plist", sampleLocale()},
           {"/System/Device/apps.plist", sampleBundles()},
+          {"/System/Device/registry.plist", sampleRegistry(profile.name)},
           {"/System/Device/usage.plist", {{"records", PlistValue::array(sampleUsageRecords(today))}}},
           {preferences(preference_domain::kLogSubmission),
            {{"DiagnosticLogSubmissionEnabled", PlistValue::boolean(true)},
@@ -149,8 +154,9 @@ class SampleDevice {
              " is already there; a sample device is never made over another one: choose an empty root";
     }
     for (const SampleFile& file : files) {
-      if (std::string reason = writeFile(file); !reason.empty()) return reason;
+      if (std::string reason = writePlist(file); !reason.empty()) return reason;
     }
+    if (std::string reason = writeStackSnapshot(); !reason.empty()) return reason;
     if (std::string reason = placeSupportLibrary(); !reason.empty()) return reason;
     if (const int failure = host_.makeFolders(store.parent_path()); failure != 0)
       return store.native() + ": " + errorText(failure);
@@ -160,7 +166,7 @@ class SampleDevice {
 
  private:
   std::string firstTaken(const std::vector<SampleFile>& files, const fs::path& store) const {
-    std::vector<fs::path> places{store, host_.devicePath(kSupportLibrary)};
+    std::vector<fs::path> places{store, host_.devicePath(kSupportLibrary), host_.devicePath(kStackSnapshot)};
     for (const SampleFile& file : files) places.push_back(host_.devicePath(file.path));
     for (const fs::path& place : places) {
       std::error_code ignored;
@@ -169,14 +175,22 @@ class SampleDevice {
     return {};
   }
 
-  std::string writeFile(const SampleFile& file) const {
-    const fs::path place = host_.devicePath(file.path);
+  std::string writePlist(const SampleFile& file) const {
     const PlistWriteResult written =
         tool_.platform().services().propertyListCodec.write(PlistValue::dictionary(file.root));
-    if (!written.ok) return place.native() + ": " + written.error;
+    return written.ok ? writeBytes(file.path, written.bytes) : file.path + ": " + written.error;
+  }
+
+  std::string writeBytes(std::string_view path, std::string_view bytes) const {
+    const fs::path place = host_.devicePath(path);
     int error = host_.makeFolders(place.parent_path());
-    if (error == 0) error = replaceFile(place, written.bytes);
+    if (error == 0) error = replaceFile(place, bytes);
     return error == 0 ? "" : place.native() + ": " + errorText(error);
+  }
+
+  std::string writeStackSnapshot() const {
+    const PlistData snapshot = sampleStackSnapshot();
+    return writeBytes(kStackSnapshot, {reinterpret_cast<const char*>(snapshot.data()), snapshot.size()});
   }
 
   std::string placeSupportLibrary() const {

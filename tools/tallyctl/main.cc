@@ -29,6 +29,9 @@ void declare(CLI::App& app, Tool& tool) {
   tbdaily::addPlistCommand(app, tool);
   tbdaily::addTaskingCommand(app, tool);
   tbdaily::addUsageCommand(app, tool);
+  tbdaily::addNandCommand(app, tool);
+  tbdaily::addBufferCommands(app, tool);
+  tbdaily::addWearCommand(app, tool);
 }
 
 // What CLI11 says of a command that it does not know names everything but the command.

@@ -66,5 +66,8 @@ void addWhitelistCommand(CLI::App& app, Tool& tool);
 void addPlistCommand(CLI::App& app, Tool& tool);
 void addTaskingCommand(CLI::App& app, Tool& tool);
 void addUsageCommand(CLI::App& app, Tool& tool);
+void addBufferCommands(CLI::App& app, Tool& tool);
+void addNandCommand(CLI::App& app, Tool& tool);
+void addWearCommand(CLI::App& app, Tool& tool);
 
 }  // namespace tbdaily

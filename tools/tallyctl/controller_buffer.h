@@ -1,0 +1,45 @@
+// Raw buffers of the storage controller, by the names that the companion gives them.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/driver_registry.h"
+#include "storage/diagnostics.h"
+#include "storage/exporters.h"
+
+namespace tbdaily {
+
+struct BufferKind {
+  std::string_view name;
+  SelectorGetter NandExporter::*selectors;
+};
+
+inline constexpr BufferKind kBufferKinds[] = {
+    {"stats", &NandExporter::statsSelectors},
+    {"band-stats", &NandExporter::bandStatsSelectors},
+    {"telemetry", &NandExporter::telemetryListSelectors},
+    {"defects", &NandExporter::defectsListSelectors},
+    {"task-scheduler", &NandExporter::taskSchedulerSelectors},
+    {"snapshot", &NandExporter::snapshotSelectors},
+    {"snapshot-header", &NandExporter::snapshotHeaderSelectors},
+};
+
+struct ControllerBuffer {
+  std::vector<std::byte> bytes;
+  std::string error;  // one line; empty on success
+};
+
+// The companion says what went wrong in one line of its own; the storage modules' texts are for the job.
+class QuietDiagnostics : public Diagnostics {
+  void writeError(std::string_view) override {}
+  void writeOutput(std::string_view) override {}
+};
+
+// Asks the controller for its size and fetches it. `kind` is one of kBufferKinds' names.
+ControllerBuffer fetchControllerBuffer(DriverRegistry& registry, std::string_view kind,
+                                       std::uint16_t list = 0);
+
+}  // namespace tbdaily
