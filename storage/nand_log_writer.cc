@@ -1,13 +1,12 @@
 #include "storage/nand_log_writer.h"
 
-#include <time.h>
-
 #include <algorithm>
 #include <array>
 #include <charconv>
 #include <cmath>
 #include <cstdio>
 #include <cstdlib>
+#include <ctime>
 #include <exception>
 #include <optional>
 #include <span>
@@ -41,9 +40,9 @@ bool isTooEarly(Platform& platform, PlistDate now) {
 // "2026-11-16 09:07:04 -0800", in the time zone that the device is in now. A time that no calendar holds is
 // told as 1970-01-01.
 std::string localDateText(PlistDate date) {
-  const auto seconds = static_cast<time_t>(saturatingInt64(std::floor(date.unixSeconds())));
-  constexpr time_t kEpoch = 0;
-  tm local{};
+  const auto seconds = static_cast<std::time_t>(saturatingInt64(std::floor(date.unixSeconds())));
+  constexpr std::time_t kEpoch = 0;
+  std::tm local{};
   tzset();
   if (localtime_r(&seconds, &local) == nullptr) gmtime_r(&kEpoch, &local);
   const long minutes = local.tm_gmtoff / 60;
