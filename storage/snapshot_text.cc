@@ -17,13 +17,21 @@ constexpr auto kDigitPairs = [] {
   return pairs;
 }();
 
-constexpr std::array<std::uint32_t, 10> kPowersOfTen = {
-    1, 10, 100, 1'000, 10'000, 100'000, 1'000'000, 10'000'000, 100'000'000, 1'000'000'000};
+// By the position of a number's highest bit: what makes the upper half of the sum with the number its count
+// of decimal digits.
+constexpr auto kDigitCounts = [] {
+  std::array<std::uint64_t, 32> counts{};
+  for (std::size_t bit = 0; bit < 32; ++bit) {
+    std::uint64_t power = 10, digits = 1;
+    for (; power <= std::uint64_t{1} << bit; power *= 10) ++digits;
+    // Numbers of the same highest bit from `power` on are a digit longer; 32 bits do not reach 10 billion.
+    counts[bit] = power >> 32 == 0 ? ((digits + 1) << 32) - power : digits << 32;
+  }
+  return counts;
+}();
 
 std::size_t decimalDigits(std::uint32_t value) {
-  // 1233 / 4096 is log10(2), exact enough for 32 bits: the estimate is the number of digits or one less.
-  const auto estimate = static_cast<std::size_t>(std::bit_width(value | 1)) * 1233 / 4096;
-  return estimate + (value >= kPowersOfTen[estimate] || estimate == 0 ? 1 : 0);
+  return (value + kDigitCounts[static_cast<std::size_t>(std::bit_width(value | 1)) - 1]) >> 32;
 }
 
 // Exactly `length` characters, at least as many as the value has digits.
@@ -46,11 +54,13 @@ void writeNumber(char* text, std::size_t length, std::size_t digits, std::uint32
 void SnapshotText::appendNumber(std::uint32_t value, std::size_t width, char fill) {
   const std::size_t digits = decimalDigits(value);
   const std::size_t length = std::max(width, digits);
-  if (length < capacity_ - length_) {
-    writeNumber(text_ + length_, length, digits, value, fill);
-    length_ += length;
-    return;
-  }
+  if (length >= capacity_ - length_) return appendCut(value, length, digits, fill);
+  writeNumber(text_ + length_, length, digits, value, fill);
+  length_ += length;
+}
+
+// Apart, for the sake of its storage, which the usual way does not need.
+void SnapshotText::appendCut(std::uint32_t value, std::size_t length, std::size_t digits, char fill) {
   std::array<char, kWidest> whole;
   writeNumber(whole.data(), length, digits, value, fill);
   append({whole.data(), length});

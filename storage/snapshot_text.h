@@ -49,6 +49,9 @@ class SnapshotText {
   }
 
  private:
+  // A number that leaves no room for the NUL.
+  [[gnu::noinline]] void appendCut(std::uint32_t value, std::size_t length, std::size_t digits, char fill);
+
   // How many characters of a piece may be written.
   std::size_t room(std::size_t count) {
     const std::size_t space = capacity_ - length_;
