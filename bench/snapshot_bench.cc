@@ -43,15 +43,12 @@ void appendField(std::vector<std::byte>& bytes, std::uint32_t kind, std::uint32_
 
 constexpr std::uint32_t kDescribedValues = 20;
 
-// A title, the values of 20 words, a time and both groups of priorities.
+// An empty title, the values of 20 words, a time and both groups of priorities.
 std::vector<std::byte> header() {
   std::vector<std::byte> bytes;
-  for (const std::size_t value :
-       {std::size_t{0}, std::size_t{6}, kSnapshotRecordSize, kRecords + 1, std::size_t{0}, std::size_t{0},
-        std::size_t{40}, std::size_t{0}, std::size_t{0}, std::size_t{0}})
-    append(bytes, static_cast<std::uint32_t>(value));
-  append(bytes, kDescribedValues + 3);
-  append(bytes, 0);
+  const auto recordSize = std::uint32_t{kSnapshotRecordSize}, slots = std::uint32_t{kRecords + 1};
+  for (const std::uint32_t value : {0U, 6U, recordSize, slots, 0U, 0U, 40U, 0U, 0U, 0U}) append(bytes, value);
+  for (const std::uint32_t value : {kDescribedValues + 3, 0U}) append(bytes, value);
   for (std::uint32_t i = 0; i < kDescribedValues; ++i) appendField(bytes, 0, 4 * (30 + i), 0, " AB=%4u");
   appendField(bytes, 2, 4 * 39, 0, " TH=%8u.%02u");
   appendField(bytes, 3, 4 * 14, 48, " R%s=");
@@ -85,12 +82,12 @@ void describedLayout(benchmark::State& state) {
 }
 BENCHMARK(describedLayout)->Unit(benchmark::kMicrosecond);
 
-// The formats are this file's own.
+// Groups take their formats as arguments.
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
 
 // Characters at the end of what was printed before.
 struct Printed {
-  void operator()(const char* format, ...) {
+  [[gnu::format(printf, 2, 3)]] void operator()(const char* format, ...) {
     std::va_list arguments;
     va_start(arguments, format);
     at += std::vsnprintf(at, static_cast<std::size_t>(end - at), format, arguments);
@@ -143,12 +140,11 @@ void fixedLayoutThroughSnprintf(benchmark::State& state) {
     print("%s", kSnapshotLegend.data());
     for (const Record& r : decoded) {
       print(
-          "T=%04u E=%02u HR=%4u HW=%4u NR=%4u NW=%4u TH=%8u.%02u GC=%4u W=%2u BI=%3u BU=%3u V=%5u BF=%2u/%2u "
-          "P=%2u "
-          "H=%2u/%2u X=%2u/%2u L=%3u/%3u C=%2u/%2u S=%4u U=%8u RO=%4u",
+          "T=%04u E=%02u HR=%4u HW=%4u NR=%4u NW=%4u TH=%8u.%02u GC=%4u W=%2u BI=%3u BU=%3u V=%5u "
+          "BF=%2u/%2u P=%2u H=%2u/%2u X=%2u/%2u L=%3u/%3u C=%2u/%2u S=%4u U=%8u RO=%4u",
           r[0], r[26], r[27], r[28], r[29], r[30], r[39] / 1000, r[39] % 1000 / 10, r[31], r[33], r[36],
           r[37], r[45], r[47], r[48], r[1], r[41], r[40], r[50], r[51], r[43], r[44], r[53], r[54], r[42],
-          r[52]);
+          r[52], r[14]);
       for (std::size_t i = 1; i < 4; ++i) print("/%4u", r[14 + 3 * i]);
       printGroup(print, r, 15, {" RL=%7u", "/%7u"});
       printGroup(print, r, 16, {" RM=%5u", "/%5u"});

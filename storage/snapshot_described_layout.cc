@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <array>
 #include <cstring>
-#include <optional>
 
 #include "platform/byte_reader.h"
 #include "storage/snapshot_format.h"
@@ -15,14 +14,23 @@ namespace tbdaily {
 
 namespace {
 
+// Byte offsets in a header, in its field table and in a field of the table.
+constexpr std::size_t kVersionOffset = 4;
+constexpr std::size_t kRecordSizeOffset = 8;
+constexpr std::size_t kSlotsOffset = 12;
+constexpr std::size_t kFieldTableOffset = 24;
 constexpr std::size_t kTitleOffset = 36;
-constexpr std::size_t kFieldsOffset = 8;  // within the field table
+constexpr std::size_t kFieldsOffset = 8;
+constexpr std::size_t kValueOffsetOffset = 4;
+constexpr std::size_t kArraySizeOffset = 8;
+constexpr std::size_t kFormatOffset = 12;
 constexpr std::size_t kFieldSize = 28;
+
 constexpr std::size_t kMostFields = 512;
 constexpr std::uint32_t kFirstVersionWithTitle = 6;
 constexpr std::size_t kTripleSize = kPriorityTripleWords * sizeof(std::uint32_t);
 
-enum class FieldKind : std::uint16_t { kValue = 0, kPlainValue = 1, kThousands = 2, kPriorities = 3 };
+enum class FieldKind : std::uint16_t { kValue = 0, kAlsoValue = 1, kThousands = 2, kPriorities = 3 };
 
 struct Field {
   FieldKind kind{};
@@ -42,9 +50,9 @@ class SnapshotHeader {
  public:
   explicit SnapshotHeader(std::span<const std::byte> bytes) : bytes_(bytes), reader_(bytes) {}
 
-  std::uint32_t version() const { return word(4); }
-  std::uint32_t recordSize() const { return word(8); }
-  std::uint32_t slots() const { return word(12); }
+  std::uint32_t version() const { return word(kVersionOffset); }
+  std::uint32_t recordSize() const { return word(kRecordSizeOffset); }
+  std::uint32_t slots() const { return word(kSlotsOffset); }
   std::span<const std::byte> title() const {
     const auto rest = bytes_.subspan(std::min(bytes_.size(), kTitleOffset));
     return {rest.begin(), std::ranges::find(rest, std::byte{0})};
@@ -59,13 +67,14 @@ class SnapshotHeader {
     const std::size_t at = fieldTable() + kFieldsOffset + index * kFieldSize;
     const auto kind = static_cast<FieldKind>(reader_.at<std::uint16_t>(at).value_or(0));
     std::array<char, SnapshotFormat::kSize> format;
-    std::memcpy(format.data(), bytes_.subspan(at + 12).data(), format.size());
-    return {kind, word(at + 4), word(at + 8), SnapshotFormat(format, argumentsOf(kind))};
+    std::memcpy(format.data(), bytes_.subspan(at + kFormatOffset).data(), format.size());
+    return {kind, word(at + kValueOffsetOffset), word(at + kArraySizeOffset),
+            SnapshotFormat(format, argumentsOf(kind))};
   }
 
  private:
   std::uint32_t word(std::size_t at) const { return reader_.at<std::uint32_t>(at).value_or(0); }
-  std::size_t fieldTable() const { return word(24); }
+  std::size_t fieldTable() const { return word(kFieldTableOffset); }
 
   std::span<const std::byte> bytes_;
   ByteReader reader_;
@@ -97,7 +106,7 @@ void renderField(SnapshotText& out, std::span<const std::byte> record, const Fie
   if (field.kind == FieldKind::kPriorities) return renderPriorities(out, record, field);
   const auto value = ByteReader(record).at<std::uint32_t>(field.offset);
   if (!value) return;
-  if (field.kind == FieldKind::kValue || field.kind == FieldKind::kPlainValue) {
+  if (field.kind == FieldKind::kValue || field.kind == FieldKind::kAlsoValue) {
     field.format.append(out, {*value});
   } else if (field.kind == FieldKind::kThousands) {
     const auto [whole, hundredths] = splitThousands(*value);
