@@ -16,6 +16,7 @@ EPOCH = datetime.datetime(1970, 1, 1)
 NOW = datetime.datetime(2026, 11, 24, 9, 7, 4)
 TODAY = (NOW - EPOCH).days
 YESTERDAY = TODAY - 1
+NO_CONTROLLER = "Could not get matching KdKit service for exporting classes"  # said by each run without one
 ENDPOINT = "com.velmora.tallyd.tbdaily"
 LOGGING = "com.velmora.tallyd.tbdaily.logging"
 
