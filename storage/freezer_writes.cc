@@ -2,8 +2,8 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <deque>
 #include <new>
-#include <vector>
 
 #include "platform/byte_reader.h"
 #include "platform/stack_snapshot.h"
@@ -75,7 +75,7 @@ bool isNamed(std::span<const std::byte> threadName, std::string_view wanted) {
 }
 
 // One pass, with the containers that are open on a stack of its own: they may be nested as deep as the buffer
-// is long.
+// is long. The stack takes at most twice the memory of the buffer, and is never copied.
 class ThreadSearch {
  public:
   ThreadSearch(std::span<const std::byte> buffer, std::string_view threadName)
@@ -135,7 +135,7 @@ class ThreadSearch {
 
   KcdataCursor cursor_;
   std::string_view threadName_;
-  std::vector<Container> open_;  // the innermost last
+  std::deque<Container> open_;  // the innermost last
 };
 
 // The volume that the thread has written, or nothing without a snapshot or the thread in it.
@@ -168,16 +168,17 @@ PlistDictionary CopyVMFreezerNANDInfo(Platform& platform) {
 
 bool getIOStatsWithThreadnameFromKCDataHelper(std::span<const std::byte> buffer, std::string_view threadName,
                                               KcdataIOStats& ioStats, std::size_t* cursor) {
-  ThreadSearch search(buffer, threadName);
   bool isFound = false;
+  std::size_t stoppedAt = 0;
   try {
+    ThreadSearch search(buffer, threadName);
     isFound = threadName.data() != nullptr && search.run();
+    stoppedAt = search.offset();
     if (isFound) ioStats = search.ioStats();
   } catch (const std::bad_alloc&) {
-    // More open containers than there is memory for: the thread is not found.
-    isFound = false;
+    // More open containers than there is memory for: the thread counts as not found.
   }
-  if (cursor != nullptr) *cursor = search.offset();
+  if (cursor != nullptr) *cursor = stoppedAt;
   return isFound;
 }
 

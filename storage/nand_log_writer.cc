@@ -5,7 +5,6 @@
 #include <charconv>
 #include <cmath>
 #include <cstdio>
-#include <cstdlib>
 #include <ctime>
 #include <exception>
 #include <optional>
@@ -42,16 +41,12 @@ bool isTooEarly(Platform& platform, PlistDate now) {
 std::string localDateText(PlistDate date) {
   const auto seconds = static_cast<std::time_t>(saturatingInt64(std::floor(date.unixSeconds())));
   constexpr std::time_t kEpoch = 0;
-  std::tm local{};
-  tzset();
-  if (localtime_r(&seconds, &local) == nullptr) gmtime_r(&kEpoch, &local);
-  const long minutes = local.tm_gmtoff / 60;
-  std::array<char, 64> buffer;
-  const int length =
-      std::snprintf(buffer.data(), buffer.size(), "%04lld-%02d-%02d %02d:%02d:%02d %c%02ld%02ld",
-                    local.tm_year + 1900LL, local.tm_mon + 1, local.tm_mday, local.tm_hour, local.tm_min,
-                    local.tm_sec, minutes < 0 ? '-' : '+', std::abs(minutes) / 60, std::abs(minutes) % 60);
-  return {buffer.data(), static_cast<std::size_t>(length)};
+  const std::tm* local = std::localtime(&seconds);
+  if (local == nullptr) local = std::gmtime(&kEpoch);
+  std::array<char, 64> year, rest;
+  std::snprintf(year.data(), year.size(), "%04lld", local->tm_year + 1900LL);
+  std::strftime(rest.data(), rest.size(), "-%m-%d %H:%M:%S %z", local);
+  return std::string(year.data()).append(rest.data());
 }
 
 std::string twoDecimals(double value) {
