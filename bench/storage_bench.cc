@@ -1,4 +1,4 @@
-// Statistics buffers: parsing with release, and the NAND info of a parsed one.
+// Statistics buffers: parsing with release, and the NAND info of a parsed one; telemetry lists to records.
 
 #include <benchmark/benchmark.h>
 
@@ -8,6 +8,7 @@
 #include "storage/stats_context.h"
 #include "storage/stats_table.h"
 #include "storage/storage_test_support.h"
+#include "storage/structured_logs.h"
 #include "testing/fake_platform.h"
 
 namespace tbdaily {
@@ -43,6 +44,45 @@ void nandInfo(benchmark::State& state) {
   state.SetItemsProcessed(state.iterations() * static_cast<std::int64_t>(context.nodes.size()));
 }
 BENCHMARK(nandInfo)->Unit(benchmark::kMicrosecond);
+
+// A list of channels to records; the log that takes them keeps nothing.
+void telemetryList(benchmark::State& state) {
+  struct Sink : testing::FakeLogSubmission {
+    void logStructuredData(int, const PlistDictionary&) override {}
+  };
+  testing::FakePlatform fake;
+  Sink sink;
+  Platform platform{fake.driverRegistry,
+                    fake.preferences,
+                    fake.deviceAnswers,
+                    sink,
+                    fake.analyticsClient,
+                    fake.analyticsHistory,
+                    fake.propertyListCodec,
+                    fake.stackSnapshot,
+                    fake.usageService,
+                    fake.appRegistry,
+                    fake.localeSettings,
+                    fake.serviceListener,
+                    fake.notifications,
+                    fake.systemLog,
+                    fake.kernel,
+                    fake.fileSystem,
+                    fake.dynamicLoader,
+                    fake.messageDigest};
+  const std::int64_t channels = state.range(0);
+  const std::vector<std::byte> bytes(static_cast<std::size_t>(channels) * 4128, std::byte{1});
+  const PlistValue characteristics =
+      PlistValue::dictionary({{"chip-id", PlistValue::string("Q8A")},
+                              {"manufacturer-id", PlistValue::string("4582603A5700")},
+                              {"num-bus", PlistValue::int64(channels)}});
+  for (auto _ : state) {
+    const FetchedList list{bytes, bytes.size(), characteristics, "VelmoraEmbeddedNVMeController"};
+    benchmark::DoNotOptimize(HandleTelemetryList(platform, list, standardDiagnostics()));
+  }
+  state.SetBytesProcessed(state.iterations() * static_cast<std::int64_t>(bytes.size()));
+}
+BENCHMARK(telemetryList)->Arg(2)->Arg(256)->Unit(benchmark::kMicrosecond);
 
 }  // namespace
 }  // namespace tbdaily

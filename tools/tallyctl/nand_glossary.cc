@@ -5,6 +5,8 @@
 #include <cstdint>
 #include <cstdio>
 
+#include "storage/nand_key_map.h"
+
 namespace tbdaily {
 
 namespace {
@@ -204,6 +206,11 @@ std::optional<std::string> explainNandKey(std::string_view key) {
   if (rest.empty()) return sentence;
   const std::string_view number = numberAtEnd(rest);
   const std::string_view part = rest.substr(0, rest.size() - number.size());
+  // Rows for several names of one kind answer only for those that there are.
+  const bool isListed = std::any_of(keyMap.begin(), keyMap.end(), [key](const KeyMapRow& listed) {
+    return withoutPrefix(listed.key) == withoutPrefix(key);
+  });
+  if (!part.empty() && !isListed) return std::nullopt;
   sentence.pop_back();
   if (!part.empty()) sentence.append(" (").append(part).append(")");
   if (!number.empty()) sentence.append(", number ").append(number);
