@@ -1,6 +1,6 @@
 // Where the words of a counter block go in the common record, one table for each layout. Some runs cross the
-// bounds of the record's named arrays, and the order is not everywhere that of the block: so it is laid out by
-// the controllers.
+// bounds of the record's named arrays, and the order is not everywhere that of the block: so it is laid out
+// by the controllers.
 #pragma once
 
 #include <array>
