@@ -1,10 +1,10 @@
 #include "tools/tallyctl/input_file.h"
 
 #include <array>
+#include <cerrno>
 #include <cstdio>
 #include <string_view>
 
-#include "platform/linux/file_io.h"
 #include "platform/linux/host.h"
 #include "platform/linux/plist_json.h"
 
@@ -12,13 +12,14 @@ namespace tbdaily {
 
 namespace {
 
-InputFile readStandardInput() {
+// Pipes too, so that the shell's substitutions work.
+InputFile readStream(std::FILE* stream, const std::string& name) {
   InputFile input;
   std::array<std::byte, 65536> chunk;
-  while (const std::size_t count = std::fread(chunk.data(), 1, chunk.size(), stdin)) {
+  while (const std::size_t count = std::fread(chunk.data(), 1, chunk.size(), stream)) {
     input.bytes.insert(input.bytes.end(), chunk.begin(), chunk.begin() + static_cast<std::ptrdiff_t>(count));
   }
-  if (std::ferror(stdin) != 0) input.error = "standard input cannot be read";
+  if (std::ferror(stream) != 0) input.error = name + ": " + errorText(errno);
   return input;
 }
 
@@ -35,11 +36,12 @@ bool looksLikePropertyList(std::string_view text) {
 }  // namespace
 
 InputFile readInput(const std::string& path) {
-  if (path == "-") return readStandardInput();
-  FileContents contents;
-  const int error = readRegularFile(path, contents);
-  if (error != 0) return {{}, path + ": " + errorText(error)};
-  return {std::move(contents.bytes), {}};
+  if (path == "-") return readStream(stdin, "standard input");
+  std::FILE* file = std::fopen(path.c_str(), "re");
+  if (file == nullptr) return {{}, path + ": " + errorText(errno)};
+  InputFile input = readStream(file, path);
+  std::fclose(file);
+  return input;
 }
 
 PlistParseResult readPlistFile(PropertyListCodec& codec, const std::string& path) {
