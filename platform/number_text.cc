@@ -123,7 +123,8 @@ CivilTime civilTime(PlistDate date) {
 
 PlistDate dateOfCivilTime(const CivilTime& time) {
   const std::int64_t days = daysOfCivil(time.year, time.month, time.day) - kDaysTo2001;
-  const std::int64_t seconds = days * 86400 + time.hour * 3600 + time.minute * 60 + time.second;
+  const std::int64_t seconds =
+      days * 86400 + std::int64_t{time.hour} * 3600 + std::int64_t{time.minute} * 60 + time.second;
   return {static_cast<double>(seconds) + time.fraction};
 }
 

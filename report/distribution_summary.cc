@@ -41,9 +41,10 @@ PlistValue histogramDictForIntervalsWithHistCounts(const PlistArray& intervals,
   PlistDictionary histogram;
   for (std::size_t i = 0; i < counts.size(); ++i) {
     if (counts[i] == 0) continue;
-    const std::string lower = i == 0 ? "-inf" : boundaryText(i - 1);
-    const std::string upper = i == intervals.size() ? "inf)" : boundaryText(i) + "]";
-    histogram.set("(" + lower + ", " + upper, PlistValue::int64(static_cast<std::int64_t>(counts[i])));
+    std::string label("(");
+    label.append(i == 0 ? "-inf" : boundaryText(i - 1)).append(", ");
+    label.append(i == intervals.size() ? "inf" : boundaryText(i)).append(i == intervals.size() ? ")" : "]");
+    histogram.set(label, PlistValue::int64(static_cast<std::int64_t>(counts[i])));
   }
   return histogram.empty() ? PlistValue() : PlistValue::dictionary(std::move(histogram));
 }

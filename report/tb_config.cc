@@ -102,7 +102,7 @@ void TBConfig::loadGroup(const std::string& name, const PlistValue& group) {
   groupNames_.push_back(name);
   for (const auto& [entryName, keys] : *entries) {
     for (const auto& [tableName, table] : tables) {
-      if (entryName == tableName) mergeEntries(*table, name + "/" + entryName, keys);
+      if (entryName == tableName) mergeEntries(*table, std::string(name).append("/").append(entryName), keys);
     }
   }
 }

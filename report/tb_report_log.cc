@@ -16,16 +16,16 @@ constexpr std::int64_t kLogVersion = 1;
 constexpr std::string_view kLogType = "193";
 constexpr std::string_view kLogName = "log-tallyd";
 
-PlistValue valueOr(PlistValue value, PlistValue substitute) {
-  return value.isNone() ? std::move(substitute) : value;
+PlistValue valueOr(const PlistValue& value, const PlistValue& substitute) {
+  return value.isNone() ? substitute : value;
 }
 
 }  // namespace
 
 PlistDictionary TBReport::rootDictionary(DayNumber day, const PlistValue& appInfo,
                                          const std::string& whitelistDigest) {
-  const auto tasking = [this](std::string_view key, PlistValue substitute) {
-    return valueOr(platform_.preferences.getValue(key, preference_domain::kJob), std::move(substitute));
+  const auto tasking = [this](std::string_view key, const PlistValue& substitute) {
+    return valueOr(platform_.preferences.getValue(key, preference_domain::kJob), substitute);
   };
   PlistValue taskID = tasking("TaskingID", PlistValue::string("(no tasking id)"));
   PlistValue taskDigest = tasking("TaskingDigest", PlistValue::string("(no tasking digest)"));

@@ -154,6 +154,7 @@ class SampleWriter {
 
 std::vector<SampleApp> sampleApps() {
   std::vector<SampleApp> apps;
+  apps.reserve(kUserApps.size() + kSystemApps.size());
   for (const char* name : kUserApps) apps.push_back({std::string("org.example.") + name, true});
   for (const char* name : kSystemApps) apps.push_back({std::string("com.velmora.") + name, false});
   return apps;

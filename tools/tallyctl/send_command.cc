@@ -35,7 +35,7 @@ std::string lengthPrefix(std::size_t length) {
   return prefix;
 }
 
-void sendMessage(Tool& tool, Operation operation, PlistDictionary fields) {
+void sendMessage(Tool& tool, Operation operation, const PlistDictionary& fields) {
   PlistDictionary message{{"operation", PlistValue::int64(static_cast<std::int64_t>(operation))}};
   for (const auto& [key, value] : fields) message.set(key, value);
   const PlistWriteResult written =

@@ -18,7 +18,7 @@ namespace {
 
 constexpr std::string_view kScheduled = "ScheduledTasking";
 
-PlistValue orNull(PlistValue value) {
+PlistValue orNull(const PlistValue& value) {
   return value.isNone() ? jsonNull() : value;
 }
 
