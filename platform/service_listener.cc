@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "platform/hexadecimal.h"
+
 namespace tbdaily {
 
 std::int64_t messageInteger(const PlistDictionary& message, std::string_view field) {
@@ -34,14 +36,11 @@ void forEachElement(const PlistValue& array, const std::function<void(const Plis
 }
 
 std::string uuidText(const UuidBytes& uuid) {
-  static constexpr std::string_view kDigits = "0123456789ABCDEF";
   std::string text;
   text.reserve(36);
   for (std::size_t i = 0; i < uuid.size(); ++i) {
     if (i == 4 || i == 6 || i == 8 || i == 10) text += '-';
-    const auto byte = std::to_integer<unsigned>(uuid[i]);
-    text += kDigits[byte >> 4];
-    text += kDigits[byte & 15];
+    appendHexadecimal(text, std::span(uuid).subspan(i, 1), HexadecimalCase::Upper);
   }
   return text;
 }

@@ -1,5 +1,6 @@
 #include "platform/system_log.h"
 
+#include "platform/hexadecimal.h"
 #include "platform/number_text.h"
 
 namespace tbdaily {
@@ -9,14 +10,6 @@ namespace {
 constexpr std::string_view kPrivate = "<private>";
 constexpr std::string_view kPublicMark = "{public}";
 constexpr std::array<std::string_view, 4> kConversions = {"d", "llu", "s", "@"};
-
-void appendHexadecimal(std::string& out, std::span<const std::byte> bytes) {
-  static constexpr std::string_view kDigits = "0123456789abcdef";
-  for (const std::byte byte : bytes) {
-    out += kDigits[std::to_integer<unsigned>(byte) >> 4];
-    out += kDigits[std::to_integer<unsigned>(byte) & 15];
-  }
-}
 
 void appendQuoted(std::string& out, std::string_view text) {
   out += '"';

@@ -4,6 +4,7 @@
 #include <array>
 
 #include "platform/file_system.h"
+#include "platform/hexadecimal.h"
 #include "platform/message_digest.h"
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
@@ -16,16 +17,6 @@ namespace {
 
 constexpr std::string_view kInternalGroup = "InternalTesting";
 const PlistDictionary kNoOptions;
-
-std::string hexadecimal(const Md5Digest& digest) {
-  static constexpr std::string_view kDigits = "0123456789abcdef";
-  std::string text;
-  for (const std::byte byte : digest) {
-    text += kDigits[std::to_integer<unsigned>(byte) >> 4];
-    text += kDigits[std::to_integer<unsigned>(byte) & 15];
-  }
-  return text;
-}
 
 bool isAbsentOrNumber(const PlistDictionary& options, std::string_view key) {
   const PlistValue* value = options.find(key);
@@ -62,7 +53,7 @@ std::unique_ptr<TBConfig> TBConfig::init(Platform& platform) {
     log.message(LogLevel::Error, "Couldn't load whitelist");
     return nullptr;
   }
-  config->_configFileDigest = hexadecimal(platform.messageDigest.md5(*bytes));
+  appendHexadecimal(config->_configFileDigest, platform.messageDigest.md5(*bytes));
 
   PlistParseResult parsed = platform.propertyListCodec.parse(*bytes);
   const PlistDictionary* root = parsed.value.asDictionary();

@@ -10,6 +10,7 @@
 #include <optional>
 #include <span>
 
+#include "platform/hexadecimal.h"
 #include "platform/service_listener.h"
 
 namespace tbdaily {
@@ -53,21 +54,15 @@ std::string firstLine(const std::filesystem::path& path) {
   return line;
 }
 
-std::optional<unsigned> hexadecimalDigit(char c) {
-  if (c >= '0' && c <= '9') return static_cast<unsigned>(c - '0');
-  if (c >= 'a' && c <= 'f') return static_cast<unsigned>(c - 'a' + 10);
-  return std::nullopt;
-}
-
 std::optional<IdBytes> machineIdentifier(const Host& host) {
   const std::string text = firstLine(host.livePath("/etc/machine-id"));
   IdBytes bytes;
-  if (text.size() != 2 * bytes.size()) return std::nullopt;
+  // Lower case alone, as the file's format has it.
+  const bool isWellFormed = text.find_first_not_of("0123456789abcdef") == std::string::npos;
+  if (text.size() != 2 * bytes.size() || !isWellFormed) return std::nullopt;
   for (std::size_t i = 0; i < bytes.size(); ++i) {
-    const auto high = hexadecimalDigit(text[2 * i]);
-    const auto low = hexadecimalDigit(text[2 * i + 1]);
-    if (!high || !low) return std::nullopt;
-    bytes[i] = static_cast<std::uint8_t>(*high << 4 | *low);
+    bytes[i] =
+        static_cast<std::uint8_t>(*hexadecimalDigit(text[2 * i]) << 4 | *hexadecimalDigit(text[2 * i + 1]));
   }
   return bytes;
 }
@@ -86,12 +81,8 @@ std::string hashedMachineIdentifier(const Host& host) {
   if (!machine) return {};
   Sha256 hash = hmacSha256(*machine, kApplicationIdentifier);
   markAsRandomUuid(hash);
-  static constexpr std::string_view kDigits = "0123456789abcdef";
   std::string text;
-  for (const std::uint8_t byte : std::span(hash).first<16>()) {
-    text += kDigits[byte >> 4];
-    text += kDigits[byte & 15];
-  }
+  appendHexadecimal(text, std::as_bytes(std::span(hash).first<16>()));
   return text;
 }
 

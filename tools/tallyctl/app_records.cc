@@ -4,18 +4,13 @@
 #include <functional>
 #include <optional>
 
+#include "platform/hexadecimal.h"
+
 namespace tbdaily {
 
 namespace {
 
 constexpr std::size_t kUuidSize = 16;
-
-std::optional<unsigned> hexadecimalDigit(char c) {
-  if (c >= '0' && c <= '9') return static_cast<unsigned>(c - '0');
-  if (c >= 'a' && c <= 'f') return static_cast<unsigned>(c - 'a' + 10);
-  if (c >= 'A' && c <= 'F') return static_cast<unsigned>(c - 'A' + 10);
-  return std::nullopt;
-}
 
 PlistValue uuidOfText(std::string_view text) {
   constexpr std::string_view kPattern = "xxxxxxxx-xxxx-xxxx-xxxx-xxxxxxxxxxxx";
