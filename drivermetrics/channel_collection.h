@@ -1,0 +1,102 @@
+// Collections of channels, and the walk over them that everything goes through.
+#pragma once
+
+#include <utility>
+#include <vector>
+
+#include "drivermetrics/channel_record.h"
+
+namespace tbdaily {
+
+// One key of a collection: absent, of the kind that belongs there, or, in one that came from outside, of
+// another.
+template <typename T>
+class CollectionField {
+ public:
+  bool isAbsent() const { return !value_ && !isForeign_; }
+  T* get() { return value_ ? &*value_ : nullptr; }  // null when absent or of another kind
+  const T* get() const { return value_ ? &*value_ : nullptr; }
+
+  T& make() {
+    isForeign_ = false;
+    return value_.emplace();
+  }
+  void makeForeign() {
+    value_.reset();
+    isForeign_ = true;
+  }
+  void remove() {
+    value_.reset();
+    isForeign_ = false;
+  }
+
+ private:
+  std::optional<T> value_;
+  bool isForeign_ = false;
+};
+
+// Names to sub-collections, in the order in which they were first filed. A null one is an entry that is no
+// dictionary.
+class SubCollections {
+ public:
+  using Entry = std::pair<std::string, KdReportCollection>;
+
+  ChannelCollection* find(std::string_view name) const;
+  // The entry of the name, made when it is absent; null when it is no dictionary.
+  ChannelCollection* findOrMake(std::string_view name);
+  void add(std::string_view name, KdReportCollection collection);
+  void removeEmpty();
+
+  bool empty() const { return entries_.empty(); }
+  std::vector<Entry>::const_iterator begin() const { return entries_.begin(); }
+  std::vector<Entry>::const_iterator end() const { return entries_.end(); }
+
+ private:
+  std::vector<Entry> entries_;
+  PlistDictionary places_;  // name to its place in entries_
+};
+
+// A collection or one of its sub-collections: channels filed at this level, then per driver, then per group
+// (and below a group per subgroup).
+class ChannelCollection {
+ public:
+  PlistValue queryOptions;                                 // number, 32-bit; of the outermost level only
+  CollectionField<std::vector<KdReportChannel>> channels;  // a null one is an element that is no dictionary
+  CollectionField<SubCollections> drivers, channelGroups;
+
+  // Without any key, the options included.
+  bool empty() const {
+    return queryOptions.isNone() && channels.isAbsent() && drivers.isAbsent() && channelGroups.isAbsent();
+  }
+};
+
+// The options of the collection; 0 when it has none.
+std::uint32_t _getAggregateOpts(const ChannelCollection* collection);
+
+// Files the record itself by `options`, making the levels that it needs. kKdBadArgument for a null argument,
+// kKdError when the driver's name is missing or something else than a dictionary or array is in the way; the
+// reason is "_addChannel() failed".
+KdStatus _addChannel(ChannelCollection* collection, const KdReportChannel& channel, std::uint32_t options,
+                     KdReportErrorOut error = nullptr);
+
+// A record for a driver's legend entry, without group, subgroup and information. Null ("couldn't create
+// channel", kKdError) unless the entry's identifier and type are numbers.
+KdReportChannel makeChannelRecord(PlistValue driverID, PlistValue driverName, const PlistValue& legendEntry,
+                                  KdReportErrorOut error);
+
+// Answer as KdReportVisitor does. `copy` is a copy of `channel` that goes into the new collection when kept.
+using CloneVisitor = std::function<std::uint32_t(const ChannelRecord& channel, ChannelRecord& copy)>;
+// `partner` is the channel of the earlier collection; `copy` carries its elements with all values invalid.
+using CompareVisitor = std::function<std::uint32_t(const ChannelRecord& partner, const ChannelRecord& channel,
+                                                   ChannelRecord& copy)>;
+
+// A new collection of copies of the channels that the visitor keeps, filed as they are here, without options.
+// Null when the walk fails or is stopped.
+KdReportCollection cloneAggregate(const ChannelCollection* collection, const CloneVisitor& visitor);
+
+// A new collection of copies of the channels of `later`: those with a partner in `earlier` as the visitor
+// leaves them, the others as they are. Null unless every visit answers 0.
+KdReportCollection compareAggregates(const ChannelCollection* earlier, const ChannelCollection* later,
+                                     const CompareVisitor& visitor);
+
+}  // namespace tbdaily

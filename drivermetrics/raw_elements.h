@@ -1,0 +1,51 @@
+// The 64-byte elements in which the hub and every sample carry values: who it is about, when it was updated,
+// and four value words. All numbers are little-endian.
+#pragma once
+
+#include <array>
+
+#include "drivermetrics/channel_record.h"
+
+namespace tbdaily {
+
+inline constexpr std::size_t kElementSize = 64;
+inline constexpr std::size_t kElementWords = 4;
+
+namespace element_offset {
+inline constexpr std::size_t kProvider = 0;  // the driver's registry entry identifier
+inline constexpr std::size_t kChannel = 8;
+inline constexpr std::size_t kType = 16;   // ChannelType
+inline constexpr std::size_t kStamp = 24;  // grows with each update
+inline constexpr std::size_t kWords = 32;
+}  // namespace element_offset
+
+// Elements over bytes that somebody else owns; `count` of them can be read. A number outside reads as 0.
+class RawElements {
+ public:
+  RawElements() = default;
+  RawElements(std::span<std::byte> bytes, std::uint16_t count) : bytes_(bytes), count_(count) {}
+
+  std::uint16_t count() const { return count_; }
+  std::uint64_t stamp(std::size_t element) const;
+  std::int64_t word(std::size_t element, std::size_t word) const;
+  std::int64_t channelID() const;  // of the first element
+  void setWord(std::size_t element, std::size_t word, std::int64_t value);
+  // The bytes of all of another channel's elements in place of these; false when they are not equally many.
+  bool copyFrom(const RawElements& other);
+
+ private:
+  std::span<std::byte> bytes_;
+  std::uint16_t count_ = 0;
+};
+
+// The elements of a sampled channel: at least one, the first of the given format. Writers change the record's
+// own bytes and those of every record that shares them.
+std::optional<RawElements> getRawElements(const ChannelRecord* channel, std::uint8_t format);
+
+enum class ElementValues : std::uint8_t { Keep, Invalidate };
+
+// Gives `destination` a copy of its own of the source's elements, when asked with every value word invalid.
+// kKdError when the source has none, or when they are not of the destination's format (the copy stays).
+KdStatus cloneElements(ChannelRecord& destination, const ChannelRecord& source, ElementValues values);
+
+}  // namespace tbdaily
