@@ -1,6 +1,7 @@
 #include "platform/linux/linux_driver_registry.h"
 
 #include <algorithm>
+#include <iterator>
 
 namespace tbdaily {
 
@@ -9,6 +10,13 @@ namespace {
 constexpr std::string_view kProviderClass = "KdProviderClass";
 constexpr std::string_view kPropertyMatch = "KdPropertyMatch";
 constexpr std::size_t kLongestName = 128;
+
+// The kinds of user clients that a recording may give an entry.
+struct ClientKind {
+  std::string_view name;
+  std::unique_ptr<RecordedClient> (*make)(const PlistDictionary& client, Recordings& recordings);
+};
+constexpr ClientKind kClientKinds[] = {{"storage", makeStorageClient}, {"hub", makeHubClient}};
 
 PlistDictionary propertiesOf(const PlistDictionary& entry) {
   const PlistValue properties = entry.get("properties");
@@ -152,10 +160,14 @@ KdStatus LinuxDriverRegistry::KdServiceOpen(KdHandle service, std::uint32_t, KdH
   if (entry == nullptr) return kKdBadArgument;
   const PlistValue recorded = entry->get("client");
   const PlistDictionary* client = recorded.asDictionary();
-  if (client == nullptr || client->get("kind").asString() != "storage") return kKdNotFound;
+  if (client == nullptr) return kKdNotFound;
+  const PlistValue kindName = client->get("kind");
+  const auto kind = std::find_if(std::begin(kClientKinds), std::end(kClientKinds),
+                                 [&](const ClientKind& k) { return kindName.asString() == k.name; });
+  if (kind == std::end(kClientKinds)) return kKdNotFound;
   if (const KdStatus status = recordedStatus(*client, "openStatus"); status != kKdSuccess) return status;
-  connections_.emplace(++lastHandle_, Connection{makeStorageClient(*client, recordings_),
-                                                 recordedStatus(*client, "closeStatus")});
+  connections_.emplace(++lastHandle_,
+                       Connection{kind->make(*client, recordings_), recordedStatus(*client, "closeStatus")});
   connection = lastHandle_;
   return kKdSuccess;
 }

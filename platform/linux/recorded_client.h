@@ -28,6 +28,10 @@ class RecordedClient {
 // A client of {"kind": "storage"}: a strict storage controller. Borrows the recordings.
 std::unique_ptr<RecordedClient> makeStorageClient(const PlistDictionary& client, Recordings& recordings);
 
+// A client of {"kind": "hub"}: a strict driver metrics hub, whose values are those of hub.plist. Borrows the
+// recordings.
+std::unique_ptr<RecordedClient> makeHubClient(const PlistDictionary& client, Recordings& recordings);
+
 // An integer entry of a recording as a status, recorded signed or unsigned; 0 when absent.
 KdStatus recordedStatus(const PlistDictionary& dictionary, std::string_view key);
 

@@ -1,0 +1,242 @@
+// The driver metrics hub of a recording.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+#include <initializer_list>
+
+#include "platform/byte_reader.h"
+#include "platform/linux/linux_driver_registry.h"
+#include "platform/linux/test_host.h"
+
+namespace tbdaily {
+namespace {
+
+using ::testing::ElementsAre;
+using Numbers = std::vector<std::uint64_t>;
+
+PlistValue number(std::int64_t n) {
+  return PlistValue::int64(n);
+}
+
+PlistValue element(std::int64_t stamp, std::initializer_list<std::int64_t> words) {
+  PlistArray array;
+  for (const std::int64_t word : words) array.push_back(number(word));
+  return PlistValue::dictionary({{"stamp", number(stamp)}, {"words", PlistValue::array(std::move(array))}});
+}
+
+PlistValue channel(std::int64_t driver, std::int64_t id, std::int64_t type, PlistArray elements) {
+  return PlistValue::dictionary({{"driver", number(driver)},
+                                 {"channel", number(id)},
+                                 {"type", number(type)},
+                                 {"elements", PlistValue::array(std::move(elements))}});
+}
+
+std::vector<std::byte> interests(std::initializer_list<std::uint64_t> channels) {
+  std::vector<std::byte> list;
+  const auto put = [&list](std::uint64_t value) {
+    for (unsigned i = 0; i < 8; ++i) list.push_back(static_cast<std::byte>(value >> 8 * i & 0xFF));
+  };
+  put(channels.size());
+  for (const std::uint64_t id : channels) {
+    for (const std::uint64_t value : {std::uint64_t{7}, id, std::uint64_t{0}}) put(value);
+  }
+  return list;
+}
+
+class HubTest : public ::testing::Test {
+ protected:
+  void record(PlistArray channels) {
+    device.record(recording::kHub, "channels", PlistValue::array(std::move(channels)));
+  }
+  void open(PlistDictionary client = {}) {
+    if (client.get("kind").isNone()) client.set("kind", PlistValue::string("hub"));
+    device.record(recording::kRegistry, "entries",
+                  PlistValue::array({PlistValue::dictionary(
+                      {{"class", PlistValue::string("H")}, {"client", PlistValue::dictionary(client)}})}));
+    const KdHandle service = registry.KdServiceGetMatchingService(registry.KdServiceMatching("H"));
+    openStatus = registry.KdServiceOpen(service, 0, connection);
+    registry.KdObjectRelease(service);
+  }
+  KdStatus start(std::uint32_t method = 0) {
+    std::size_t count = 0;
+    return registry.KdConnectCallScalarMethod(connection, method, {}, {}, count);
+  }
+  KdStatus configure(std::span<const std::byte> list, std::size_t room = 1) {
+    KdMethodOutput output;
+    output.scalars = std::span(&identifier, room);
+    return registry.KdConnectCallMethod(connection, 2, {{}, list}, output);
+  }
+  KdStatus update(std::span<const std::uint64_t> scalars, std::uint32_t method = 3) {
+    KdMethodOutput output;
+    return registry.KdConnectCallMethod(connection, method, {scalars, {}}, output);
+  }
+  KdStatus update() { return update({&identifier, 1}); }
+  KdStatus map() {
+    return registry.KdConnectMapMemory(connection, static_cast<std::uint32_t>(identifier), memory);
+  }
+  // Everything up to the mapping.
+  void subscribe(std::initializer_list<std::uint64_t> channels) {
+    open();
+    ASSERT_EQ(start(), 0);
+    ASSERT_EQ(configure(interests(channels)), 0);
+    ASSERT_EQ(map(), 0);
+  }
+  Numbers at(std::size_t index) const {
+    Numbers numbers;
+    for (std::size_t i = 0; i < 8; ++i)
+      numbers.push_back(ByteReader(memory).at<std::uint64_t>(index * 64 + i * 8).value_or(0xDEAD));
+    return numbers;
+  }
+  // Mappings and descriptors of shared buffers that the process holds.
+  static std::size_t held() {
+    std::size_t count = 0;
+    std::ifstream maps("/proc/self/maps");
+    for (std::string line; std::getline(maps, line);) count += line.find("memfd:") != std::string::npos;
+    for (const auto& file : std::filesystem::directory_iterator("/proc/self/fd")) {
+      std::error_code ignored;
+      count += std::filesystem::read_symlink(file, ignored).native().find("memfd:") != std::string::npos;
+    }
+    return count;
+  }
+
+  testing::TestHost device;
+  Recordings recordings{device.host, device.codec};
+  LinuxDriverRegistry registry{recordings};
+  KdHandle connection = 0;
+  KdStatus openStatus = 0;
+  std::uint64_t identifier = 0;
+  std::span<std::byte> memory;
+};
+
+TEST_F(HubTest, LaysOutInterestsInOrderAndUpdatesInPlace) {
+  constexpr std::int64_t kLyingType = 0x0900'0001'0002;
+  const PlistValue odd =
+      PlistValue::dictionary({{"stamp", PlistValue::string("x")},
+                              {"words", PlistValue::array({PlistValue::boolean(true), number(5)})}});
+  record({number(1), PlistValue::dictionary({{"driver", number(7)}}), channel(7, 1, 0x11, {element(10, {1})}),
+          channel(7, 1, 0x99, {element(9, {9}), element(9, {9})}), channel(8, 2, 0x12, {element(11, {1})}),
+          channel(7, 2, kLyingType, {element(20, {1, -2, 3, 4, 5}), odd, number(3)}), channel(7, 4, 1, {}),
+          PlistValue::dictionary({{"driver", number(7)}, {"channel", number(5)}, {"elements", number(1)}})});
+  subscribe({2, 3, 1, 4, 5, 1});
+  EXPECT_GT(identifier >> 32, 0U);
+  EXPECT_NE(static_cast<std::uint32_t>(identifier), 0U);
+  ASSERT_EQ(memory.size(), 5 * 64U);
+  EXPECT_THAT(at(0), ElementsAre(7, 2, kLyingType, 20, 1, ~std::uint64_t{1}, 3, 4));
+  EXPECT_THAT(at(1), ElementsAre(7, 2, kLyingType, 0, 0, 5, 0, 0));
+  EXPECT_THAT(at(2), ElementsAre(7, 2, kLyingType, 0, 0, 0, 0, 0));
+  for (const std::size_t twice : {3U, 4U}) EXPECT_THAT(at(twice), ElementsAre(7, 1, 0x11, 10, 1, 0, 0, 0));
+
+  // Shorter, longer than laid out, and another type; seen through the same mapping.
+  record({channel(7, 1, 0x13, {element(30, {6, 7}), element(31, {8})}), channel(7, 2, 5, {element(32, {})})});
+  EXPECT_EQ(update(), 0);
+  EXPECT_THAT(at(0), ElementsAre(7, 2, 5, 32, 0, 0, 0, 0));
+  EXPECT_THAT(at(1), ElementsAre(7, 2, kLyingType, 0, 0, 5, 0, 0));
+  EXPECT_THAT(at(3), ElementsAre(7, 1, 0x13, 30, 6, 7, 0, 0));
+  EXPECT_EQ(at(3), at(4));
+  const Numbers before = at(3);
+  for (const PlistValue& gone : {PlistValue::array({channel(7, 2, 6, {element(33, {1})})}), number(1)}) {
+    device.record(recording::kHub, "channels", gone);
+    EXPECT_EQ(update(), 0);
+    EXPECT_EQ(at(3), before);
+    EXPECT_THAT(at(0), ElementsAre(7, 2, 6, 33, 1, 0, 0, 0));
+  }
+}
+
+TEST_F(HubTest, LeavesNothingBehind) {
+  record({channel(7, 1, 1, {element(1, {1})})});
+  subscribe({1});
+  const std::span<std::byte> first = memory;
+  ASSERT_EQ(map(), 0);
+  EXPECT_NE(first.data(), memory.data());
+  EXPECT_EQ(held(), 4U);  // a descriptor, the hub's mapping and two of the client's
+  const auto type = static_cast<std::uint32_t>(identifier);
+  EXPECT_EQ(registry.KdConnectUnmapMemory(connection, type, first), 0);
+  EXPECT_EQ(held(), 3U);
+  for (const auto& [badType, bad] : {std::pair{type, first}, {type, memory.first(63)}, {type + 1, memory}})
+    EXPECT_EQ(registry.KdConnectUnmapMemory(connection, badType, bad), kKdBadArgument);
+  EXPECT_EQ(registry.KdServiceClose(connection), 0);
+  EXPECT_EQ(held(), 0U);
+
+  subscribe({2});  // nothing of it is there
+  EXPECT_TRUE(memory.empty());
+  EXPECT_EQ(held(), 0U);
+  EXPECT_EQ(update(), 0);
+  EXPECT_EQ(registry.KdConnectUnmapMemory(connection, type, memory), 0);
+}
+
+TEST_F(HubTest, IsStrict) {
+  record({channel(7, 1, 1, {element(1, {1})})});
+  open({{"kind", PlistValue::string("else")}});
+  EXPECT_EQ(openStatus, kKdNotFound);
+  open();
+  const auto list = interests({1});
+  EXPECT_EQ(configure(list), kKdBadArgument);
+  EXPECT_EQ(start(1), kKdBadArgument);
+  EXPECT_EQ(start(), 0);
+  auto longer = list;
+  longer.resize(list.size() + 1);
+  auto countTooLarge = list;
+  countTooLarge[3] = std::byte{0xFF};
+  for (const std::span<const std::byte> bad : {std::span<const std::byte>(),
+                                               {list.data(), 7},
+                                               {list.data(), 8},
+                                               {list.data(), 31},
+                                               {longer},
+                                               {countTooLarge}})
+    EXPECT_EQ(configure(bad), kKdBadArgument) << bad.size();
+  EXPECT_EQ(configure(list, 0), kKdBadArgument);
+  EXPECT_EQ(map(), kKdBadArgument);
+  EXPECT_EQ(update(), kKdBadArgument);
+  EXPECT_EQ(configure(list), 0);
+  EXPECT_EQ(configure(list), kKdBadArgument);
+  for (const Numbers& bad : {Numbers{}, Numbers{identifier & 0xFFFFFFFF}, Numbers{identifier, 0}})
+    EXPECT_EQ(update(bad), kKdBadArgument);
+  EXPECT_EQ(update({&identifier, 1}, 4), kKdBadArgument);
+  EXPECT_EQ(registry.KdConnectMapMemory(connection, static_cast<std::uint32_t>(identifier) + 1, memory),
+            kKdBadArgument);
+}
+
+TEST_F(HubTest, FailsAsRecorded) {
+  record({channel(7, 1, 1, {element(1, {1})})});
+  constexpr std::int64_t kFailure = 0xE00002C5;
+  // Of opening, method 0, configuring, mapping and updating, which one fails; what follows is refused.
+  const char* keys[] = {"openStatus", "userClientOpenStatus", "configureStatus", "mapStatus", "updateStatus"};
+  for (std::size_t failing = 0; failing < std::size(keys); ++failing) {
+    open({{keys[failing], number(kFailure)}});
+    const KdStatus statuses[] = {openStatus, start(), configure(interests({1})), map(), update()};
+    for (std::size_t step = 0; step <= failing; ++step)
+      EXPECT_EQ(statuses[step], step == failing ? static_cast<KdStatus>(kFailure) : 0) << keys[failing];
+  }
+}
+
+TEST_F(HubTest, WithoutMemoryItStaysUnconfigured) {
+  record({channel(7, 1, 1, PlistArray(4096, element(1, {1})))});
+  open();
+  EXPECT_EQ(start(), 0);
+  std::vector<std::byte> tooMany = interests({});
+  const auto one = interests({1});
+  constexpr std::size_t kInterests = 4097;  // each of 256 KiB: one above a GiB
+  tooMany[0] = std::byte{kInterests & 0xFF};
+  tooMany[1] = std::byte{kInterests >> 8};
+  for (std::size_t i = 0; i < kInterests; ++i) tooMany.insert(tooMany.end(), one.begin() + 8, one.end());
+  EXPECT_EQ(configure(tooMany), kKdNoMemory);
+
+  rlimit before{};
+  ::getrlimit(RLIMIT_FSIZE, &before);
+  const auto handler = std::signal(SIGXFSZ, SIG_IGN);
+  const rlimit small{100, before.rlim_max};
+  ::setrlimit(RLIMIT_FSIZE, &small);
+  const KdStatus withoutRoom = configure(one);
+  ::setrlimit(RLIMIT_FSIZE, &before);
+  std::signal(SIGXFSZ, handler);
+  EXPECT_EQ(withoutRoom, kKdNoMemory);
+  EXPECT_EQ(held(), 0U);
+  EXPECT_EQ(configure(one), 0);
+}
+
+}  // namespace
+}  // namespace tbdaily
