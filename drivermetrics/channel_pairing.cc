@@ -1,0 +1,50 @@
+#include "drivermetrics/channel_pairing.h"
+
+#include <algorithm>
+
+namespace tbdaily {
+
+std::optional<ChannelPairing::Identity> ChannelPairing::identityOf(const ChannelRecord* channel) {
+  ChannelType type;
+  if (getChannelType(channel, type) != kKdSuccess) return std::nullopt;
+  return Identity{KdReportChannelGetDriverID(channel), KdReportChannelGetChannelID(channel), type.bits};
+}
+
+ChannelPairing::Result ChannelPairing::partnerOf(const ChannelRecord& channel, std::size_t index) {
+  if (index >= earlier_.size()) return {};
+  const auto wanted = identityOf(&channel);
+  const auto candidate = identityOf(earlier_[index].get());
+  if (!wanted || !candidate) return {.isReadable = false};
+  if (candidate == wanted) return {.partner = earlier_[index].get()};
+  if (!resume_) resume_ = index + 1;
+  return search(*wanted);
+}
+
+ChannelPairing::Result ChannelPairing::search(const Identity& wanted) {
+  buildIndex();
+  const std::size_t from = *resume_;
+  const auto found = std::lower_bound(places_.begin(), places_.end(), Place{wanted, from});
+  const std::size_t hit =
+      found != places_.end() && found->identity == wanted ? found->index : earlier_.size();
+  const auto odd = std::lower_bound(unreadable_.begin(), unreadable_.end(), from);
+  if (odd != unreadable_.end() && *odd < hit) return {.isReadable = false};
+  if (hit == earlier_.size()) return {};
+  resume_ = hit + 1;
+  return {.partner = earlier_[hit].get()};
+}
+
+void ChannelPairing::buildIndex() {
+  if (isIndexed_) return;
+  isIndexed_ = true;
+  places_.reserve(earlier_.size());
+  for (std::size_t i = 0; i < earlier_.size(); ++i) {
+    if (const auto identity = identityOf(earlier_[i].get())) {
+      places_.push_back({*identity, i});
+    } else {
+      unreadable_.push_back(i);
+    }
+  }
+  std::ranges::sort(places_);
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,45 @@
+// Which channel of an earlier collection a channel of a later one is compared with.
+#pragma once
+
+#include <tuple>
+#include <vector>
+
+#include "drivermetrics/channel_record.h"
+
+namespace tbdaily {
+
+// Pairs the channels of one array, asked for in the order of the later array. A channel pairs with the one at
+// its own index when both have the same driver, identifier and type, else with the next such one behind the
+// last that a search found. Channels beyond the end of the earlier array have no partner. Searches take
+// logarithmic time.
+class ChannelPairing {
+ public:
+  // Borrows the earlier array.
+  explicit ChannelPairing(const std::vector<KdReportChannel>& earlier) : earlier_(earlier) {}
+
+  struct Result {
+    bool isReadable = true;  // false: a channel that was looked at has no readable type
+    const ChannelRecord* partner = nullptr;
+  };
+  Result partnerOf(const ChannelRecord& channel, std::size_t index);
+
+ private:
+  using Identity = std::tuple<std::int64_t, std::int64_t, std::uint64_t>;  // driver, channel, type
+  struct Place {
+    Identity identity;
+    std::size_t index;
+    friend auto operator<=>(const Place&, const Place&) = default;
+  };
+
+  static std::optional<Identity> identityOf(const ChannelRecord* channel);
+  Result search(const Identity& wanted);
+  void buildIndex();
+
+  const std::vector<KdReportChannel>& earlier_;
+  std::optional<std::size_t> resume_;    // none before the first search
+  bool isIndexed_ = false;               // the index is built at the first search
+  std::vector<Place> places_;            // sorted
+  std::vector<std::size_t> unreadable_;  // ascending
+};
+
+}  // namespace tbdaily

@@ -1,0 +1,134 @@
+// Making collections and filing channels in them.
+
+#include "drivermetrics/channel_collection.h"
+#include "drivermetrics/report_error.h"
+
+namespace tbdaily {
+
+namespace {
+
+// The sub-collection of the name, with what leads to it made when absent; null when something else is there.
+ChannelCollection* moveTo(CollectionField<SubCollections>& field, std::string_view name) {
+  if (field.isAbsent()) field.make();
+  return field.get() != nullptr ? field.get()->findOrMake(name) : nullptr;
+}
+
+// The level at which the channel is filed, made when absent; null when it cannot be reached.
+ChannelCollection* levelFor(ChannelCollection& collection, const ChannelRecord& channel,
+                            std::uint32_t options) {
+  ChannelCollection* level = &collection;
+  if ((options & kKdReportFileByDriver) != 0) {
+    const auto driver = KdReportChannelGetDriverName(&channel);
+    if (!driver) return nullptr;
+    level = moveTo(level->drivers, *driver);
+  }
+  const auto group = KdReportChannelGetGroup(&channel);
+  if ((options & kKdReportFileByGroup) == 0 || !group) return level;
+  if (level != nullptr) level = moveTo(level->channelGroups, *group);
+  const auto subGroup = KdReportChannelGetSubGroup(&channel);
+  if (level != nullptr && subGroup) level = moveTo(level->channelGroups, *subGroup);
+  return level;
+}
+
+KdStatus file(ChannelCollection* collection, const KdReportChannel& channel, std::uint32_t options) {
+  if (collection == nullptr || channel == nullptr) return kKdBadArgument;
+  ChannelCollection* level = levelFor(*collection, *channel, options);
+  if (level == nullptr) return kKdError;
+  if (level->channels.isAbsent()) level->channels.make();
+  if (level->channels.get() == nullptr) return kKdError;
+  level->channels.get()->push_back(channel);
+  return kKdSuccess;
+}
+
+PlistValue textOrNone(const std::optional<std::string>& text) {
+  return text ? PlistValue::string(*text) : PlistValue();
+}
+
+}  // namespace
+
+ChannelCollection* SubCollections::find(std::string_view name) const {
+  const auto place = places_.positionOf(name);
+  return place ? entries_[*place].second.get() : nullptr;
+}
+
+ChannelCollection* SubCollections::findOrMake(std::string_view name) {
+  if (!places_.contains(name)) add(name, std::make_shared<ChannelCollection>());
+  return find(name);
+}
+
+void SubCollections::add(std::string_view name, KdReportCollection collection) {
+  places_.set(name, PlistValue::boolean(true));
+  entries_.emplace_back(name, std::move(collection));
+}
+
+void SubCollections::removeEmpty() {
+  const auto isEmpty = [](const Entry& entry) { return entry.second != nullptr && entry.second->empty(); };
+  if (std::erase_if(entries_, isEmpty) == 0) return;
+  places_ = {};
+  for (const Entry& entry : entries_) places_.set(entry.first, PlistValue::boolean(true));
+}
+
+KdReportCollection KdReportCreateAggregate(std::uint32_t options) {
+  auto collection = std::make_shared<ChannelCollection>();
+  collection->queryOptions = PlistValue::int32(static_cast<std::int32_t>(options));
+  return collection;
+}
+
+std::uint32_t _getAggregateOpts(const ChannelCollection* collection) {
+  const auto options = collection != nullptr ? collection->queryOptions.asNumber() : std::nullopt;
+  return options ? static_cast<std::uint32_t>(options->toInt64()) : std::uint32_t{kKdReportFlat};
+}
+
+KdStatus _addChannel(ChannelCollection* collection, const KdReportChannel& channel, std::uint32_t options,
+                     KdReportErrorOut error) {
+  const KdStatus status = file(collection, channel, options);
+  if (status != kKdSuccess) setError(error, status, "_addChannel() failed");
+  return status;
+}
+
+KdReportChannel makeChannelRecord(PlistValue driverID, PlistValue driverName, const PlistValue& legendEntry,
+                                  KdReportErrorOut error) {
+  const PlistArray* entry = legendEntry.asArray();
+  if (entry == nullptr || entry->size() <= kLegendChannelType || driverName.isNone() ||
+      integerOrInvalid((*entry)[kLegendChannelID]) == kKdReportInvalid ||
+      integerOrInvalid((*entry)[kLegendChannelType]) == kKdReportInvalid) {
+    setError(error, kKdError, "couldn't create channel");
+    return nullptr;
+  }
+  auto channel = std::make_shared<ChannelRecord>();
+  channel->driverID = std::move(driverID);
+  channel->driverName = std::move(driverName);
+  channel->legendChannel = std::make_shared<PlistArray>(*entry);
+  return channel;
+}
+
+KdStatus KdReportAddChannelDescription(ChannelCollection* collection,
+                                       const KdReportChannelDescription& description,
+                                       KdReportErrorOut error) {
+  PlistArray entry{PlistValue::int64(description.channelID),
+                   PlistValue::int64(static_cast<std::int64_t>(description.channelType.bits))};
+  if (description.channelName) entry.push_back(PlistValue::string(*description.channelName));
+  const KdReportChannel channel =
+      makeChannelRecord(PlistValue::int64(description.driverID), textOrNone(description.driverName),
+                        PlistValue::array(std::move(entry)), error);
+  if (channel == nullptr) return kKdError;
+  channel->groupName = textOrNone(description.groupName);
+  channel->subGroupName = textOrNone(description.subGroupName);
+  if (description.channelInfo.asDictionary() != nullptr) channel->channelInfo = description.channelInfo;
+  return _addChannel(collection, channel, _getAggregateOpts(collection), error);
+}
+
+std::uint32_t KdReportMergeChannels(ChannelCollection* destination, const ChannelCollection* source,
+                                    KdReportErrorOut error) {
+  if (destination == nullptr || source == nullptr || destination == source) {
+    setError(error, kKdBadArgument, "bad argument");
+    return kKdReportWalkFailed;
+  }
+  const std::uint32_t options = _getAggregateOpts(destination);
+  return KdReportIterate(source, [destination, options, error](ChannelRecord& channel) -> std::uint32_t {
+    const KdStatus status = _addChannel(destination, channel.shared_from_this(), options, error);
+    return status == kKdSuccess ? kKdReportKeep : kKdReportStop;
+  });
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,128 @@
+// Collections as property lists, and back.
+
+#include <array>
+
+#include "drivermetrics/channel_collection.h"
+
+namespace tbdaily {
+
+namespace {
+
+using namespace kd_report_key;
+
+// A filed collection has four levels: all, driver, group, subgroup.
+constexpr int kMostLevels = 4;
+
+struct RecordValue {
+  std::string_view key;
+  PlistValue ChannelRecord::*value;
+};
+
+// A function and no constant: the compiler confuses pointers to members in constant tables.
+std::array<RecordValue, 9> recordValues() {
+  return {{
+      {kDriverID, &ChannelRecord::driverID},
+      {kDriverName, &ChannelRecord::driverName},
+      {kGroupName, &ChannelRecord::groupName},
+      {kSubGroupName, &ChannelRecord::subGroupName},
+      {kChannelInfo, &ChannelRecord::channelInfo},
+      {kChannelName, &ChannelRecord::channelName},
+      {kUnitLabel, &ChannelRecord::unitLabel},
+      {kProcessedChannelConfig, &ChannelRecord::processedChannelConfig},
+      {kStateNames, &ChannelRecord::stateNames},
+  }};
+}
+
+PlistValue plistOfChannel(const ChannelRecord& channel) {
+  PlistDictionary entries;
+  for (const auto& [key, value] : recordValues()) entries.set(key, channel.*value);
+  if (channel.legendChannel != nullptr)
+    entries.set(kLegendChannel, PlistValue::array(*channel.legendChannel));
+  if (channel.rawElements != nullptr) entries.set(kRawElements, PlistValue::data(*channel.rawElements));
+  return PlistValue::dictionary(std::move(entries));
+}
+
+KdReportChannel channelOfPlist(const PlistValue& value) {
+  const PlistDictionary* entries = value.asDictionary();
+  if (entries == nullptr) return nullptr;
+  auto channel = std::make_shared<ChannelRecord>();
+  for (const auto& [key, member] : recordValues()) channel.get()->*member = entries->get(key);
+  const PlistValue legend = entries->get(kLegendChannel), elements = entries->get(kRawElements);
+  if (const PlistArray* entry = legend.asArray())
+    channel->legendChannel = std::make_shared<PlistArray>(*entry);
+  if (const auto bytes = elements.asData())
+    channel->rawElements = std::make_shared<PlistData>(bytes->begin(), bytes->end());
+  return channel;
+}
+
+PlistValue plistOfCollection(const ChannelCollection& collection);
+
+PlistValue plistOfNested(const SubCollections& nested) {
+  PlistDictionary entries;
+  for (const auto& [name, collection] : nested)
+    entries.set(name, collection != nullptr ? plistOfCollection(*collection) : PlistValue());
+  return PlistValue::dictionary(std::move(entries));
+}
+
+PlistValue plistOfCollection(const ChannelCollection& collection) {
+  PlistDictionary entries;
+  entries.set(kQueryOptions, collection.queryOptions);
+  if (const auto* channels = collection.channels.get()) {
+    PlistArray records;
+    records.reserve(channels->size());
+    for (const KdReportChannel& channel : *channels)
+      records.push_back(channel != nullptr ? plistOfChannel(*channel) : PlistValue::boolean(false));
+    entries.set(kChannels, PlistValue::array(std::move(records)));
+  }
+  if (const auto* drivers = collection.drivers.get()) entries.set(kDrivers, plistOfNested(*drivers));
+  if (const auto* groups = collection.channelGroups.get())
+    entries.set(kChannelGroups, plistOfNested(*groups));
+  return PlistValue::dictionary(std::move(entries));
+}
+
+// Null when the value is no dictionary; `isTooDeep` is set when it is nested beyond the levels that are left.
+KdReportCollection collectionOfPlist(const PlistValue& value, int levels, bool& isTooDeep);
+
+void readNested(CollectionField<SubCollections>& field, const PlistValue& value, int levels,
+                bool& isTooDeep) {
+  if (value.isNone()) return;
+  const PlistDictionary* entries = value.asDictionary();
+  if (entries == nullptr) return field.makeForeign();
+  SubCollections& nested = field.make();
+  for (const auto& [name, entry] : *entries) nested.add(name, collectionOfPlist(entry, levels, isTooDeep));
+}
+
+void readChannels(CollectionField<std::vector<KdReportChannel>>& field, const PlistValue& value) {
+  if (value.isNone()) return;
+  const PlistArray* records = value.asArray();
+  if (records == nullptr) return field.makeForeign();
+  auto& channels = field.make();
+  channels.reserve(records->size());
+  for (const PlistValue& record : *records) channels.push_back(channelOfPlist(record));
+}
+
+KdReportCollection collectionOfPlist(const PlistValue& value, int levels, bool& isTooDeep) {
+  const PlistDictionary* entries = value.asDictionary();
+  isTooDeep = isTooDeep || (entries != nullptr && levels == 0);
+  if (entries == nullptr || isTooDeep) return nullptr;
+  auto collection = std::make_shared<ChannelCollection>();
+  collection->queryOptions = entries->get(kQueryOptions);
+  readChannels(collection->channels, entries->get(kChannels));
+  readNested(collection->drivers, entries->get(kDrivers), levels - 1, isTooDeep);
+  readNested(collection->channelGroups, entries->get(kChannelGroups), levels - 1, isTooDeep);
+  return collection;
+}
+
+}  // namespace
+
+PlistValue KdReportCopyPropertyList(const ChannelCollection* collection) {
+  return collection != nullptr ? plistOfCollection(*collection) : PlistValue();
+}
+
+KdReportCollection KdReportCreateAggregateFromPropertyList(const PlistValue& value) {
+  bool isTooDeep = false;
+  KdReportCollection collection = collectionOfPlist(value, kMostLevels, isTooDeep);
+  return isTooDeep ? nullptr : collection;
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,205 @@
+// The walk: every operation that looks at all channels of a collection, in one of four modes.
+
+#include <type_traits>
+
+#include "drivermetrics/channel_collection.h"
+#include "drivermetrics/channel_pairing.h"
+#include "drivermetrics/raw_elements.h"
+
+namespace tbdaily {
+
+namespace {
+
+struct Visit {
+  const KdReportVisitor& visitor;
+};
+struct Prune {
+  const KdReportVisitor& visitor;
+};
+struct Clone {
+  const CloneVisitor& visitor;
+};
+struct Compare {
+  const CompareVisitor& visitor;
+};
+
+template <typename Mode>
+inline constexpr bool kPrunes = std::is_same_v<Mode, Prune>;
+template <typename Mode>
+inline constexpr bool kCompares = std::is_same_v<Mode, Compare>;
+template <typename Mode>
+inline constexpr bool kCopies = std::is_same_v<Mode, Clone> || kCompares<Mode>;
+
+// Only pruning changes the collection that it walks.
+template <typename Mode, typename T>
+using Walked = std::conditional_t<kPrunes<Mode>, T, const T>;
+
+using Channels = std::vector<KdReportChannel>;
+
+bool isOdd(std::uint32_t status) {
+  return (status & 1) != 0;
+}
+
+template <typename Mode>
+std::uint32_t walk(const Mode& mode, Walked<Mode, ChannelCollection>* collection,
+                   const ChannelCollection* other, KdReportCollection* result);
+
+std::uint32_t visitChannels(const Visit& mode, const Channels& channels) {
+  std::uint32_t status = 0;
+  for (std::size_t i = 0; i < channels.size(); ++i) {
+    const KdReportChannel channel = channels[i];  // stays while it is visited, whatever the visitor does
+    const std::uint32_t answer = channel != nullptr ? mode.visitor(*channel) : kKdReportWalkFailed;
+    if (isOdd(answer)) return answer;
+    status |= answer;
+  }
+  return status;
+}
+
+std::uint32_t pruneChannels(const Prune& mode, Channels& channels) {
+  std::uint32_t status = 0, answer = 0;
+  std::size_t kept = 0, next = 0;
+  for (; next < channels.size() && !isOdd(answer); ++next) {
+    answer = channels[next] != nullptr ? mode.visitor(*channels[next]) : kKdReportWalkFailed;
+    status |= answer;
+    if (answer != kKdReportRemove) channels[kept++].swap(channels[next]);
+  }
+  channels.erase(channels.begin() + static_cast<std::ptrdiff_t>(kept),
+                 channels.begin() + static_cast<std::ptrdiff_t>(next));
+  return isOdd(answer) ? answer : status;
+}
+
+std::uint32_t cloneChannels(const Clone& mode, const Channels& channels, Channels& copies) {
+  std::uint32_t status = 0;
+  copies.reserve(channels.size());
+  for (const KdReportChannel& channel : channels) {
+    if (channel == nullptr) return kKdReportWalkFailed;
+    KdReportChannel copy = std::make_shared<ChannelRecord>(*channel);
+    const std::uint32_t answer = mode.visitor(*channel, *copy);
+    if (isOdd(answer)) return answer;
+    if (answer == kKdReportKeep) copies.push_back(std::move(copy));
+    status |= answer;
+  }
+  return status;
+}
+
+std::uint32_t compareChannels(const Compare& mode, const Channels& channels, const Channels& earlier,
+                              Channels& copies) {
+  std::uint32_t status = 0;
+  ChannelPairing pairing(earlier);
+  copies.reserve(channels.size());
+  for (std::size_t i = 0; i < channels.size(); ++i) {
+    if (channels[i] == nullptr) return kKdReportWalkFailed;
+    KdReportChannel copy = std::make_shared<ChannelRecord>(*channels[i]);
+    const auto [isReadable, partner] = pairing.partnerOf(*channels[i], i);
+    if (!isReadable) return kKdReportWalkFailed;
+    std::uint32_t answer = kKdReportKeep;
+    if (partner != nullptr) {
+      if (cloneElements(*copy, *partner, ElementValues::Invalidate) != kKdSuccess) return kKdReportWalkFailed;
+      answer = mode.visitor(*partner, *channels[i], *copy);
+    }
+    if (isOdd(answer)) return answer;
+    if (answer == kKdReportKeep) copies.push_back(std::move(copy));
+    status |= answer;
+  }
+  return status;
+}
+
+// The channels filed at one level.
+template <typename Mode>
+std::uint32_t walkChannels(const Mode& mode, Walked<Mode, ChannelCollection>& collection,
+                           const ChannelCollection* other, ChannelCollection* result) {
+  if (collection.channels.isAbsent()) return 0;
+  auto* channels = collection.channels.get();
+  if (channels == nullptr) return kKdReportWalkFailed;
+  if constexpr (kCompares<Mode>) {
+    const Channels* earlier = other->channels.get();
+    if (earlier == nullptr) return kKdReportWalkFailed;
+    return compareChannels(mode, *channels, *earlier, result->channels.make());
+  } else if constexpr (kCopies<Mode>) {
+    return cloneChannels(mode, *channels, result->channels.make());
+  } else if constexpr (kPrunes<Mode>) {
+    const std::uint32_t status = pruneChannels(mode, *channels);
+    if (!isOdd(status) && channels->empty()) collection.channels.remove();
+    return status;
+  } else {
+    return visitChannels(mode, *channels);
+  }
+}
+
+// The sub-collections under one key. The first odd status is the walk's, and ends it; pruning still goes
+// through the others.
+template <typename Mode>
+std::uint32_t walkNested(const Mode& mode, Walked<Mode, CollectionField<SubCollections>>& nested,
+                         const CollectionField<SubCollections>* otherNested,
+                         CollectionField<SubCollections>* results) {
+  if (nested.isAbsent()) return 0;
+  if (nested.get() == nullptr) return kKdReportWalkFailed;
+  if (kCompares<Mode> && otherNested->get() == nullptr) return kKdReportWalkFailed;
+  SubCollections copies;
+  std::uint32_t status = 0;
+  for (const auto& [name, collection] : *nested.get()) {
+    const ChannelCollection* other = kCompares<Mode> ? otherNested->get()->find(name) : nullptr;
+    KdReportCollection copy;
+    const std::uint32_t answer = walk(mode, collection.get(), other, &copy);
+    if (!isOdd(status)) status = isOdd(answer) ? answer : status | answer;
+    if (isOdd(status) && !kPrunes<Mode>) return status;
+    if constexpr (kCopies<Mode>) copies.add(name, std::move(copy));
+  }
+  if (isOdd(status)) return status;
+  if constexpr (kCopies<Mode>) results->make() = std::move(copies);
+  if constexpr (kPrunes<Mode>) {
+    nested.get()->removeEmpty();
+    if (nested.get()->empty()) nested.remove();
+  }
+  return status;
+}
+
+// `other` is the earlier collection when comparing; `result` receives the copy in the modes that make one.
+template <typename Mode>
+std::uint32_t walk(const Mode& mode, Walked<Mode, ChannelCollection>* collection,
+                   const ChannelCollection* other, KdReportCollection* result) {
+  if (collection == nullptr || (kCompares<Mode> && other == nullptr)) return kKdReportWalkFailed;
+  const KdReportCollection copy = kCopies<Mode> ? std::make_shared<ChannelCollection>() : nullptr;
+  std::uint32_t status = walkChannels(mode, *collection, other, copy.get());
+  for (const auto key : {&ChannelCollection::drivers, &ChannelCollection::channelGroups}) {
+    if (isOdd(status)) break;
+    const std::uint32_t answer =
+        walkNested(mode, collection->*key, other != nullptr ? &(other->*key) : nullptr,
+                   copy != nullptr ? &(copy.get()->*key) : nullptr);
+    status = isOdd(answer) ? answer : status | answer;
+  }
+  if (result != nullptr && !isOdd(status)) *result = copy;
+  return status;
+}
+
+}  // namespace
+
+std::uint32_t KdReportIterate(const ChannelCollection* collection, const KdReportVisitor& visitor) {
+  return visitor ? walk(Visit{visitor}, collection, nullptr, nullptr) : kKdReportWalkFailed;
+}
+
+std::uint32_t KdReportPrune(ChannelCollection* collection, const KdReportVisitor& visitor) {
+  return visitor ? walk(Prune{visitor}, collection, nullptr, nullptr) : kKdReportWalkFailed;
+}
+
+std::uint32_t KdReportGetChannelCount(const ChannelCollection* collection) {
+  std::uint32_t count = 0;
+  const std::uint32_t status = KdReportIterate(collection, [&count](ChannelRecord&) -> std::uint32_t {
+    ++count;
+    return kKdReportKeep;
+  });
+  return status == 0 ? count : kKdReportNoIndex;
+}
+
+KdReportCollection cloneAggregate(const ChannelCollection* collection, const CloneVisitor& visitor) {
+  KdReportCollection result;
+  return isOdd(walk(Clone{visitor}, collection, nullptr, &result)) ? nullptr : result;
+}
+
+KdReportCollection compareAggregates(const ChannelCollection* earlier, const ChannelCollection* later,
+                                     const CompareVisitor& visitor) {
+  KdReportCollection result;
+  return walk(Compare{visitor}, later, earlier, &result) != 0 ? nullptr : result;
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,19 @@
+// Text the way the C library's printf writes it.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+
+namespace tbdaily {
+
+// As printf would write it, at its whole length.
+[[gnu::format(printf, 1, 2)]] std::string formatText(const char* format, ...);
+
+// "0x1f"; 0 has no prefix.
+std::string alternateHexadecimal(std::uint64_t value);
+
+// Whether all of the text is well-formed UTF-8.
+bool isUtf8(std::string_view text);
+
+}  // namespace tbdaily

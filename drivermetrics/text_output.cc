@@ -1,0 +1,24 @@
+// Text to a file descriptor, and the name of this process.
+
+#include <unistd.h>
+
+#include <cerrno>
+
+#include "drivermetrics/kd_report.h"
+#include "drivermetrics/text_format.h"
+
+namespace tbdaily {
+
+KdStatus KdReportWriteStringUTF8(int fd, std::optional<std::string_view> text) {
+  if (!text) return kKdBadArgument;
+  if (!isUtf8(*text)) return kKdNoMemory;
+  const ssize_t written = ::write(fd, text->data(), text->size());
+  if (written < 0) return kKdIOError;
+  return static_cast<std::size_t>(written) == text->size() ? kKdSuccess : kKdUnderrun;
+}
+
+std::string KdReportCopyCurrentProcessName() {
+  return formatText("%s <pid %d>", program_invocation_short_name, static_cast<int>(::getpid()));
+}
+
+}  // namespace tbdaily
