@@ -1,0 +1,61 @@
+#include "tools/tallyctl/metrics_print.h"
+
+#include <unistd.h>
+
+#include "tools/tallyctl/metrics_json.h"
+#include "tools/tallyctl/metrics_sampler.h"
+#include "tools/tallyctl/metrics_view.h"
+#include "tools/tallyctl/tool.h"
+
+namespace tbdaily {
+
+namespace {
+
+// The library's text as it is, but nothing in it may drive a terminal.
+std::string shownText(const std::string& text) {
+  if (::isatty(STDOUT_FILENO) == 0) return text;
+  std::string shown;
+  for (std::size_t begin = 0; begin < text.size();) {
+    const std::size_t end = std::min(text.find('\n', begin), text.size());
+    shown += printable(std::string_view(text).substr(begin, end - begin));
+    if (end < text.size()) shown += '\n';
+    begin = end + 1;
+  }
+  return shown;
+}
+
+}  // namespace
+
+bool isDone(Tool& tool, const MetricsRequest& request, const ChannelSelection& selection) {
+  if (!selection.channels) return true;
+  if (selection.selected != 0) return false;
+  if (request.describe || tool.printedAsJson(PlistValue::array({}))) return true;
+  tool.out().line(selection.published != 0 ? "no channels match" : "no driver publishes channels");
+  return true;
+}
+
+void printDescriptions(Tool& tool, const ChannelCollection* collection, ChannelContents contents) {
+  const auto describe = [contents](ChannelRecord& channel) {
+    return contents == ChannelContents::Values ? KdReportSampleCopyDescription(&channel, 0, "")
+                                               : KdReportChannelCopyDescription(&channel, 0, "");
+  };
+  KdReportIterate(collection, [&tool, &describe](ChannelRecord& channel) {
+    if (const auto text = describe(channel)) tool.out().print(shownText(*text));
+    return kKdReportKeep;
+  });
+}
+
+void printChannels(Tool& tool, const MetricsRequest& request, const ChannelCollection* collection,
+                   ChannelContents contents) {
+  if (request.describe) return printDescriptions(tool, collection, contents);
+  const auto channels = readChannels(collection, contents);
+  if (!channels) return failMetrics(tool, "the channels cannot be read", std::nullopt);
+  if (tool.options.json) {
+    tool.printedAsJson(channelsAsJson(*channels, contents));
+    return;
+  }
+  contents == ChannelContents::Values ? printValueTree(tool.out(), *channels)
+                                      : printChannelTree(tool.out(), *channels);
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,76 @@
+#include "tools/tallyctl/stop_signals.h"
+
+#include <poll.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <ctime>
+
+namespace tbdaily {
+
+namespace {
+
+volatile std::sig_atomic_t stopAsked = 0;  // a handler has nothing else to write to
+
+void askToStop(int) {
+  stopAsked = 1;
+}
+
+// Keeps the signals back, so that none comes between the question whether one came and the sleep.
+class HeldSignals {
+ public:
+  HeldSignals() {
+    sigset_t held;
+    sigemptyset(&held);
+    sigaddset(&held, SIGINT);
+    sigaddset(&held, SIGTERM);
+    sigprocmask(SIG_BLOCK, &held, &before_);
+  }
+  ~HeldSignals() { sigprocmask(SIG_SETMASK, &before_, nullptr); }
+  HeldSignals(const HeldSignals&) = delete;
+  HeldSignals& operator=(const HeldSignals&) = delete;
+
+  const sigset_t& before() const { return before_; }
+
+ private:
+  sigset_t before_{};
+};
+
+}  // namespace
+
+StopSignals::StopSignals() {
+  stopAsked = 0;
+  for (std::size_t i = 0; i < kSignals.size(); ++i) {
+    struct sigaction action {};
+    sigemptyset(&action.sa_mask);
+    action.sa_handler = kSignals[i] == SIGPIPE ? SIG_IGN : askToStop;
+    sigaction(kSignals[i], &action, &before_[i]);
+  }
+}
+
+StopSignals::~StopSignals() {
+  for (std::size_t i = 0; i < kSignals.size(); ++i) sigaction(kSignals[i], &before_[i], nullptr);
+}
+
+bool StopSignals::haveCome() const {
+  return stopAsked != 0;
+}
+
+Woken StopSignals::sleepUntil(std::chrono::steady_clock::time_point time) const {
+  using std::chrono::nanoseconds, std::chrono::seconds;
+  const HeldSignals held;
+  while (!haveCome()) {
+    const auto left = std::max(
+        std::chrono::duration_cast<nanoseconds>(time - std::chrono::steady_clock::now()), nanoseconds(0));
+    const auto whole = std::chrono::floor<seconds>(left);
+    const timespec timeout{whole.count(), (left - whole).count()};
+    pollfd output{STDOUT_FILENO, 0, 0};  // asks for nothing: a closed pipe reports itself
+    const int ready = ::ppoll(&output, 1, &timeout, &held.before());
+    if (ready > 0) return Woken::ReaderGone;
+    if (ready == 0 || errno != EINTR) return Woken::InTime;
+  }
+  return Woken::Stopped;
+}
+
+}  // namespace tbdaily

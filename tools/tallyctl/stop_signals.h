@@ -1,0 +1,31 @@
+// For commands that go on until they are told to end.
+#pragma once
+
+#include <array>
+#include <chrono>
+#include <csignal>
+#include <cstdint>
+
+namespace tbdaily {
+
+enum class Woken : std::uint8_t { InTime, Stopped, ReaderGone };
+
+// As long as it lives, SIGINT and SIGTERM no longer end the process but ask the command to end, and writing
+// to a closed pipe fails instead of ending the process. One at a time.
+class StopSignals {
+ public:
+  StopSignals();
+  ~StopSignals();
+  StopSignals(const StopSignals&) = delete;
+  StopSignals& operator=(const StopSignals&) = delete;
+
+  bool haveCome() const;
+  // Sleeps until the time has come, a signal has, or nobody reads standard output any more.
+  Woken sleepUntil(std::chrono::steady_clock::time_point time) const;
+
+ private:
+  static constexpr std::array kSignals = {SIGINT, SIGTERM, SIGPIPE};
+  std::array<struct sigaction, kSignals.size()> before_{};
+};
+
+}  // namespace tbdaily
