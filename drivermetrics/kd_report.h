@@ -117,15 +117,16 @@ std::optional<std::string_view> KdReportChannelGetUnitLabel(ChannelRecord* chann
 KdReportCollection KdReportCreateAggregate(std::uint32_t options);
 
 // A channel that no legend lists: builds its record and files it with the collection's own options.
-//   kKdError: the identifier is kKdReportInvalid, or the record cannot be filed; kKdBadArgument: no
-//   collection.
+//   kKdError: the identifier is kKdReportInvalid, the driver has no name, or the record cannot be filed;
+//   kKdBadArgument: no collection.
 struct KdReportChannelDescription {
   std::int64_t driverID = 0;
-  std::optional<std::string> driverName;
+  std::optional<std::string> driverName = {};  // needed: a record always has one
   std::int64_t channelID = 0;
-  ChannelType channelType;
-  std::optional<std::string> channelName, groupName, subGroupName;
-  PlistValue channelInfo;  // as KdReportCreateUnitInfo makes one; anything but a dictionary counts as none
+  ChannelType channelType = {};
+  std::optional<std::string> channelName = {}, groupName = {}, subGroupName = {};
+  // As KdReportCreateUnitInfo makes one; anything but a dictionary counts as none.
+  PlistValue channelInfo = {};
 };
 KdStatus KdReportAddChannelDescription(ChannelCollection* collection,
                                        const KdReportChannelDescription& description,
@@ -160,7 +161,7 @@ std::uint32_t KdReportMergeChannels(ChannelCollection* destination, const Channe
 // elements.
 PlistValue KdReportCopyPropertyList(const ChannelCollection* collection);
 // The way back. Null when the value is no dictionary or is nested deeper than a filed collection can be; what
-// is malformed inside is kept, and fails the walks that meet it.
+// is malformed inside fails the walks that meet it.
 KdReportCollection KdReportCreateAggregateFromPropertyList(const PlistValue& value);
 
 // ---- Discovery

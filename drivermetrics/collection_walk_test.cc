@@ -1,0 +1,197 @@
+#include <gmock/gmock.h>
+
+#include <random>
+
+#include "drivermetrics/metrics_test_support.h"
+
+namespace tbdaily {
+namespace {
+
+using testing::channelOf, testing::channelsIn, testing::channelType, testing::collectionOf;
+using ::testing::ElementsAre;
+
+constexpr unsigned kRounds = 300;
+
+class RandomChannels {
+ public:
+  unsigned below(unsigned n) { return static_cast<unsigned>(random_() % n); }
+
+  std::vector<KdReportChannel> make(unsigned most) {
+    std::vector<KdReportChannel> channels(below(most + 1));
+    for (KdReportChannel& channel : channels) {
+      channel = channelOf(1 + below(3), 1 + below(12), channelType(1 + below(2)));
+      if (below(3) != 0) channel->groupName = PlistValue::string(below(2) != 0 ? "G" : "H");
+      if (below(2) != 0) channel->subGroupName = PlistValue::string("S");
+      channel->rawElements = std::make_shared<PlistData>();
+      testing::appendElement(*channel->rawElements, 0, 0,
+                             channelType(KdReportChannelGetFormat(channel.get())), {.words = {1, 2, 3, 4}});
+    }
+    return channels;
+  }
+
+ private:
+  std::mt19937 random_{20261124};
+};
+
+// The order of a filed collection's walk, said once more: per driver in the order of its first channel, then
+// without group, then per group and subgroup in their order.
+std::vector<ChannelRecord*> inWalkOrder(const std::vector<KdReportChannel>& channels) {
+  const auto rank = [&channels](auto key, const ChannelRecord* channel) {
+    return std::ranges::find_if(channels, [&](const auto& other) { return key(*other) == key(*channel); }) -
+           channels.begin();
+  };
+  using Key = std::vector<std::ptrdiff_t>;
+  std::vector<std::pair<Key, ChannelRecord*>> keyed;
+  for (const KdReportChannel& channel : channels) {
+    const auto driver = [](const ChannelRecord& c) { return c.driverID; };
+    const auto group = [](const ChannelRecord& c) { return std::pair(c.driverID, c.groupName); };
+    const auto subGroup = [](const ChannelRecord& c) {
+      return std::tuple(c.driverID, c.groupName, c.subGroupName);
+    };
+    Key key{rank(driver, channel.get()), -1, -1};
+    if (channel->groupName) key[1] = rank(group, channel.get());
+    if (channel->groupName && channel->subGroupName) key[2] = rank(subGroup, channel.get());
+    keyed.emplace_back(key, channel.get());
+  }
+  std::ranges::stable_sort(keyed, {}, &std::pair<Key, ChannelRecord*>::first);
+  std::vector<ChannelRecord*> ordered;
+  for (const auto& [key, channel] : keyed) ordered.push_back(channel);
+  return ordered;
+}
+
+TEST(CollectionWalk, VisitsClonesAndPrunesLikeAList) {
+  RandomChannels random;
+  for (unsigned round = 0; round < kRounds; ++round) {
+    const auto channels = random.make(20);
+    const KdReportCollection filed = collectionOf(channels, 3);
+    std::vector<ChannelRecord*> expected = inWalkOrder(channels);
+    EXPECT_EQ(channelsIn(filed.get()), expected);
+    EXPECT_EQ(KdReportGetChannelCount(filed.get()), channels.size());
+
+    const unsigned modulus = 2 + random.below(4);
+    const auto answer = [modulus](const ChannelRecord& channel) -> std::uint32_t {
+      return static_cast<unsigned>(KdReportChannelGetChannelID(&channel)) % modulus == 0 ? kKdReportRemove
+                                                                                         : kKdReportKeep;
+    };
+    const KdReportCollection copy = cloneAggregate(
+        filed.get(), [&](const ChannelRecord& channel, ChannelRecord&) { return answer(channel); });
+    const std::size_t removed = std::erase_if(
+        expected, [&](const ChannelRecord* channel) { return answer(*channel) != kKdReportKeep; });
+    std::vector<ChannelRecord*> copies = channelsIn(copy.get());
+    ASSERT_EQ(copies.size(), expected.size());
+    for (std::size_t i = 0; i < copies.size(); ++i) {
+      EXPECT_NE(copies[i], expected[i]);
+      EXPECT_EQ(copies[i]->legendChannel, expected[i]->legendChannel);
+      EXPECT_EQ(copies[i]->rawElements, expected[i]->rawElements);
+    }
+    EXPECT_TRUE(copy->queryOptions.isNone());
+
+    EXPECT_EQ(KdReportPrune(filed.get(), answer), removed != 0 ? kKdReportRemove : kKdReportKeep);
+    EXPECT_EQ(channelsIn(filed.get()), expected);
+    KdReportPrune(filed.get(), [](ChannelRecord&) -> std::uint32_t { return kKdReportRemove; });
+    EXPECT_TRUE(filed->channels.isAbsent() && filed->drivers.isAbsent() && filed->channelGroups.isAbsent());
+    EXPECT_EQ(_getAggregateOpts(filed.get()), 3U);
+  }
+}
+
+TEST(CollectionWalk, PairsChannelsInTheirOrder) {
+  RandomChannels random;
+  for (unsigned round = 0; round < kRounds; ++round) {
+    const auto earlier = random.make(12), later = random.make(12);
+    const auto pairs = [](const KdReportChannel& a, const KdReportChannel& b) {
+      return a->driverID == b->driverID && *a->legendChannel == *b->legendChannel;
+    };
+    // Index by index, else forward from behind the last hit.
+    std::vector<const ChannelRecord*> expected, partners;
+    std::optional<std::size_t> resume;
+    for (std::size_t i = 0; i < later.size() && i < earlier.size(); ++i) {
+      std::size_t at = i;
+      if (!pairs(earlier[i], later[i])) {
+        if (!resume) resume = i + 1;
+        for (at = *resume; at < earlier.size() && !pairs(earlier[at], later[i]);) ++at;
+        if (at == earlier.size()) continue;
+        resume = at + 1;
+      }
+      expected.push_back(earlier[at].get());
+    }
+    const auto before = collectionOf(earlier), after = collectionOf(later);
+    const KdReportCollection result = compareAggregates(
+        before.get(), after.get(),
+        [&](const ChannelRecord& partner, const ChannelRecord&, ChannelRecord& copy) {
+          partners.push_back(&partner);
+          EXPECT_NE(copy.rawElements, partner.rawElements);
+          EXPECT_EQ(getRawElements(&copy, KdReportChannelGetFormat(&copy))->word(0, 3), kKdReportInvalid);
+          return std::uint32_t{0};
+        });
+    if (later.empty() || !earlier.empty()) {
+      EXPECT_EQ(partners, expected);
+      EXPECT_EQ(channelsIn(result.get()).size(), later.size());
+    } else {
+      EXPECT_EQ(result, nullptr) << "the earlier collection has no channels at this level";
+    }
+  }
+}
+
+TEST(CollectionWalk, StopsAtAnOddAnswer) {
+  const KdReportCollection filed =
+      collectionOf({channelOf(1, 1), channelOf(1, 2), channelOf(1, 3), channelOf(2, 4)}, 1);
+  std::vector<std::int64_t> visited;
+  const KdReportVisitor stopAtThree = [&visited](ChannelRecord& channel) -> std::uint32_t {
+    visited.push_back(KdReportChannelGetChannelID(&channel));
+    return visited.back() == 3 ? kKdReportStop : kKdReportRemove;
+  };
+  EXPECT_EQ(KdReportIterate(filed.get(), stopAtThree), 1U);
+  EXPECT_THAT(visited, ElementsAre(1, 2, 3));
+  visited.clear();
+  // Pruning goes on with the next driver; what was to be removed before the stop is gone.
+  EXPECT_EQ(KdReportPrune(filed.get(), stopAtThree), 1U);
+  EXPECT_THAT(visited, ElementsAre(1, 2, 3, 4));
+  EXPECT_EQ(KdReportGetChannelCount(filed.get()), 1U);
+}
+
+TEST(CollectionWalk, FailsOnMalformedCollections) {
+  const PlistValue number = PlistValue::int64(1);
+  const auto with = [](const char* key, PlistValue value) {
+    return KdReportCreateAggregateFromPropertyList(PlistValue::dictionary({{key, std::move(value)}}));
+  };
+  EXPECT_EQ(KdReportGetChannelCount(with("Other", number).get()), 0U);
+  EXPECT_EQ(KdReportCreateAggregateFromPropertyList(number), nullptr);
+  EXPECT_EQ(KdReportGetChannelCount(nullptr), kKdReportNoIndex);
+  PlistValue deep = PlistValue::dictionary({});
+  for (int i = 0; i < 400; ++i)
+    deep = PlistValue::dictionary({{"KdReportChannelGroups", PlistValue::dictionary({{"G", deep}})}});
+  EXPECT_EQ(KdReportCreateAggregateFromPropertyList(deep), nullptr);
+
+  const KdReportCollection good = collectionOf({channelOf(1, 1)});
+  for (const char* key : {"KdReportChannels", "KdReportDrivers", "KdReportChannelGroups"}) {
+    for (const PlistValue& value :
+         {number, PlistValue::array({number}), PlistValue::dictionary({{"G", number}})}) {
+      const KdReportCollection bad = with(key, value);
+      EXPECT_EQ(KdReportGetChannelCount(bad.get()), kKdReportNoIndex) << key;
+      EXPECT_EQ(KdReportPrune(bad.get(), [](ChannelRecord&) { return 0U; }), kKdReportWalkFailed);
+      EXPECT_EQ(cloneAggregate(bad.get(), [](const auto&, auto&) { return 0U; }), nullptr);
+      EXPECT_EQ(KdReportCreateSamplesDelta(good.get(), bad.get()), nullptr);
+      EXPECT_EQ(KdReportMergeChannels(good.get(), bad.get()), kKdReportWalkFailed);
+    }
+  }
+  // A channel without a readable type fails a comparison on either side; so does a level that the other
+  // lacks.
+  const KdReportCollection untyped =
+      with("KdReportChannels", PlistValue::array({PlistValue::dictionary({})}));
+  EXPECT_EQ(KdReportCreateSamplesDelta(untyped.get(), good.get()), nullptr);
+  EXPECT_EQ(KdReportCreateSamplesDelta(good.get(), untyped.get()), nullptr);
+  EXPECT_EQ(KdReportCreateSamplesDelta(good.get(), collectionOf({channelOf(1, 1)}, 1).get()), nullptr);
+}
+
+TEST(CollectionWalk, PropertyListsReadBack) {
+  RandomChannels random;
+  const KdReportCollection filed = collectionOf(random.make(30), 3);
+  for (ChannelRecord* channel : channelsIn(filed.get())) KdReportChannelGetChannelName(channel);
+  const PlistValue kept = KdReportCopyPropertyList(filed.get());
+  const KdReportCollection again = KdReportCreateAggregateFromPropertyList(kept);
+  EXPECT_EQ(KdReportCopyPropertyList(again.get()), kept);
+  EXPECT_EQ(KdReportGetChannelCount(again.get()), KdReportGetChannelCount(filed.get()));
+}
+
+}  // namespace
+}  // namespace tbdaily

@@ -1,0 +1,195 @@
+#include <gmock/gmock.h>
+
+#include "drivermetrics/metrics_test_support.h"
+#include "drivermetrics/report_error.h"
+
+namespace tbdaily {
+namespace {
+
+using testing::channelOf, testing::channelsIn, testing::channelType, testing::FakeDriver;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+PlistValue entry(std::int64_t identifier, std::int64_t type, const char* name = nullptr) {
+  PlistArray places{PlistValue::int64(identifier), PlistValue::int64(type)};
+  if (name != nullptr) places.push_back(PlistValue::string(name));
+  return PlistValue::array(places);
+}
+
+PlistValue group(const char* name, const char* subGroup, PlistArray channels) {
+  PlistDictionary fields{{"KdReportChannels", PlistValue::array(std::move(channels))},
+                         {"KdReportChannelInfo", KdReportCreateUnitInfo(0x64'00000000000000)}};
+  if (name != nullptr) fields.set("KdReportGroupName", PlistValue::string(name));
+  if (subGroup != nullptr) fields.set("KdReportSubGroupName", PlistValue::string(subGroup));
+  return PlistValue::dictionary(fields);
+}
+
+FakeDriver driver(std::uint64_t identifier, const char* name, PlistValue legend) {
+  PlistDictionary properties{{"KdReportLegendPublic", PlistValue::boolean(true)}};
+  properties.set("KdReportLegend", std::move(legend));
+  return {.identifier = identifier,
+          .name = name,
+          .serviceClass = "Driver",
+          .properties = properties,
+          .parent = {}};
+}
+
+class Discovery : public ::testing::Test {
+ protected:
+  ~Discovery() override { EXPECT_EQ(registry_.openHandles(), 0U); }
+
+  // What one driver with this legend gives: names and statuses.
+  std::string read(PlistValue legend, std::uint32_t options = kKdReportFlat) {
+    registry_.drivers = {driver(0x2A, "D", std::move(legend))};
+    const KdHandle handle = registry_.KdServiceGetMatchingService(registry_.KdServiceMatching("Driver"));
+    std::optional<ReportError> error;
+    const auto channels = KdReportCopyChannelsForDriver(registry_, handle, options, &error);
+    registry_.KdObjectRelease(handle);
+    EXPECT_NE(channels == nullptr, !error);
+    if (error) return error->reason + " " + std::to_string(static_cast<std::uint32_t>(error->code) & 0xFFF);
+    std::string names;
+    for (ChannelRecord* channel : channelsIn(channels.get()))
+      names += std::string(KdReportChannelGetChannelName(channel).value_or("-")) + " ";
+    return names;
+  }
+
+  testing::FakeDriverRegistry registry_;
+};
+
+TEST_F(Discovery, ReadsALegendUntilItIsMalformed) {
+  const PlistValue good = group("G", "S", {entry(0x54454D50, 1), entry(0xFF, 1), entry(3, 1, "Named")});
+  const PlistValue last = group("Last", nullptr, {entry(0x4C, 1)});
+  const std::string goodNames = "TEMP - Named ";
+  const std::string failed = "createPVErr() passed a NULL string! 700";
+  const std::vector<std::pair<PlistValue, std::string>> cases = {
+      {{}, "no legend 752"},
+      {PlistValue::dictionary({}), "bad legend 713"},
+      {PlistValue::array({good, last}), goodNames + "L "},
+      {PlistValue::array({good, PlistValue::int64(1), last}), goodNames},
+      {PlistValue::array({good, group(nullptr, "S", {entry(1, 1)}), last}), goodNames},
+      {PlistValue::array({good, PlistValue::dictionary({}), last}), goodNames},
+      {PlistValue::array({good, group("G", nullptr, {PlistValue::int64(1), entry(1, 1)}), last}),
+       goodNames + "L "},
+      {PlistValue::array({good, group("G", nullptr, {PlistValue::array({PlistValue::int64(1)})}), last}),
+       failed},
+      {PlistValue::array({good, group("G", nullptr, {entry(kKdReportInvalid, 1)}), last}), failed},
+  };
+  for (const auto& [legend, expected] : cases) EXPECT_EQ(read(legend), expected);
+
+  registry_.drivers[0].properties.remove("KdReportLegendPublic");
+  const KdHandle handle = registry_.KdServiceGetMatchingService(registry_.KdServiceMatching("Driver"));
+  EXPECT_TRUE(channelsIn(KdReportCopyChannelsForDriver(registry_, handle, 0).get()).empty());
+  registry_.drivers[0].retainCount = 0;
+  std::optional<ReportError> error;
+  EXPECT_EQ(KdReportCopyChannelsForDriver(registry_, handle, 0, &error), nullptr);
+  EXPECT_EQ(error->reason, "invalid driver");
+  registry_.KdObjectRelease(handle);
+}
+
+TEST_F(Discovery, FilesChannelsByDriverGroupAndSubgroup) {
+  registry_.drivers = {driver(0x2A, "D",
+                              PlistValue::array({group("G", "S", {entry(1, 0x1000001, "a")}),
+                                                 group(nullptr, nullptr, {entry(2, 1, "b")})}))};
+  const KdReportCollection filed = KdReportCopyAllChannels(registry_, 3);
+  const ChannelCollection* one = filed->drivers.get()->find("D <id 0x2a>");
+  ASSERT_NE(one, nullptr);
+  EXPECT_EQ(one->channels.get()->size(), 1U);
+  ChannelRecord* channel =
+      one->channelGroups.get()->find("G")->channelGroups.get()->find("S")->channels.get()->front().get();
+  EXPECT_EQ(KdReportChannelGetDriverID(channel), 0x2A);
+  EXPECT_EQ(KdReportChannelGetCategories(channel), 0x100);
+  EXPECT_EQ(KdReportChannelGetUnitLabel(channel), "events");
+
+  // Merging files the records themselves, and what is cached in one collection shows in the other.
+  const KdReportCollection flat = KdReportCreateAggregate(kKdReportFlat);
+  EXPECT_EQ(KdReportMergeChannels(flat.get(), filed.get()), 0U);
+  EXPECT_EQ(channelsIn(flat.get()), channelsIn(filed.get()));
+  std::optional<ReportError> error;
+  EXPECT_EQ(KdReportMergeChannels(flat.get(), flat.get(), &error), kKdReportWalkFailed);
+  EXPECT_EQ(error->reason, "bad argument");
+}
+
+TEST_F(Discovery, NamesDriversThatFailAndGoesOn) {
+  registry_.drivers = {driver(1, "Bad", PlistValue::int64(1)),
+                       driver(2, "Good", PlistValue::array({group(nullptr, nullptr, {entry(0x41, 1)})}))};
+  ::testing::internal::CaptureStderr();
+  const KdReportCollection all = KdReportCopyAllChannels(registry_, 0);
+  EXPECT_EQ(::testing::internal::GetCapturedStderr(), "Bad <id 0x1>: bad legend\n");
+  EXPECT_EQ(channelsIn(all.get()).size(), 1U);
+
+  std::optional<ReportError> error;
+  const PlistValue matching = registry_.KdServiceMatching("Driver");
+  EXPECT_EQ(KdReportCopyChannelsForDrivers(registry_, matching, 0, &error), nullptr);
+  EXPECT_EQ(error->code, kKdError);
+  EXPECT_EQ(KdReportCopyChannelsForDrivers(registry_, {}, 0, &error), nullptr);
+  EXPECT_EQ(error->reason, "no matching dict");
+
+  const KdReportCollection same = KdReportCopyChannelsWithID(registry_, matching, 0x41, &error);
+  EXPECT_EQ(channelsIn(same.get()).size(), 2U);
+  EXPECT_EQ(KdReportChannelGetFormat(channelsIn(same.get())[0]), 0);
+  registry_.drivers[1].identifier.reset();
+  EXPECT_EQ(KdReportCopyChannelsWithID(registry_, matching, 0x41, &error), nullptr);
+  EXPECT_EQ(error->reason, "error extracting driver info");
+
+  registry_.iteratorsAreValid = false;
+  EXPECT_EQ(KdReportCopyAllChannels(registry_, 0, &error), nullptr);
+  EXPECT_EQ(error->code, kKdAborted);
+  AbsentDriverRegistry absent;
+  EXPECT_EQ(KdReportCopyAllChannels(absent, 0, &error), nullptr);
+}
+
+TEST_F(Discovery, SelectsByCategoryFormatUnitAndGroup) {
+  registry_.drivers = {driver(1, "D",
+                              PlistValue::array({
+                                  group("G", "S", {entry(0x41, 0x1000001), entry(0x42, 0x2000002)}),
+                                  group("G", nullptr, {entry(0x43, 2)}),
+                                  group("H", "S", {entry(0x44, 0x1000001)}),
+                              }))};
+  const auto names = [](const KdReportCollection& channels) {
+    std::string all;
+    for (ChannelRecord* channel : channelsIn(channels.get()))
+      all += KdReportChannelGetChannelName(channel).value();
+    return all;
+  };
+  EXPECT_EQ(names(KdReportCopyChannelsInCategories(registry_, 0x100, 3)), "AD");
+  EXPECT_EQ(names(KdReportCopyChannelsInCategories(registry_, 0, 0)), "");
+  EXPECT_EQ(names(KdReportCopyChannelsOfFormat(registry_, 0x102, 0)), "BC");
+  EXPECT_EQ(names(KdReportCopyChannelsWithUnit(registry_, 0x64'00000000000000, 0)), "ABCD");
+  EXPECT_EQ(names(KdReportCopyChannelsWithUnit(registry_, kKdReportInvalid, 0)), "");
+  EXPECT_EQ(names(KdReportCopyChannelsInGroup(registry_, "G", {}, 3)), "CAB");
+  EXPECT_EQ(names(KdReportCopyChannelsInGroup(registry_, {}, "S", 0)), "ABD");
+  EXPECT_EQ(names(KdReportCopyChannelsInGroup(registry_, "G", "S", 0)), "AB");
+  std::optional<ReportError> error;
+  EXPECT_EQ(KdReportCopyChannelsInGroup(registry_, {}, {}, 0, &error), nullptr);
+  EXPECT_EQ(error->reason, "no group or subgroup!");
+  EXPECT_EQ(KdReportSelectChannelsInGroup(nullptr, "G", {}, &error), 1U);
+  EXPECT_EQ(error->reason, "channel pruning failed");
+}
+
+TEST(ChannelRecords, AnswerForWhatIsMissing) {
+  ChannelRecord empty;
+  for (ChannelRecord* channel : {&empty, static_cast<ChannelRecord*>(nullptr)}) {
+    EXPECT_EQ(KdReportChannelGetDriverID(channel), kKdReportInvalid);
+    EXPECT_EQ(KdReportChannelGetChannelID(channel), kKdReportInvalid);
+    EXPECT_EQ(KdReportChannelGetFormat(channel), 0);
+    EXPECT_EQ(KdReportChannelGetCategories(channel), 0xFFFF);
+    EXPECT_EQ(KdReportChannelGetUnit(channel), kKdReportInvalid);
+    EXPECT_EQ(KdReportChannelGetGroup(channel), std::nullopt);
+    EXPECT_EQ(KdReportChannelGetChannelName(channel), std::nullopt);
+    EXPECT_EQ(KdReportChannelGetUnitLabel(channel), std::nullopt);
+    EXPECT_EQ(setChannelType(channel, channelType(1)), kKdError);
+  }
+  const KdReportCollection byDriver = KdReportCreateAggregate(kKdReportFileByDriver);
+  std::optional<ReportError> error;
+  EXPECT_EQ(_addChannel(byDriver.get(), std::make_shared<ChannelRecord>(), 1, &error), kKdError);
+  EXPECT_EQ(error->reason, "_addChannel() failed");
+  EXPECT_EQ(KdReportAddChannelDescription(byDriver.get(), {.channelID = kKdReportInvalid}, &error), kKdError);
+  EXPECT_EQ(KdReportAddChannelDescription(
+                byDriver.get(),
+                {.driverID = 7, .driverName = "D", .channelID = 8, .channelType = channelType(4, 3)}),
+            kKdSuccess);
+  EXPECT_EQ(KdReportChannelGetFormat(channelsIn(byDriver.get())[0]), 4);
+}
+
+}  // namespace
+}  // namespace tbdaily

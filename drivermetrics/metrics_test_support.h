@@ -1,0 +1,68 @@
+// Channels, collections and element buffers for the tests of the library.
+#pragma once
+
+#include "drivermetrics/channel_collection.h"
+#include "drivermetrics/raw_elements.h"
+#include "testing/fake_drivers.h"
+
+namespace tbdaily::testing {
+
+inline ChannelType channelType(unsigned format, unsigned elements = 1, unsigned categories = 0) {
+  return {std::uint64_t{format} | std::uint64_t{categories} << 16 | std::uint64_t{elements} << 32};
+}
+
+// A record as discovery makes it, of the driver "D<driver>".
+inline KdReportChannel channelOf(std::int64_t driver, std::int64_t identifier,
+                                 ChannelType type = channelType(1)) {
+  return makeChannelRecord(PlistValue::int64(driver), PlistValue::string("D" + std::to_string(driver)),
+                           PlistValue::array({PlistValue::int64(identifier),
+                                              PlistValue::int64(static_cast<std::int64_t>(type.bits))}),
+                           nullptr);
+}
+
+inline KdReportCollection collectionOf(const std::vector<KdReportChannel>& channels,
+                                       std::uint32_t options = kKdReportFlat) {
+  KdReportCollection collection = KdReportCreateAggregate(options);
+  for (const KdReportChannel& channel : channels) _addChannel(collection.get(), channel, options);
+  return collection;
+}
+
+inline std::vector<ChannelRecord*> channelsIn(const ChannelCollection* collection) {
+  std::vector<ChannelRecord*> channels;
+  KdReportIterate(collection, [&channels](ChannelRecord& channel) -> std::uint32_t {
+    channels.push_back(&channel);
+    return kKdReportKeep;
+  });
+  return channels;
+}
+
+struct Element {
+  std::uint64_t stamp = 0;
+  std::vector<std::int64_t> words;
+};
+
+inline void append64(PlistData& bytes, std::uint64_t value) {
+  for (unsigned shift = 0; shift < 64; shift += 8)
+    bytes.push_back(static_cast<std::byte>(value >> shift & 0xFF));
+}
+
+inline void appendElement(PlistData& bytes, std::int64_t driver, std::int64_t identifier, ChannelType type,
+                          const Element& element = {}) {
+  for (const std::uint64_t field :
+       {static_cast<std::uint64_t>(driver), static_cast<std::uint64_t>(identifier), type.bits, element.stamp})
+    append64(bytes, field);
+  for (std::size_t i = 0; i < kElementWords; ++i)
+    append64(bytes, i < element.words.size() ? static_cast<std::uint64_t>(element.words[i]) : 0);
+}
+
+// A channel with elements in it, as a sample holds it.
+inline KdReportChannel sampled(ChannelType type, const std::vector<Element>& elements,
+                               PlistDictionary info = {}) {
+  KdReportChannel channel = channelOf(1, 0x4348, type);
+  channel->channelInfo = PlistValue::dictionary(std::move(info));
+  channel->rawElements = std::make_shared<PlistData>();
+  for (const Element& element : elements) appendElement(*channel->rawElements, 1, 0x4348, type, element);
+  return channel;
+}
+
+}  // namespace tbdaily::testing

@@ -1,0 +1,135 @@
+#include <gmock/gmock.h>
+#include <unistd.h>
+
+#include <array>
+#include <cmath>
+
+#include "drivermetrics/metrics_test_support.h"
+#include "drivermetrics/units.h"
+
+namespace tbdaily {
+namespace {
+
+using testing::channelType, testing::sampled;
+
+constexpr std::int64_t kNanoseconds = 0x0100007600000000, kTicks = 0x0101000000000000;
+
+TEST(Units, HaveLabels) {
+  const std::vector<std::pair<std::uint64_t, const char*>> labels = {
+      {0x0100000000000000, "s"},
+      {0x0100007600000000, "ns"},
+      {0x09008C0000000004, "4KiB"},
+      {0x0900820000000000, "B"},
+      {0x0900000000000000, "b"},
+      {0x0900890000000000, "Ki"},
+      {0, ""},
+      {0x6400000000000000, "events"},
+      {0x3700000000000000, "??"},
+      {0x6500008200000000, "kpackets"},
+      {0x0100007980000018, "24Mticks"},
+      {0x0900007600000001, "1Gticks"},
+      {0x0101000000000000, "hwticks?"},
+      {0x0902000000000000, "hwpage?"},
+      {0x0103000000000000, "s"},
+  };
+  for (const auto& [unit, label] : labels) EXPECT_EQ(copyUnitLabel(static_cast<std::int64_t>(unit)), label);
+  EXPECT_EQ(copyUnitLabel(kKdReportInvalid), std::nullopt);
+}
+
+TEST(Units, HaveExactFactors) {
+  struct Row {
+    std::uint64_t scale, numerator, denominator;
+  };
+  const std::vector<Row> rows = {
+      {0, 1, 1},
+      {0x7980000018, 1, 24000000},
+      {0x8C0000000004, 32768, 1},
+      {5, 5, 1},
+      {0x80000000, 1, 1},
+      {0x7F7F00000000, 1, 1},
+      {0x828200000003, 3 * 8 * 1000, 1},
+      {0x9200000000, 10000000000000000000U, 1},
+      {0x0100000000, 1, 0},    // 10^126 in 64 bits
+      {0xFFFF00000000, 1, 0},  // an exponent of 128 is one of -128
+      {0xBF0000000000, 0, 1},  // shifted out
+  };
+  for (const Row& row : rows) {
+    std::uint64_t numerator = 9, denominator = 9;
+    EXPECT_EQ(getFactorsFromScale(row.scale, numerator, denominator), kKdSuccess);
+    EXPECT_EQ(std::pair(numerator, denominator), std::pair(row.numerator, row.denominator))
+        << std::hex << row.scale;
+  }
+  EXPECT_DOUBLE_EQ(KdReportScaleValue(1500, kNanoseconds, kSecondsUnit), 1.5e-6);
+  EXPECT_EQ(KdReportScaleValue(~std::uint64_t{0}, kSecondsUnit, kSecondsUnit), 18446744073709551616.0);
+  EXPECT_TRUE(std::isnan(KdReportScaleValue(1, kSecondsUnit, 0x0900000000000000)));
+  EXPECT_TRUE(std::isnan(KdReportScaleValue(1, kTicks, kSecondsUnit)));
+}
+
+PlistDictionary unit(std::int64_t code) {
+  return *KdReportCreateUnitInfo(code).asDictionary();
+}
+
+TEST(Descriptions, OfChannels) {
+  const auto channel = sampled(channelType(1, 1, 0x100), {}, unit(kNanoseconds));
+  EXPECT_EQ(KdReportChannelCopyDescription(channel.get(), 0, "> "),
+            "> D1 CH < 0x4348 (ns) | G/g (none)/(none) | cat 0x100 | format 0x01 | elts 1 >\n");
+  const auto bare = testing::channelOf(1, 0xFF, channelType(0, 0));
+  bare->groupName = PlistValue::string("G");
+  EXPECT_EQ(KdReportChannelCopyDescription(bare.get(), 0, {}),
+            "D1 (null) < 0xff ((null)) | G/g G/(none) | cat 0000 | format 0000 | elts 0 >\n");
+  EXPECT_EQ(KdReportChannelCopyDescription(nullptr, 0, {}), std::nullopt);
+}
+
+TEST(Descriptions, OfSamples) {
+  const auto describe = [](const KdReportChannel& channel) {
+    return KdReportSampleCopyDescription(channel.get(), 0, ">").value_or("none");
+  };
+  EXPECT_EQ(describe(sampled(channelType(1), {{1, {-5}}}, unit(0))),
+            ">                              CH = {           -5  }\n");
+  EXPECT_EQ(describe(sampled(channelType(2, 2), {{1, {0x4F4E, 7, 1500}}, {2, {0x4F4646, 8, 4500}}},
+                             unit(kNanoseconds))),
+            ">                  CH[      ON] = { # 7        1.500e-06 s / 25.0% }\n"
+            ">                  CH[     OFF] = { # 8        4.500e-06 s / 75.0% }\n");
+  EXPECT_EQ(describe(sampled(channelType(2, 1), {{1, {1, 0, 0}}}, unit(kTicks))),
+            ">                  CH[     0x1] = { # 0              nan s /  nan% }\n");
+  PlistDictionary info = unit(kNanoseconds);
+  info.set("KdReportChannelConfig", PlistValue::data([] {
+             PlistData config;
+             testing::append64(config, 10);
+             testing::append64(config, std::uint64_t{2} << 32);
+             return config;
+           }()));
+  EXPECT_EQ(describe(sampled(channelType(3, 2), {{1, {2, 3, 9, 12}}, {1, {0, 0, 0, 0}}}, info)),
+            ">                  CH[           0 -           10 ns] = { m            3; M            9; s     "
+            "      12; # "
+            "           2 }\n"
+            ">                  CH[          10 -           20 ns] = { <no hits>; # 0 }\n");
+  EXPECT_EQ(describe(sampled(channelType(3, 2), {{1, {kKdReportInvalid}}, {}}, info)), "none");
+  EXPECT_EQ(describe(sampled(channelType(3, 3), {{}, {}, {}}, info)), "none") << "a bucket without bounds";
+  EXPECT_EQ(describe(sampled(channelType(4, 2), {{}, {}})), "arrays unsupported?arrays unsupported?");
+  EXPECT_EQ(describe(sampled(channelType(5), {{}})), "none");
+  EXPECT_EQ(describe(testing::channelOf(1, 2)), "none");
+
+  const auto nameless = sampled(channelType(1), {});
+  (*nameless->legendChannel)[0] = PlistValue::int64(0x123456789A);
+  testing::appendElement(*nameless->rawElements, 1, 0x123456789A, channelType(1));
+  EXPECT_EQ(describe(nameless), ">                       0x1234567 = {            0 (null) }\n");
+}
+
+TEST(Texts, AreWrittenInOneCall) {
+  std::array<int, 2> ends{};
+  ASSERT_EQ(::pipe(ends.data()), 0);
+  EXPECT_EQ(KdReportWriteStringUTF8(ends[1], "gr\xC3\xBC\xC3\x9F"), kKdSuccess);
+  EXPECT_EQ(KdReportWriteStringUTF8(ends[1], {}), kKdBadArgument);
+  EXPECT_EQ(KdReportWriteStringUTF8(ends[1], "\xFF"), kKdNoMemory);
+  EXPECT_EQ(KdReportWriteStringUTF8(-1, "x"), kKdIOError);
+  std::array<char, 16> read{};
+  EXPECT_EQ(std::string(read.data(), static_cast<std::size_t>(::read(ends[0], read.data(), read.size()))),
+            "gr\xC3\xBC\xC3\x9F");
+  ::close(ends[0]);
+  ::close(ends[1]);
+  EXPECT_EQ(KdReportCopyCurrentProcessName(), "drivermetrics_test <pid " + std::to_string(::getpid()) + ">");
+}
+
+}  // namespace
+}  // namespace tbdaily
