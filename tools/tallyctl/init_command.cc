@@ -14,6 +14,7 @@
 #include "report/tb_config.h"
 #include "tools/tallyctl/sample_controller.h"
 #include "tools/tallyctl/sample_history.h"
+#include "tools/tallyctl/sample_metrics.h"
 #include "tools/tallyctl/sample_whitelist.h"
 #include "tools/tallyctl/tool.h"
 
@@ -100,6 +101,15 @@ PlistDictionary sampleTasking() {
                                                 item("Network", PlistValue::boolean(true))})}};
 }
 
+// The storage controller's entries, then those of the drivers that publish metrics.
+PlistDictionary sampleDrivers(const Profile& profile) {
+  PlistDictionary registry = sampleRegistry(profile.name);
+  PlistArray entries = *registry.get("entries").asArray();
+  for (PlistValue& entry : sampleMetricsEntries()) entries.push_back(std::move(entry));
+  registry.set("entries", PlistValue::array(std::move(entries)));
+  return registry;
+}
+
 // A property list that the sample device begins with.
 struct SampleFile {
   std::string path;  // as the device sees it
@@ -115,7 +125,8 @@ std::vector<SampleFile> sampleFiles(const Profile& profile, DayNumber today) {
           {"/System/Device/kernel.plist", sampleKernel()},
           {"/System/Device/locale.plist", sampleLocale()},
           {"/System/Device/apps.plist", sampleBundles()},
-          {"/System/Device/registry.plist", sampleRegistry(profile.name)},
+          {"/System/Device/registry.plist", sampleDrivers(profile)},
+          {"/System/Device/hub.plist", sampleHub()},
           {"/System/Device/usage.plist", {{"records", PlistValue::array(sampleUsageRecords(today))}}},
           {preferences(preference_domain::kLogSubmission),
            {{"DiagnosticLogSubmissionEnabled", PlistValue::boolean(true)},

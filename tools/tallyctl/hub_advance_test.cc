@@ -1,0 +1,156 @@
+// The sample hub and made-up ones, moved on.
+#include "tools/tallyctl/hub_advance.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+
+#include "tools/tallyctl/hub_legends.h"
+#include "tools/tallyctl/sample_metrics.h"
+
+namespace tbdaily {
+namespace {
+
+constexpr std::uint64_t kYear = 31'536'000;
+
+using Words = std::vector<std::int64_t>;
+struct Row {
+  std::int64_t stamp;
+  Words words;
+};
+struct Channel {
+  std::int64_t driver, id, format;
+  std::vector<Row> rows;
+};
+
+std::vector<Channel> channelsOf(const PlistValue& root) {
+  std::vector<Channel> channels;
+  const auto number = [](const PlistDictionary& from, const char* key) { return *from.get(key).asInteger(); };
+  const PlistValue list = root.asDictionary()->get("channels");
+  for (const PlistValue& value : *list.asArray()) {
+    const PlistDictionary& channel = *value.asDictionary();
+    channels.push_back(
+        {number(channel, "driver"), number(channel, "channel"), number(channel, "type") & 0xFF, {}});
+    const PlistValue elements = channel.get("elements");
+    for (const PlistValue& element : *elements.asArray()) {
+      Row row{number(*element.asDictionary(), "stamp"), {}};
+      const PlistValue words = element.asDictionary()->get("words");
+      for (const PlistValue& word : *words.asArray()) row.words.push_back(*word.asInteger());
+      row.words.resize(4);
+      channels.back().rows.push_back(row);
+    }
+  }
+  return channels;
+}
+
+std::int64_t total(const Channel& channel, std::size_t word) {
+  std::uint64_t sum = 0;
+  for (const Row& row : channel.rows) sum += static_cast<std::uint64_t>(row.words[word]);
+  return static_cast<std::int64_t>(sum);
+}
+
+std::int64_t latest(const Channel& channel) {
+  return std::ranges::max_element(channel.rows, {}, &Row::stamp)->stamp;
+}
+
+void expectValidBuckets(const Channel& channel, const ChannelMeaning& meaning) {
+  std::int64_t lower = 0;
+  const auto bounds = meaning.bucketBounds(channel.rows.size());
+  ASSERT_EQ(bounds.size(), channel.rows.size());
+  for (std::size_t i = 0; i < bounds.size(); lower = bounds[i++]) {
+    const Words& words = channel.rows[i].words;
+    if (words[0] == 0) continue;
+    EXPECT_TRUE(lower <= words[1] && words[1] <= words[2] && words[2] < bounds[i]);
+    EXPECT_TRUE(words[0] * words[1] <= words[3] && words[3] <= words[0] * words[2]);
+  }
+}
+
+PlistValue sampleRegistryRoot() {
+  return PlistValue::dictionary({{"entries", PlistValue::array(sampleMetricsEntries())}});
+}
+
+TEST(HubAdvance, MovesEveryChannelOfTheSample) {
+  const PlistValue hub = PlistValue::dictionary(sampleHub()), registry = sampleRegistryRoot();
+  const HubLegends legends(registry);
+  for (const std::uint64_t seconds : {std::uint64_t{1}, std::uint64_t{3}, std::uint64_t{3'601}, kYear}) {
+    const AdvancedHub later = advancedHub(hub, registry, seconds);
+    EXPECT_EQ(later.root, advancedHub(hub, registry, seconds).root);
+    const std::vector<Channel> before = channelsOf(hub), after = channelsOf(later.root);
+    ASSERT_EQ(later.channels, before.size());
+    for (std::size_t i = 0; i < before.size(); ++i) {
+      SCOPED_TRACE("channel " + std::to_string(before[i].id) + " after " + std::to_string(seconds));
+      const ChannelMeaning meaning = legends.meaningOf(before[i].driver, before[i].id);
+      EXPECT_GT(latest(after[i]), latest(before[i]));
+      const std::int64_t grown = total(after[i], 2) - total(before[i], 2);
+      if (before[i].format == 2) {
+        EXPECT_EQ(grown, static_cast<std::int64_t>(meaning.unitsIn(seconds).value_or(seconds)));
+        EXPECT_GE(total(after[i], 1), total(before[i], 1) + (seconds > 3'600 ? 1 : 0));
+      } else if (before[i].format == 3) {
+        EXPECT_GE(total(after[i], 0), total(before[i], 0) + static_cast<std::int64_t>(seconds));
+        expectValidBuckets(before[i], meaning);
+        expectValidBuckets(after[i], meaning);
+      } else {
+        EXPECT_NE(total(after[i], 0), total(before[i], 0));
+        const bool isMeasured = meaning.quantity() > 2 && meaning.quantity() < 11 && meaning.quantity() != 9;
+        EXPECT_TRUE(isMeasured || total(after[i], 0) > total(before[i], 0));
+      }
+    }
+  }
+}
+
+TEST(HubAdvance, MeasuresStayNearTheirValue) {
+  const PlistValue registry = sampleRegistryRoot();
+  PlistValue hub = PlistValue::dictionary(sampleHub());
+  for (int step = 0; step < 200; ++step) hub = advancedHub(hub, registry, 3'600).root;
+  for (const Channel& channel : channelsOf(hub)) {
+    if (channel.id != 0x14) continue;
+    EXPECT_NEAR(static_cast<double>(channel.rows[0].words[0]), 120, 4);  // the refresh rate
+  }
+}
+
+PlistValue hubOf(PlistValue type, PlistArray elements) {
+  return PlistValue::dictionary(
+      {{"channels",
+        PlistValue::array({PlistValue::dictionary({{"driver", PlistValue::int64(1)},
+                                                   {"channel", PlistValue::int64(2)},
+                                                   {"type", std::move(type)},
+                                                   {"elements", PlistValue::array(elements)}})})}});
+}
+PlistValue element(std::int64_t stamp, const Words& words) {
+  PlistArray array;
+  for (const std::int64_t word : words) array.push_back(PlistValue::int64(word));
+  return PlistValue::dictionary({{"stamp", PlistValue::int64(stamp)}, {"words", PlistValue::array(array)}});
+}
+
+TEST(HubAdvance, LeavesWhatItCannotMove) {
+  const auto type = [](std::int64_t format) { return PlistValue::int64(format); };
+  const PlistValue bad = PlistValue::dictionary({{"stamp", PlistValue::string("1")}});
+  const PlistValue real =
+      PlistValue::dictionary({{"stamp", type(1)}, {"words", PlistValue::array({PlistValue::float64(1)})}});
+  for (const PlistValue& hub :
+       {PlistValue(), PlistValue::dictionary({}), PlistValue::dictionary({{"channels", type(1)}}),
+        PlistValue::dictionary({{"channels", PlistValue::array({type(1)})}}), hubOf(type(1), {}),
+        hubOf(type(1), {type(1)}), hubOf(type(1), {bad}), hubOf(type(4), {element(1, {1}), real}),
+        hubOf(type(1), {element(1, {1, 2, 3, 4, 5})}), hubOf(type(0), {element(1, {1})}),
+        hubOf(type(3), {element(1, {1})}), hubOf(PlistValue::string("1"), {element(1, {1})})}) {
+    const AdvancedHub later = advancedHub(hub, PlistValue(), 5);
+    EXPECT_EQ(later.root, hub);
+    EXPECT_EQ(later.channels, 0U);
+  }
+  const Channel state = channelsOf(
+      advancedHub(hubOf(type(2), {element(-1, {}), element(INT64_MAX, {1, INT64_MAX, INT64_MAX, -1})}),
+                  PlistValue(), kYear)
+          .root)[0];
+  EXPECT_EQ(total(state, 2), INT64_MIN + static_cast<std::int64_t>(kYear) - 1);
+  EXPECT_EQ(state.rows[1].words[3], -1);
+  const Words kept =
+      channelsOf(
+          advancedHub(hubOf(type(4), {element(1, {INT64_MIN, INT64_MAX})}), PlistValue(), kYear).root)[0]
+          .rows[0]
+          .words;
+  EXPECT_EQ(kept[0], INT64_MIN);
+  EXPECT_NE(kept[1], INT64_MAX);
+}
+
+}  // namespace
+}  // namespace tbdaily
