@@ -4,6 +4,7 @@
 #include <string>
 
 #include "driver/data_usage.h"
+#include "driver/driver_metrics.h"
 #include "platform/analytics_client.h"
 #include "platform/byte_reader.h"
 #include "platform/device_answers.h"
@@ -110,6 +111,7 @@ void CollectDailyDeviceMetrics(Platform& platform) {
   CollectNANDInfo(platform);
   CollectECCEvents(platform);
   CollectDataUsage(platform);
+  CollectDriverMetricScalars(platform);
 }
 
 }  // namespace tbdaily

@@ -5,6 +5,7 @@
 #include "drivermetrics/metrics_test_support.h"
 #include "drivermetrics/subscription.h"
 #include "platform/byte_reader.h"
+#include "testing/scripted_hub.h"
 
 namespace tbdaily {
 namespace {
@@ -12,32 +13,9 @@ namespace {
 using testing::channelOf, testing::channelsIn, testing::channelType, testing::collectionOf;
 using ::testing::ElementsAre;
 
-constexpr std::uint64_t kBufferIdentifier = 0x9'00000007;
-
-// A hub whose steps can fail, over a buffer of the test's.
-class Hub {
+class DeviceWithHub {
  public:
-  Hub() {
-    registry.drivers = {
-        {.identifier = 1, .name = "Hub", .serviceClass = "KdReportHub", .properties = {}, .parent = {}}};
-    registry.scalarMethod = [this](auto&, std::uint32_t method, auto, auto, auto&) {
-      return method == 0 ? userClientOpenStatus : kKdBadArgument;
-    };
-    registry.method = [this](auto&, std::uint32_t method, const KdMethodInput& input,
-                             KdMethodOutput& output) {
-      if (method == 3)
-        return !input.scalars.empty() && input.scalars[0] == kBufferIdentifier ? updateStatus : kKdError;
-      interestList.assign(input.structure.begin(), input.structure.end());
-      output.scalars[0] = kBufferIdentifier;
-      output.scalarCount = scalars;
-      return configureStatus;
-    };
-    registry.mapMemory = [this](auto&, std::uint32_t type, std::span<std::byte>& memory) {
-      memory = buffer;
-      return type == 7 ? mapStatus : kKdBadArgument;
-    };
-  }
-  ~Hub() { expectNothingHeld(); }
+  ~DeviceWithHub() { expectNothingHeld(); }
   void expectNothingHeld() const {
     EXPECT_EQ(registry.openHandles(), 0U);
     EXPECT_EQ(registry.mappings, 0);
@@ -55,29 +33,27 @@ class Hub {
   }
 
   testing::FakeDriverRegistry registry;
-  KdStatus userClientOpenStatus = 0, configureStatus = 0, mapStatus = 0, updateStatus = 0;
-  std::size_t scalars = 1;
-  PlistData interestList, buffer;
+  testing::ScriptedHub hub{registry};
 };
 
 TEST(Subscription, TellsTheHubWhatIsWantedAndSamplesItsBuffer) {
-  Hub hub;
+  DeviceWithHub device;
   const ChannelType type = channelType(1, 1, 0x100);
-  testing::appendElement(hub.buffer, 5, 6, type, {.stamp = 1, .words = {100}});
+  testing::appendElement(device.hub.buffer, 5, 6, type, {.stamp = 1, .words = {100}});
   const KdReportCollection channels = collectionOf({channelOf(5, 6, type), channelOf(5, 7, ChannelType{})});
   KdReportCollection subscribed;
   {
     const auto subscription =
-        KdReportCreateSubscription(hub.registry, nullptr, channels.get(), &subscribed, 0);
+        KdReportCreateSubscription(device.registry, nullptr, channels.get(), &subscribed, 0);
     ASSERT_NE(subscription, nullptr);
     PlistData expected;
     for (const std::uint64_t word : {std::uint64_t{2}, std::uint64_t{5}, std::uint64_t{6}, type.bits,
                                      std::uint64_t{5}, std::uint64_t{7}, std::uint64_t{0}})
       testing::append64(expected, word);
-    EXPECT_EQ(hub.interestList, expected);
+    EXPECT_EQ(device.hub.interestList, expected);
 
     const KdReportCollection before = KdReportCreateSamples(subscription.get(), subscribed.get());
-    hub.buffer[32] = std::byte{250};
+    device.hub.buffer[32] = std::byte{250};
     const KdReportCollection after = KdReportCreateSamples(subscription.get(), subscribed.get());
     const KdReportCollection delta = KdReportCreateSamplesDelta(before.get(), after.get());
     EXPECT_EQ(KdReportSimpleGetIntegerValue(channelsIn(before.get())[0]), 100);
@@ -85,46 +61,46 @@ TEST(Subscription, TellsTheHubWhatIsWantedAndSamplesItsBuffer) {
     EXPECT_EQ(channelsIn(delta.get()).size(), 1U) << "a channel that the buffer lacks is left out";
 
     std::optional<ReportError> error;
-    hub.updateStatus = 77;
+    device.hub.updateStatus = 77;
     EXPECT_EQ(KdReportCreateSamples(subscription.get(), subscribed.get(), &error), nullptr);
     EXPECT_EQ(error->code, 77);
     EXPECT_EQ(KdReportCreateSamples(nullptr, subscribed.get(), &error), nullptr);
     EXPECT_EQ(error->code, kKdBadArgument);
-    EXPECT_EQ(hub.registry.mappings, 1);
+    EXPECT_EQ(device.registry.mappings, 1);
   }
-  hub.expectNothingHeld();
+  device.expectNothingHeld();
 }
 
 TEST(Subscription, LeavesNothingBehindWhenAStepFails) {
   const std::string noReason = "createPVErr() passed a NULL string! ";
   const auto code = [](KdStatus status) { return std::to_string(status); };
   const KdReportCollection good = collectionOf({channelOf(5, 6)});
-  Hub hub;
-  EXPECT_EQ(hub.failure(nullptr), "bad arguments " + code(kKdBadArgument));
-  EXPECT_EQ(hub.failure(KdReportCreateAggregate(0)), "no channels " + code(kKdBadArgument));
+  DeviceWithHub device;
+  EXPECT_EQ(device.failure(nullptr), "bad arguments " + code(kKdBadArgument));
+  EXPECT_EQ(device.failure(KdReportCreateAggregate(0)), "no channels " + code(kKdBadArgument));
   const KdReportCollection odd = KdReportCreateAggregateFromPropertyList(
       PlistValue::dictionary({{"KdReportChannels", PlistValue::array({PlistValue::int64(1)})}}));
-  EXPECT_EQ(hub.failure(odd), "iteration error " + code(kKdBadArgument));
-  EXPECT_EQ(hub.failure(collectionOf({std::make_shared<ChannelRecord>()})),
+  EXPECT_EQ(device.failure(odd), "iteration error " + code(kKdBadArgument));
+  EXPECT_EQ(device.failure(collectionOf({std::make_shared<ChannelRecord>()})),
             "createInterestList() failed " + code(kKdNoMemory));
-  EXPECT_EQ(hub.failure(good, std::pmr::null_memory_resource()), noReason + code(kKdNoMemory));
+  EXPECT_EQ(device.failure(good, std::pmr::null_memory_resource()), noReason + code(kKdNoMemory));
   const std::vector<std::tuple<KdStatus&, KdStatus, std::string>> steps = {
-      {hub.registry.openStatus, kKdError, "Could not open KdReportHub"},
-      {hub.userClientOpenStatus, 12, "kKdReportUserClientOpen failed"},
-      {hub.configureStatus, -3, "kKdReportUserClientConfigureInterests failed"},
-      {hub.mapStatus, 5, "KdConnectMapMemory() failed"},
+      {device.registry.openStatus, kKdError, "Could not open KdReportHub"},
+      {device.hub.userClientOpenStatus, 12, "kKdReportUserClientOpen failed"},
+      {device.hub.configureStatus, -3, "kKdReportUserClientConfigureInterests failed"},
+      {device.hub.mapStatus, 5, "KdConnectMapMemory() failed"},
   };
   for (const auto& [status, failing, reason] : steps) {
     status = failing;
-    EXPECT_EQ(hub.failure(good), reason + " " + code(failing));
+    EXPECT_EQ(device.failure(good), reason + " " + code(failing));
     status = kKdSuccess;
   }
-  hub.scalars = 0;
-  EXPECT_EQ(hub.failure(good), "kKdReportUserClientConfigureInterests failed " + code(kKdError));
-  hub.registry.drivers[0].serviceClass = "Other";
-  EXPECT_EQ(hub.failure(good), noReason + code(kKdNotFound));
-  hub.registry.drivers.clear();
-  EXPECT_EQ(hub.failure(good), noReason + code(kKdNoMemory));
+  device.hub.scalars = 0;
+  EXPECT_EQ(device.failure(good), "kKdReportUserClientConfigureInterests failed " + code(kKdError));
+  device.registry.drivers[0].serviceClass = "Other";
+  EXPECT_EQ(device.failure(good), noReason + code(kKdNotFound));
+  device.registry.drivers.clear();
+  EXPECT_EQ(device.failure(good), noReason + code(kKdNoMemory));
 
   EXPECT_EQ(interestListSize(89478477), 2147483456U);
   EXPECT_EQ(interestListSize(89478478), std::nullopt);

@@ -1,0 +1,45 @@
+#include "driver/driver_metrics.h"
+
+#include <string>
+
+#include "drivermetrics/kd_report.h"
+#include "platform/analytics_client.h"
+
+namespace tbdaily {
+
+namespace {
+
+constexpr std::int32_t kDailyCategory = 0x100;
+constexpr std::string_view kKeyPrefix = "com.velmora.kdreport.";
+
+std::uint32_t KeepSimpleChannel(ChannelRecord& channel) {
+  return KdReportChannelGetFormat(&channel) == kKdReportSimple ? kKdReportKeep : kKdReportRemove;
+}
+
+std::uint32_t SetDriverMetricScalar(AnalyticsClient& client, ChannelRecord& channel) {
+  const auto name = KdReportChannelGetChannelName(&channel);
+  if (KdReportChannelGetFormat(&channel) != kKdReportSimple || !name) return kKdReportKeep;
+  std::string key(kKeyPrefix);
+  client.setValueForScalarKey(key.append(*name), KdReportSimpleGetIntegerValue(&channel));
+  return kKdReportKeep;
+}
+
+}  // namespace
+
+void CollectDriverMetricScalars(Platform& platform) {
+  DriverRegistry& registry = platform.driverRegistry;
+  const KdReportCollection channels =
+      KdReportCopyChannelsInCategories(registry, kDailyCategory, kKdReportFileByDriver);
+  if (channels == nullptr) return;
+  KdReportPrune(channels.get(), KeepSimpleChannel);
+
+  KdReportCollection subscribed;
+  const auto subscription = KdReportCreateSubscription(registry, nullptr, channels.get(), &subscribed, 0);
+  if (subscription == nullptr) return;
+  const KdReportCollection samples = KdReportCreateSamples(subscription.get(), subscribed.get());
+  KdReportIterate(samples.get(), [&platform](ChannelRecord& channel) {
+    return SetDriverMetricScalar(platform.analyticsClient, channel);
+  });
+}
+
+}  // namespace tbdaily
