@@ -1,8 +1,28 @@
 #include <gmock/gmock.h>
 
+#include <cstdlib>
+#include <new>
 #include <random>
 
 #include "drivermetrics/metrics_test_support.h"
+
+namespace {
+std::size_t allocations = 0;
+}
+
+// Counts what this program takes from the heap.
+[[gnu::noinline]] void* operator new(std::size_t size) {
+  ++allocations;
+  void* memory = std::malloc(size);
+  if (memory == nullptr) throw std::bad_alloc();
+  return memory;
+}
+[[gnu::noinline]] void operator delete(void* memory) noexcept {
+  std::free(memory);
+}
+[[gnu::noinline]] void operator delete(void* memory, std::size_t) noexcept {
+  std::free(memory);
+}
 
 namespace tbdaily {
 namespace {
@@ -92,6 +112,16 @@ TEST(CollectionWalk, VisitsClonesAndPrunesLikeAList) {
     EXPECT_TRUE(filed->channels.isAbsent() && filed->drivers.isAbsent() && filed->channelGroups.isAbsent());
     EXPECT_EQ(_getAggregateOpts(filed.get()), 3U);
   }
+}
+
+TEST(CollectionWalk, TakesNothingFromTheHeapForAChannel) {
+  RandomChannels random;
+  const KdReportCollection filed = collectionOf(random.make(100), 3);
+  const KdReportVisitor keepAll = [](ChannelRecord&) -> std::uint32_t { return kKdReportKeep; };
+  const std::size_t before = allocations;
+  KdReportIterate(filed.get(), keepAll);
+  KdReportPrune(filed.get(), keepAll);
+  EXPECT_EQ(allocations, before);
 }
 
 TEST(CollectionWalk, PairsChannelsInTheirOrder) {

@@ -1,0 +1,107 @@
+// Driver metrics: the cost of a sampling, for each channel, beside a plain copy of the same bytes; walks;
+// comparing two samples.
+
+#include <benchmark/benchmark.h>
+
+#include <array>
+
+#include "drivermetrics/channel_collection.h"
+#include "drivermetrics/raw_elements.h"
+
+namespace tbdaily {
+namespace {
+
+constexpr std::int64_t kFirst = 1'000, kLast = 64'000;
+constexpr std::int64_t kChannelsOfADriver = 100;
+constexpr ChannelType kSimpleType{std::uint64_t{1} << 32 | kKdReportSimple};
+
+std::int64_t driverOf(std::int64_t channel) {
+  return 0x100000000 + channel / kChannelsOfADriver;
+}
+
+KdReportCollection channelsOf(std::int64_t count) {
+  KdReportCollection collection = KdReportCreateAggregate(kKdReportFileByDriver | kKdReportFileByGroup);
+  const PlistValue info = KdReportCreateUnitInfo(0);
+  for (std::int64_t i = 0; i < count; ++i) {
+    KdReportAddChannelDescription(collection.get(), {.driverID = driverOf(i),
+                                                     .driverName = "Driver " + std::to_string(driverOf(i)),
+                                                     .channelID = i,
+                                                     .channelType = kSimpleType,
+                                                     .channelName = "Channel " + std::to_string(i),
+                                                     .groupName = "Group",
+                                                     .channelInfo = info});
+  }
+  return collection;
+}
+
+PlistData bufferOf(std::int64_t count) {
+  PlistData bytes;
+  bytes.reserve(static_cast<std::size_t>(count) * kElementSize);
+  for (std::int64_t i = 0; i < count; ++i) {
+    for (const std::uint64_t word :
+         std::array<std::uint64_t, 8>{static_cast<std::uint64_t>(driverOf(i)), static_cast<std::uint64_t>(i),
+                                      kSimpleType.bits, 1, static_cast<std::uint64_t>(i), 0, 0, 0}) {
+      for (unsigned shift = 0; shift < 64; shift += 8) bytes.push_back(static_cast<std::byte>(word >> shift));
+    }
+  }
+  return bytes;
+}
+
+void countChannels(benchmark::State& state) {
+  state.counters["per channel"] =
+      benchmark::Counter(static_cast<double>(state.range(0)),
+                         benchmark::Counter::kIsIterationInvariantRate | benchmark::Counter::kInvert);
+}
+
+void BM_PlainCopyOfTheBuffer(benchmark::State& state) {
+  const PlistData buffer = bufferOf(state.range(0));
+  for (auto _ : state) {
+    PlistData copy(buffer);
+    benchmark::DoNotOptimize(copy.data());
+  }
+  countChannels(state);
+}
+BENCHMARK(BM_PlainCopyOfTheBuffer)->RangeMultiplier(4)->Range(kFirst, kLast);
+
+void BM_Sampling(benchmark::State& state) {
+  const KdReportCollection channels = channelsOf(state.range(0));
+  const PlistData buffer = bufferOf(state.range(0));
+  for (auto _ : state) benchmark::DoNotOptimize(KdReportCreateSamplesRaw(channels.get(), buffer));
+  countChannels(state);
+}
+BENCHMARK(BM_Sampling)->RangeMultiplier(4)->Range(kFirst, kLast);
+
+void BM_Delta(benchmark::State& state) {
+  const KdReportCollection channels = channelsOf(state.range(0));
+  const PlistData buffer = bufferOf(state.range(0));
+  const KdReportCollection before = KdReportCreateSamplesRaw(channels.get(), buffer);
+  const KdReportCollection after = KdReportCreateSamplesRaw(channels.get(), buffer);
+  for (auto _ : state) benchmark::DoNotOptimize(KdReportCreateSamplesDelta(before.get(), after.get()));
+  countChannels(state);
+}
+BENCHMARK(BM_Delta)->RangeMultiplier(4)->Range(kFirst, kLast);
+
+// A visit, and a pruning that removes nothing.
+template <std::uint32_t (*Walk)(ChannelCollection*, const KdReportVisitor&)>
+void BM_Walk(benchmark::State& state) {
+  const KdReportCollection channels = channelsOf(state.range(0));
+  std::int64_t sum = 0;
+  const KdReportVisitor visitor = [&sum](ChannelRecord& channel) -> std::uint32_t {
+    sum += KdReportChannelGetChannelID(&channel);
+    return kKdReportKeep;
+  };
+  for (auto _ : state) Walk(channels.get(), visitor);
+  benchmark::DoNotOptimize(sum);
+  countChannels(state);
+}
+std::uint32_t visit(ChannelCollection* collection, const KdReportVisitor& visitor) {
+  return KdReportIterate(collection, visitor);
+}
+std::uint32_t prune(ChannelCollection* collection, const KdReportVisitor& visitor) {
+  return KdReportPrune(collection, visitor);
+}
+BENCHMARK(BM_Walk<visit>)->Arg(kLast);
+BENCHMARK(BM_Walk<prune>)->Arg(kLast);
+
+}  // namespace
+}  // namespace tbdaily
