@@ -35,7 +35,7 @@ PlistValue channel(std::int64_t driver, std::int64_t id, std::int64_t type, Plis
                                  {"elements", PlistValue::array(std::move(elements))}});
 }
 
-std::vector<std::byte> interests(std::initializer_list<std::uint64_t> channels) {
+std::vector<std::byte> interests(const Numbers& channels) {
   std::vector<std::byte> list;
   const auto put = [&list](std::uint64_t value) {
     for (unsigned i = 0; i < 8; ++i) list.push_back(static_cast<std::byte>(value >> 8 * i & 0xFF));
@@ -49,6 +49,7 @@ std::vector<std::byte> interests(std::initializer_list<std::uint64_t> channels) 
 
 class HubTest : public ::testing::Test {
  protected:
+  HubTest() { record({channel(7, 1, 1, {element(1, {1})})}); }
   void record(PlistArray channels) {
     device.record(recording::kHub, "channels", PlistValue::array(std::move(channels)));
   }
@@ -79,7 +80,7 @@ class HubTest : public ::testing::Test {
     return registry.KdConnectMapMemory(connection, static_cast<std::uint32_t>(identifier), memory);
   }
   // Everything up to the mapping.
-  void subscribe(std::initializer_list<std::uint64_t> channels) {
+  void subscribe(const Numbers& channels) {
     open();
     ASSERT_EQ(start(), 0);
     ASSERT_EQ(configure(interests(channels)), 0);
@@ -147,7 +148,6 @@ TEST_F(HubTest, LaysOutInterestsInOrderAndUpdatesInPlace) {
 }
 
 TEST_F(HubTest, LeavesNothingBehind) {
-  record({channel(7, 1, 1, {element(1, {1})})});
   subscribe({1});
   const std::span<std::byte> first = memory;
   ASSERT_EQ(map(), 0);
@@ -169,7 +169,6 @@ TEST_F(HubTest, LeavesNothingBehind) {
 }
 
 TEST_F(HubTest, IsStrict) {
-  record({channel(7, 1, 1, {element(1, {1})})});
   open({{"kind", PlistValue::string("else")}});
   EXPECT_EQ(openStatus, kKdNotFound);
   open();
@@ -201,7 +200,6 @@ TEST_F(HubTest, IsStrict) {
 }
 
 TEST_F(HubTest, FailsAsRecorded) {
-  record({channel(7, 1, 1, {element(1, {1})})});
   constexpr std::int64_t kFailure = 0xE00002C5;
   // Of opening, method 0, configuring, mapping and updating, which one fails; what follows is refused.
   const char* keys[] = {"openStatus", "userClientOpenStatus", "configureStatus", "mapStatus", "updateStatus"};
@@ -217,12 +215,8 @@ TEST_F(HubTest, WithoutMemoryItStaysUnconfigured) {
   record({channel(7, 1, 1, PlistArray(4096, element(1, {1})))});
   open();
   EXPECT_EQ(start(), 0);
-  std::vector<std::byte> tooMany = interests({});
   const auto one = interests({1});
-  constexpr std::size_t kInterests = 4097;  // each of 256 KiB: one above a GiB
-  tooMany[0] = std::byte{kInterests & 0xFF};
-  tooMany[1] = std::byte{kInterests >> 8};
-  for (std::size_t i = 0; i < kInterests; ++i) tooMany.insert(tooMany.end(), one.begin() + 8, one.end());
+  const auto tooMany = interests(Numbers(4097, 1));  // each of 256 KiB: one above a GiB
   EXPECT_EQ(configure(tooMany), kKdNoMemory);
 
   rlimit before{};

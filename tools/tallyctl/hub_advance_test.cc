@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cstdlib>
 
 #include "tools/tallyctl/hub_legends.h"
 #include "tools/tallyctl/sample_metrics.h"
@@ -65,12 +66,10 @@ void expectValidBuckets(const Channel& channel, const ChannelMeaning& meaning) {
   }
 }
 
-PlistValue sampleRegistryRoot() {
-  return PlistValue::dictionary({{"entries", PlistValue::array(sampleMetricsEntries())}});
-}
-
 TEST(HubAdvance, MovesEveryChannelOfTheSample) {
-  const PlistValue hub = PlistValue::dictionary(sampleHub()), registry = sampleRegistryRoot();
+  const PlistValue hub = PlistValue::dictionary(sampleHub());
+  const PlistValue registry =
+      PlistValue::dictionary({{"entries", PlistValue::array(sampleMetricsEntries())}});
   const HubLegends legends(registry);
   for (const std::uint64_t seconds : {std::uint64_t{1}, std::uint64_t{3}, std::uint64_t{3'601}, kYear}) {
     const AdvancedHub later = advancedHub(hub, registry, seconds);
@@ -90,21 +89,12 @@ TEST(HubAdvance, MovesEveryChannelOfTheSample) {
         expectValidBuckets(before[i], meaning);
         expectValidBuckets(after[i], meaning);
       } else {
-        EXPECT_NE(total(after[i], 0), total(before[i], 0));
+        const std::int64_t moved = total(after[i], 0) - total(before[i], 0);
+        EXPECT_NE(moved, 0);
         const bool isMeasured = meaning.quantity() > 2 && meaning.quantity() < 11 && meaning.quantity() != 9;
-        EXPECT_TRUE(isMeasured || total(after[i], 0) > total(before[i], 0));
+        EXPECT_TRUE(isMeasured ? std::abs(moved) <= total(before[i], 0) / 4 : moved > 0);
       }
     }
-  }
-}
-
-TEST(HubAdvance, MeasuresStayNearTheirValue) {
-  const PlistValue registry = sampleRegistryRoot();
-  PlistValue hub = PlistValue::dictionary(sampleHub());
-  for (int step = 0; step < 200; ++step) hub = advancedHub(hub, registry, 3'600).root;
-  for (const Channel& channel : channelsOf(hub)) {
-    if (channel.id != 0x14) continue;
-    EXPECT_NEAR(static_cast<double>(channel.rows[0].words[0]), 120, 4);  // the refresh rate
   }
 }
 
@@ -137,17 +127,17 @@ TEST(HubAdvance, LeavesWhatItCannotMove) {
     EXPECT_EQ(later.root, hub);
     EXPECT_EQ(later.channels, 0U);
   }
-  const Channel state = channelsOf(
-      advancedHub(hubOf(type(2), {element(-1, {}), element(INT64_MAX, {1, INT64_MAX, INT64_MAX, -1})}),
-                  PlistValue(), kYear)
-          .root)[0];
+}
+
+TEST(HubAdvance, WrapsAndKeepsTheInvalidNumber) {
+  const auto advanced = [](std::int64_t format, PlistArray elements) {
+    const PlistValue hub = hubOf(PlistValue::int64(format), std::move(elements));
+    return channelsOf(advancedHub(hub, PlistValue(), kYear).root)[0];
+  };
+  const Channel state = advanced(2, {element(-1, {}), element(INT64_MAX, {1, INT64_MAX, INT64_MAX, -1})});
   EXPECT_EQ(total(state, 2), INT64_MIN + static_cast<std::int64_t>(kYear) - 1);
   EXPECT_EQ(state.rows[1].words[3], -1);
-  const Words kept =
-      channelsOf(
-          advancedHub(hubOf(type(4), {element(1, {INT64_MIN, INT64_MAX})}), PlistValue(), kYear).root)[0]
-          .rows[0]
-          .words;
+  const Words kept = advanced(4, {element(1, {INT64_MIN, INT64_MAX})}).rows[0].words;
   EXPECT_EQ(kept[0], INT64_MIN);
   EXPECT_NE(kept[1], INT64_MAX);
 }

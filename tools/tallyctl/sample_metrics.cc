@@ -150,7 +150,7 @@ constexpr SampleChannel kChannels[] = {
     {kMemoryOther, 0x1FF, "", kKdReportSimple, 0x8000, 77'203},
 };
 
-constexpr std::uint64_t kUptime = 3 * 86'400;  // seconds
+constexpr std::uint64_t kUptime = 259'200;  // seconds: three days
 constexpr std::uint64_t kStampsPerSecond = 24'000'000;
 constexpr std::uint64_t kNow = kUptime * kStampsPerSecond;
 
