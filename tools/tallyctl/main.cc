@@ -32,6 +32,7 @@ void declare(CLI::App& app, Tool& tool) {
   tbdaily::addNandCommand(app, tool);
   tbdaily::addBufferCommands(app, tool);
   tbdaily::addWearCommand(app, tool);
+  tbdaily::addMetricsCommand(app, tool);
 }
 
 // What CLI11 says of a command that it does not know names everything but the command.

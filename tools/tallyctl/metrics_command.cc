@@ -16,13 +16,13 @@ namespace {
 
 void list(Tool& tool, const MetricsRequest& request) {
   const ChannelSelection selection = selectChannels(tool, request.filter);
-  if (!isDone(tool, request, selection))
+  if (!hasNothingToShow(tool, request, selection))
     printChannels(tool, request, selection.channels.get(), ChannelContents::Description);
 }
 
 void sample(Tool& tool, const MetricsRequest& request) {
   const ChannelSelection selection = selectChannels(tool, request.filter);
-  if (isDone(tool, request, selection)) return;
+  if (hasNothingToShow(tool, request, selection)) return;
   ChannelSampler sampler(tool, *selection.channels);
   if (!sampler) return;
   if (const KdReportCollection samples = sampler.sample())
@@ -140,7 +140,7 @@ void addWatch(CLI::App& metrics, Tool& tool) {
   addInterval(command, interval);
   command->add_option("--count", *count, "End after so many samples")
       ->type_name("N")
-      ->check(CLI::Range(std::int64_t{1}, std::numeric_limits<std::int64_t>::max()));
+      ->check(CLI::PositiveNumber);
 }
 
 void addScale(CLI::App& metrics, Tool& tool) {

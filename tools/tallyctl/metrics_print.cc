@@ -26,7 +26,7 @@ std::string shownText(const std::string& text) {
 
 }  // namespace
 
-bool isDone(Tool& tool, const MetricsRequest& request, const ChannelSelection& selection) {
+bool hasNothingToShow(Tool& tool, const MetricsRequest& request, const ChannelSelection& selection) {
   if (!selection.channels) return true;
   if (selection.selected != 0) return false;
   if (request.describe || tool.printedAsJson(PlistValue::array({}))) return true;
@@ -54,6 +54,7 @@ void printChannels(Tool& tool, const MetricsRequest& request, const ChannelColle
     tool.printedAsJson(channelsAsJson(*channels, contents));
     return;
   }
+  if (channels->empty()) return tool.out().line("the hub has no values of these channels");
   contents == ChannelContents::Values ? printValueTree(tool.out(), *channels)
                                       : printChannelTree(tool.out(), *channels);
 }

@@ -15,7 +15,7 @@ struct MetricsRequest {
 };
 
 // Whether there is nothing to print, which has then been said: no channel, or a selection that failed.
-bool isDone(Tool& tool, const MetricsRequest& request, const ChannelSelection& selection);
+bool hasNothingToShow(Tool& tool, const MetricsRequest& request, const ChannelSelection& selection);
 
 // The library's own descriptions one after another.
 void printDescriptions(Tool& tool, const ChannelCollection* collection, ChannelContents contents);

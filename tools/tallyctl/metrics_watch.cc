@@ -90,12 +90,13 @@ void printSample(Tool& tool, const MetricsRequest& request, const ChannelCollect
   printValueTree(out, *channels);
 }
 
-// Whether somebody has got what was printed. Who closes the pipe has seen enough.
+// Whether what was printed has gone out. Who closes the pipe has seen enough, and nobody waits for the rest
+// after a signal.
 bool flushed(Tool& tool, const StopSignals& signals) {
   if (std::fflush(stdout) == 0 && std::ferror(stdout) == 0) return true;
-  if (errno == EPIPE) {
+  if (errno == EPIPE || signals.haveCome()) {
     ::__fpurge(stdout);
-  } else if (!signals.haveCome()) {
+  } else {
     tool.fail("standard output cannot be written");
   }
   return false;
@@ -105,14 +106,14 @@ bool flushed(Tool& tool, const StopSignals& signals) {
 
 void runMetricsDelta(Tool& tool, const MetricsRequest& request, double interval) {
   const ChannelSelection selection = selectChannels(tool, request.filter);
-  if (isDone(tool, request, selection)) return;
+  if (hasNothingToShow(tool, request, selection)) return;
   if (const KdReportCollection delta = measure(tool, *selection.channels, interval))
     printChannels(tool, request, delta.get(), ChannelContents::Values);
 }
 
 void runMetricsWatch(Tool& tool, const MetricsRequest& request, double interval, std::uint64_t count) {
   const ChannelSelection selection = selectChannels(tool, request.filter);
-  if (isDone(tool, request, selection)) return;
+  if (hasNothingToShow(tool, request, selection)) return;
   ChannelSampler sampler(tool, *selection.channels);
   if (!sampler) return;
   const StopSignals signals;

@@ -69,5 +69,6 @@ void addUsageCommand(CLI::App& app, Tool& tool);
 void addBufferCommands(CLI::App& app, Tool& tool);
 void addNandCommand(CLI::App& app, Tool& tool);
 void addWearCommand(CLI::App& app, Tool& tool);
+void addMetricsCommand(CLI::App& app, Tool& tool);
 
 }  // namespace tbdaily
