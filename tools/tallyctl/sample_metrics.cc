@@ -227,9 +227,10 @@ PlistArray histogramElements(const SampleChannel& channel, const ChannelMeaning&
     const auto hits = i + 1 < bounds.size() ? static_cast<std::uint64_t>(channel.value) >> 2 * distance : 0;
     const auto upper = static_cast<std::uint64_t>(bounds[i]);
     const std::uint64_t minimum = lower + (upper - lower) / 4, maximum = lower + (upper - lower) * 3 / 4;
-    elements.push_back(hits == 0 ? element(0, {})
-                                 : element(kNow, {number(hits), number(minimum), number(maximum),
-                                                  number(hits * ((minimum + maximum) / 2))}));
+    const std::uint64_t sum = minimum + maximum + (hits - 2) * ((minimum + maximum) / 2);
+    elements.push_back(hits == 0
+                           ? element(0, {})
+                           : element(kNow, {number(hits), number(minimum), number(maximum), number(sum)}));
     lower = upper;
   }
   return elements;
