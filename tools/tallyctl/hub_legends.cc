@@ -98,8 +98,8 @@ void HubLegends::addLegend(std::int64_t driver, const PlistArray& groups) {
     if (channels.asArray() == nullptr) continue;
     for (const PlistValue& channel : *channels.asArray()) {
       const PlistArray* entry = channel.asArray();
-      if (entry == nullptr || entry->size() <= kLegendChannelID) continue;
-      if (const auto identifier = (*entry)[kLegendChannelID].asInteger())
+      if (entry == nullptr || entry->empty()) continue;
+      if (const auto identifier = entry->front().asInteger())
         channelInfos_.emplace(std::pair(driver, *identifier), info);
     }
   }
