@@ -11,9 +11,8 @@ namespace tbdaily {
 
 namespace {
 
-// The library's text as it is, but nothing in it may drive a terminal.
-std::string shownText(const std::string& text) {
-  if (::isatty(STDOUT_FILENO) == 0) return text;
+// Without what could drive a terminal in the text's lines.
+std::string printableLines(const std::string& text) {
   std::string shown;
   for (std::size_t begin = 0; begin < text.size();) {
     const std::size_t end = std::min(text.find('\n', begin), text.size());
@@ -34,20 +33,20 @@ bool hasNothingToShow(Tool& tool, const MetricsRequest& request, const ChannelSe
   return true;
 }
 
-void printDescriptions(Tool& tool, const ChannelCollection* collection, ChannelContents contents) {
-  const auto describe = [contents](ChannelRecord& channel) {
-    return contents == ChannelContents::Values ? KdReportSampleCopyDescription(&channel, 0, "")
-                                               : KdReportChannelCopyDescription(&channel, 0, "");
-  };
-  KdReportIterate(collection, [&tool, &describe](ChannelRecord& channel) {
-    if (const auto text = describe(channel)) tool.out().print(shownText(*text));
+std::string descriptionsText(const ChannelCollection* collection, ChannelContents contents) {
+  std::string text;
+  KdReportIterate(collection, [&text, contents](ChannelRecord& channel) {
+    text += (contents == ChannelContents::Values ? KdReportSampleCopyDescription(&channel, 0, "")
+                                                 : KdReportChannelCopyDescription(&channel, 0, ""))
+                .value_or("");
     return kKdReportKeep;
   });
+  return ::isatty(STDOUT_FILENO) != 0 ? printableLines(text) : text;
 }
 
 void printChannels(Tool& tool, const MetricsRequest& request, const ChannelCollection* collection,
                    ChannelContents contents) {
-  if (request.describe) return printDescriptions(tool, collection, contents);
+  if (request.describe) return tool.out().print(descriptionsText(collection, contents));
   const auto channels = readChannels(collection, contents);
   if (!channels) return failMetrics(tool, "the channels cannot be read", std::nullopt);
   if (tool.options.json) {

@@ -1,6 +1,8 @@
 // Prints channels in the form that the user asked for.
 #pragma once
 
+#include <string>
+
 #include "tools/tallyctl/metrics_selection.h"
 #include "tools/tallyctl/metrics_values.h"
 
@@ -17,8 +19,8 @@ struct MetricsRequest {
 // Whether there is nothing to print, which has then been said: no channel, or a selection that failed.
 bool hasNothingToShow(Tool& tool, const MetricsRequest& request, const ChannelSelection& selection);
 
-// The library's own descriptions one after another.
-void printDescriptions(Tool& tool, const ChannelCollection* collection, ChannelContents contents);
+// The library's own descriptions one after another, on a terminal without what could drive it.
+std::string descriptionsText(const ChannelCollection* collection, ChannelContents contents);
 
 // As descriptions, JSON or a tree. A collection that cannot be walked is said to have failed.
 void printChannels(Tool& tool, const MetricsRequest& request, const ChannelCollection* collection,

@@ -1,10 +1,8 @@
 #include "tools/tallyctl/metrics_watch.h"
 
-#include <stdio_ext.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 
@@ -31,12 +29,12 @@ Clock::duration durationOf(double seconds) {
 constexpr auto kProgressStep = std::chrono::milliseconds(100);
 
 // The wait between two samples, with its progress where somebody looks at it.
-Woken waitBetween(const StopSignals& signals, Clock::duration interval) {
+WaitEnd waitBetween(const StopSignals& signals, Clock::duration interval) {
   const Clock::time_point begin = Clock::now(), end = begin + interval;
   const auto step = ::isatty(STDERR_FILENO) != 0 ? Clock::duration(kProgressStep) : interval;
   Progress progress("measuring", static_cast<std::uint64_t>(interval.count()));
-  Woken woken = Woken::InTime;
-  for (Clock::time_point next = begin; woken == Woken::InTime && next < end;) {
+  WaitEnd woken = WaitEnd::Done;
+  for (Clock::time_point next = begin; woken == WaitEnd::Done && next < end;) {
     next = std::min(next + step, end);
     woken = signals.sleepUntil(next);
     progress.at(static_cast<std::uint64_t>((next - begin).count()));
@@ -51,15 +49,10 @@ KdReportCollection measure(Tool& tool, const ChannelCollection& channels, double
   const StopSignals signals;
   const KdReportCollection earlier = sampler.sample();
   if (!earlier) return nullptr;
-  switch (waitBetween(signals, durationOf(interval))) {
-    case Woken::Stopped:
-      tool.fail("interrupted before the second sample");
-      return nullptr;
-    case Woken::ReaderGone:
-      tool.fail("nobody reads standard output any more");
-      return nullptr;
-    case Woken::InTime:
-      break;
+  if (const WaitEnd end = waitBetween(signals, durationOf(interval)); end != WaitEnd::Done) {
+    tool.fail(end == WaitEnd::ReaderGone ? "nobody reads standard output any more"
+                                         : "interrupted before the second sample");
+    return nullptr;
   }
   const KdReportCollection later = sampler.sample();
   if (!later) return nullptr;
@@ -77,30 +70,38 @@ bool canRedraw() {
 
 constexpr std::string_view kClearScreen = "\x1b[H\x1b[2J";
 
-void printSample(Tool& tool, const MetricsRequest& request, const ChannelCollection* samples, bool redraw) {
-  Terminal& out = tool.out();
-  if (redraw) out.print(kClearScreen);
-  if (request.describe) return printDescriptions(tool, samples, ChannelContents::Values);
-  const auto channels = readChannels(samples, ChannelContents::Values);
-  if (!channels) return failMetrics(tool, "the channels cannot be read", std::nullopt);
-  if (tool.options.json) return out.line(jsonText(channelsAsJson(*channels, ChannelContents::Values)));
-  const PlistDate now = tool.platform().services().kernel.currentTime();
-  if (!redraw) return out.line(valuesLine(now, *channels));
-  out.line(stampText(now, 3));
-  printValueTree(out, *channels);
-}
+// The samples of a watch, one after another.
+class SampleStream {
+ public:
+  SampleStream(Tool& tool, const MetricsRequest& request, const StopSignals& signals)
+      : tool_(tool), request_(request), signals_(signals), redraws_(canRedraw() && !tool.options.json) {}
 
-// Whether what was printed has gone out. Who closes the pipe has seen enough, and nobody waits for the rest
-// after a signal.
-bool flushed(Tool& tool, const StopSignals& signals) {
-  if (std::fflush(stdout) == 0 && std::ferror(stdout) == 0) return true;
-  if (errno == EPIPE || signals.haveCome()) {
-    ::__fpurge(stdout);
-  } else {
-    tool.fail("standard output cannot be written");
+  WaitEnd show(const ChannelCollection* samples) const {
+    if (request_.describe) return print(descriptionsText(samples, ChannelContents::Values));
+    const auto channels = readChannels(samples, ChannelContents::Values);
+    if (!channels) {
+      failMetrics(tool_, "the channels cannot be read", std::nullopt);
+      return WaitEnd::Stopped;
+    }
+    if (tool_.options.json) return print(jsonText(channelsAsJson(*channels, ChannelContents::Values)) + "\n");
+    const PlistDate now = tool_.platform().services().kernel.currentTime();
+    if (!redraws_) return print(valuesLine(now, *channels) + "\n");
+    tool_.out().print(kClearScreen);
+    tool_.out().line(stampText(now, 3));
+    printValueTree(tool_.out(), *channels);
+    return std::fflush(stdout) == 0 ? WaitEnd::Done : WaitEnd::Failed;
   }
-  return false;
-}
+
+ private:
+  WaitEnd print(const std::string& text) const {
+    return signals_.write(redraws_ ? std::string(kClearScreen) + text : text);
+  }
+
+  Tool& tool_;
+  const MetricsRequest& request_;
+  const StopSignals& signals_;
+  const bool redraws_;
+};
 
 }  // namespace
 
@@ -117,17 +118,20 @@ void runMetricsWatch(Tool& tool, const MetricsRequest& request, double interval,
   ChannelSampler sampler(tool, *selection.channels);
   if (!sampler) return;
   const StopSignals signals;
-  const bool redraw = canRedraw() && !tool.options.json;
+  const SampleStream stream(tool, request, signals);
   Clock::time_point next = Clock::now();
-  for (std::uint64_t taken = 1;; ++taken) {
+  WaitEnd end = WaitEnd::Done;
+  for (std::uint64_t taken = 0; end == WaitEnd::Done;) {
     const KdReportCollection samples = sampler.sample();
     if (!samples) return;
-    printSample(tool, request, samples.get(), redraw);
-    if (!flushed(tool, signals) || tool.exitStatus != kDone || taken == count) return;
+    end = stream.show(samples.get());
+    if (++taken == count || end != WaitEnd::Done) break;
     // After a delay the samples go on from then, without a burst of those that were missed.
     next = std::max(next + durationOf(interval), Clock::now());
-    if (signals.sleepUntil(next) != Woken::InTime) return;
+    end = signals.sleepUntil(next);
   }
+  // Who closes the pipe, or sends a signal, has seen enough.
+  if (end == WaitEnd::Failed && !signals.haveCome()) tool.fail("standard output cannot be written");
 }
 
 }  // namespace tbdaily

@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <climits>
 #include <ctime>
 
 namespace tbdaily {
@@ -57,7 +58,7 @@ bool StopSignals::haveCome() const {
   return stopAsked != 0;
 }
 
-Woken StopSignals::sleepUntil(std::chrono::steady_clock::time_point time) const {
+WaitEnd StopSignals::sleepUntil(std::chrono::steady_clock::time_point time) const {
   using std::chrono::nanoseconds, std::chrono::seconds;
   const HeldSignals held;
   while (!haveCome()) {
@@ -67,10 +68,30 @@ Woken StopSignals::sleepUntil(std::chrono::steady_clock::time_point time) const 
     const timespec timeout{whole.count(), (left - whole).count()};
     pollfd output{STDOUT_FILENO, 0, 0};  // asks for nothing: a closed pipe reports itself
     const int ready = ::ppoll(&output, 1, &timeout, &held.before());
-    if (ready > 0) return Woken::ReaderGone;
-    if (ready == 0 || errno != EINTR) return Woken::InTime;
+    if (ready > 0) return WaitEnd::ReaderGone;
+    if (ready == 0 || errno != EINTR) return WaitEnd::Done;
   }
-  return Woken::Stopped;
+  return WaitEnd::Stopped;
+}
+
+WaitEnd StopSignals::write(std::string_view text) const {
+  const HeldSignals held;
+  while (!text.empty()) {
+    if (haveCome()) return WaitEnd::Stopped;
+    pollfd output{STDOUT_FILENO, POLLOUT, 0};
+    if (::ppoll(&output, 1, nullptr, &held.before()) < 0) {
+      if (errno == EINTR) continue;
+      return WaitEnd::Failed;
+    }
+    // A pipe that is ready takes this much without making its writer wait.
+    const ssize_t written = ::write(STDOUT_FILENO, text.data(), std::min<std::size_t>(text.size(), PIPE_BUF));
+    if (written >= 0) {
+      text.remove_prefix(static_cast<std::size_t>(written));
+    } else if (errno != EAGAIN) {
+      return errno == EPIPE ? WaitEnd::ReaderGone : WaitEnd::Failed;
+    }
+  }
+  return WaitEnd::Done;
 }
 
 }  // namespace tbdaily

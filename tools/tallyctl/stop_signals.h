@@ -5,10 +5,11 @@
 #include <chrono>
 #include <csignal>
 #include <cstdint>
+#include <string_view>
 
 namespace tbdaily {
 
-enum class Woken : std::uint8_t { InTime, Stopped, ReaderGone };
+enum class WaitEnd : std::uint8_t { Done, Stopped, ReaderGone, Failed };
 
 // As long as it lives, SIGINT and SIGTERM no longer end the process but ask the command to end, and writing
 // to a closed pipe fails instead of ending the process. One at a time.
@@ -21,7 +22,10 @@ class StopSignals {
 
   bool haveCome() const;
   // Sleeps until the time has come, a signal has, or nobody reads standard output any more.
-  Woken sleepUntil(std::chrono::steady_clock::time_point time) const;
+  WaitEnd sleepUntil(std::chrono::steady_clock::time_point time) const;
+  // Writes the text to standard output, past stdio, and waits for a reader that stands still no longer than
+  // until a signal comes.
+  WaitEnd write(std::string_view text) const;
 
  private:
   static constexpr std::array kSignals = {SIGINT, SIGTERM, SIGPIPE};
