@@ -71,6 +71,8 @@ class Metrics(unittest.TestCase):
         self.assertNotIn("\x1b", text)
 
     def test_delta(self):
+        self.assertIn("because of fan <id 0x100000100>/Queue/Rails/format nine: unknown",
+                      self.metrics("delta", "--interval", "0.01", status=1))
         rows = [row for row in CHANNELS if row[5] != 9]
         self.registry(rows)
         process = self.start("delta", "--interval", "2", "--json")

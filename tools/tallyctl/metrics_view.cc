@@ -234,17 +234,20 @@ void printValueTree(Terminal& out, const std::vector<ChannelValues>& channels) {
   printTree(out, channels, {Left, Right, Left}, valueRow, isLarge);
 }
 
+std::string wholeName(const ChannelValues& channel) {
+  std::string whole;
+  for (const std::string& step : pathOf(channel)) whole.append(step).append("/");
+  return whole + nameOf(channel);
+}
+
 std::string valuesLine(PlistDate time, const std::vector<ChannelValues>& channels) {
   std::unordered_map<std::string, std::size_t> uses;
   for (const ChannelValues& channel : channels) ++uses[nameOf(channel)];
   std::string line = stampText(time, 3);
   for (const ChannelValues& channel : channels) {
     const std::string name = nameOf(channel);
-    line += "  ";
-    if (uses[name] > 1) {
-      for (const std::string& step : pathOf(channel)) line.append(step).append("/");
-    }
-    line.append(name).append("=").append(shortValue(channel));
+    line.append("  ").append(uses[name] > 1 ? wholeName(channel) : name);
+    line.append("=").append(shortValue(channel));
   }
   return line;
 }

@@ -16,9 +16,12 @@ void printChannelTree(Terminal& out, const std::vector<ChannelValues>& channels)
 // The same tree with the values.
 void printValueTree(Terminal& out, const std::vector<ChannelValues>& channels);
 
+// "driver/group/subgroup/name", printable; the identifier in place of a missing name.
+std::string wholeName(const ChannelValues& channel);
+
 // One line: the time, then "name=value unit" of each channel, two spaces apart. Of a state channel the value
-// is the current state, of a histogram the number of hits. A name that several channels have is written with
-// its driver, group and subgroup.
+// is the current state, of a histogram the number of hits. Of a name that several channels have the
+// whole is written.
 std::string valuesLine(PlistDate time, const std::vector<ChannelValues>& channels);
 
 }  // namespace tbdaily

@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cstdio>
 #include <cstdlib>
+#include <map>
 
 #include "platform/kernel.h"
 #include "platform/linux/plist_json.h"
@@ -42,6 +43,29 @@ WaitEnd waitBetween(const StopSignals& signals, Clock::duration interval) {
   return woken;
 }
 
+// The first channel that cannot be compared, since one of them keeps all others from it; empty when none is
+// found.
+std::string incomparableChannel(const ChannelCollection* earlier, const ChannelCollection* later) {
+  const auto keyOf = [](const ChannelRecord& channel) {
+    return std::pair(KdReportChannelGetDriverID(&channel), KdReportChannelGetChannelID(&channel));
+  };
+  std::map<std::pair<std::int64_t, std::int64_t>, const ChannelRecord*> partners;
+  KdReportIterate(earlier, [&](ChannelRecord& channel) {
+    partners.emplace(keyOf(channel), &channel);
+    return kKdReportKeep;
+  });
+  std::size_t place = 0;
+  const std::uint32_t status = KdReportIterate(later, [&](ChannelRecord& channel) {
+    const auto partner = partners.find(keyOf(channel));
+    const bool stands =
+        partner == partners.end() || KdReportSampleCreateDelta(partner->second, &channel) != nullptr;
+    place += stands ? 1 : 0;
+    return stands ? kKdReportKeep : kKdReportStop;
+  });
+  const auto channels = readChannels(later, ChannelContents::Description);
+  return status == kKdReportStop && channels ? wholeName((*channels)[place]) : "";
+}
+
 // The changes of the selected channels, or null, with the reason said.
 KdReportCollection measure(Tool& tool, const ChannelCollection& channels, double interval) {
   ChannelSampler sampler(tool, channels);
@@ -58,8 +82,11 @@ KdReportCollection measure(Tool& tool, const ChannelCollection& channels, double
   if (!later) return nullptr;
   std::optional<ReportError> error;
   KdReportCollection delta = KdReportCreateSamplesDelta(earlier.get(), later.get(), &error);
-  if (!delta) failMetrics(tool, "the two samples cannot be compared", error);
-  return delta;
+  if (delta) return delta;
+  const std::string channel = incomparableChannel(earlier.get(), later.get());
+  failMetrics(tool, "the two samples cannot be compared" + (channel.empty() ? "" : ", because of " + channel),
+              error);
+  return nullptr;
 }
 
 bool canRedraw() {
