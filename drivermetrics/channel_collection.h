@@ -79,10 +79,17 @@ std::uint32_t _getAggregateOpts(const ChannelCollection* collection);
 KdStatus _addChannel(ChannelCollection* collection, const KdReportChannel& channel, std::uint32_t options,
                      KdReportErrorOut error = nullptr);
 
-// A record for a driver's legend entry, without group, subgroup and information. Null ("couldn't create
-// channel", kKdError) unless the entry's identifier and type are numbers.
-KdReportChannel makeChannelRecord(PlistValue driverID, PlistValue driverName, const PlistValue& legendEntry,
-                                  KdReportErrorOut error);
+// A channel's legend entry. None ("couldn't create channel", kKdError) unless its identifier and type are
+// numbers and the driver of the group has a name.
+std::optional<LegendEntry> usableLegendEntry(const PlistValue& entry, const LegendGroup& group,
+                                             KdReportErrorOut error);
+
+// A new record of a channel.
+KdReportChannel makeChannelRecord(std::shared_ptr<const LegendGroup> group, std::optional<LegendEntry> entry);
+
+// KdReportIterate for who wants to hold on to the records.
+std::uint32_t iterateRecords(const ChannelCollection* collection,
+                             const std::function<std::uint32_t(const KdReportChannel&)>& visitor);
 
 // Answer as KdReportVisitor does. `copy` is a copy of `channel` that goes into the new collection when kept.
 using CloneVisitor = std::function<std::uint32_t(const ChannelRecord& channel, ChannelRecord& copy)>;

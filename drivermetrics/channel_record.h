@@ -1,30 +1,75 @@
 // The record of one channel, and what the library itself asks of it.
 #pragma once
 
+#include <utility>
+
 #include "drivermetrics/kd_report.h"
 
 namespace tbdaily {
 
-// A record is a dictionary with a fixed set of keys, held in members; an absent value is an absent key.
-// Values that come from outside may be of any kind and are checked where they are read.
-class ChannelRecord : public std::enable_shared_from_this<ChannelRecord> {
- public:
-  PlistValue driverID;    // number: the publishing driver's registry entry identifier
-  PlistValue driverName;  // string
-  // [channel identifier, ChannelType, name (optional)]; null when it is missing or no array. Every copy of a
-  // record refers to the same entry, so that a change of the type shows in all of them.
-  std::shared_ptr<PlistArray> legendChannel;
-  PlistValue groupName, subGroupName;  // strings
-  PlistValue channelInfo;              // dictionary, shared by the channels of a legend group
+// A legend entry, [identifier, ChannelType, name (optional)]: its places as they came, which may hold values
+// of any kind; absent ones lie behind its end.
+struct LegendEntry {
+  PlistValue channelID, channelType;  // numbers
+  PlistValue channelName;             // string
+};
 
-  // Cached answers.
+// What the channels of a legend group have in common. Never changes once a record refers to it.
+struct LegendGroup {
+  PlistValue driverID;                 // number: the driver's registry entry identifier
+  PlistValue driverName;               // string
+  PlistValue groupName, subGroupName;  // strings
+  PlistValue channelInfo;              // dictionary
+};
+
+// What a driver says of a channel. Every record that was copied from another refers to the same, so that a
+// change of the type shows in all of them.
+struct ChannelSource {
+  std::shared_ptr<const LegendGroup> group;  // never null
+  std::optional<LegendEntry> legendChannel;  // none when it is missing or no array
+};
+
+// Answers that cost something, kept once they were asked for.
+struct CachedAnswers {
   PlistValue channelName, unitLabel;  // strings
   PlistValue processedChannelConfig;  // array of upper bucket bounds
   PlistValue stateNames;              // array of strings
+};
 
-  // Samples only: elements of 64 bytes. Null when missing or no data. Copies of a record share them until
-  // they are given their own.
-  std::shared_ptr<PlistData> rawElements;
+// The bytes of a sampled channel's elements. Copies refer to the same bytes.
+class ElementData {
+ public:
+  ElementData() = default;
+  // A copy of the bytes.
+  explicit ElementData(std::span<const std::byte> bytes);
+  // Bytes in memory that is shared with those of other channels.
+  ElementData(std::shared_ptr<std::byte[]> bytes, std::size_t size) : bytes_(std::move(bytes)), size_(size) {}
+
+  explicit operator bool() const { return bytes_ != nullptr; }
+  std::span<std::byte> bytes() const { return {bytes_.get(), size_}; }
+
+ private:
+  std::shared_ptr<std::byte[]> bytes_;  // none: no data
+  std::size_t size_ = 0;
+};
+
+// A record is a dictionary with a fixed set of keys, held in members; an absent value is an absent key.
+// Values that come from outside may be of any kind and are checked where they are read. Copies are small: a
+// sample of many thousand channels is made of them.
+class ChannelRecord {
+ public:
+  explicit ChannelRecord(std::shared_ptr<ChannelSource> of) : source(std::move(of)) {}
+
+  const LegendGroup& group() const { return *source->group; }
+  const CachedAnswers& cached() const;
+  // Keeps an answer for this record and the copies that are made of it from now on.
+  void cache(PlistValue CachedAnswers::*answer, PlistValue value);
+
+  std::shared_ptr<ChannelSource> source;  // never null
+  ElementData rawElements;                // of samples only
+
+ private:
+  std::shared_ptr<const CachedAnswers> cached_;  // null: none yet
 };
 
 // The keys of a record, of its channel information and of a legend, as property lists spell them.
@@ -53,10 +98,8 @@ inline constexpr std::string_view kDrivers = "KdReportDrivers";
 inline constexpr std::string_view kChannelGroups = "KdReportChannelGroups";
 }  // namespace kd_report_key
 
-// The places of a legend entry.
-inline constexpr std::size_t kLegendChannelID = 0;
-inline constexpr std::size_t kLegendChannelType = 1;
-inline constexpr std::size_t kLegendChannelName = 2;
+// None unless the value is an array.
+std::optional<LegendEntry> legendEntryOf(const PlistValue& value);
 
 // A number as the library reads it; kKdReportInvalid for anything else.
 std::int64_t integerOrInvalid(const PlistValue& value);

@@ -86,36 +86,38 @@ KdStatus _addChannel(ChannelCollection* collection, const KdReportChannel& chann
   return status;
 }
 
-KdReportChannel makeChannelRecord(PlistValue driverID, PlistValue driverName, const PlistValue& legendEntry,
-                                  KdReportErrorOut error) {
-  const PlistArray* entry = legendEntry.asArray();
-  if (entry == nullptr || entry->size() <= kLegendChannelType || driverName.isNone() ||
-      integerOrInvalid((*entry)[kLegendChannelID]) == kKdReportInvalid ||
-      integerOrInvalid((*entry)[kLegendChannelType]) == kKdReportInvalid) {
-    setError(error, kKdError, "couldn't create channel");
-    return nullptr;
+std::optional<LegendEntry> usableLegendEntry(const PlistValue& entry, const LegendGroup& group,
+                                             KdReportErrorOut error) {
+  auto places = legendEntryOf(entry);
+  if (places && !group.driverName.isNone() && integerOrInvalid(places->channelID) != kKdReportInvalid &&
+      integerOrInvalid(places->channelType) != kKdReportInvalid) {
+    return places;
   }
-  auto channel = std::make_shared<ChannelRecord>();
-  channel->driverID = std::move(driverID);
-  channel->driverName = std::move(driverName);
-  channel->legendChannel = std::make_shared<PlistArray>(*entry);
-  return channel;
+  setError(error, kKdError, "couldn't create channel");
+  return std::nullopt;
+}
+
+KdReportChannel makeChannelRecord(std::shared_ptr<const LegendGroup> group,
+                                  std::optional<LegendEntry> entry) {
+  return std::make_shared<ChannelRecord>(
+      std::make_shared<ChannelSource>(ChannelSource{std::move(group), std::move(entry)}));
 }
 
 KdStatus KdReportAddChannelDescription(ChannelCollection* collection,
                                        const KdReportChannelDescription& description,
                                        KdReportErrorOut error) {
-  PlistArray entry{PlistValue::int64(description.channelID),
-                   PlistValue::int64(static_cast<std::int64_t>(description.channelType.bits))};
-  if (description.channelName) entry.push_back(PlistValue::string(*description.channelName));
-  const KdReportChannel channel =
-      makeChannelRecord(PlistValue::int64(description.driverID), textOrNone(description.driverName),
-                        PlistValue::array(std::move(entry)), error);
-  if (channel == nullptr) return kKdError;
-  channel->groupName = textOrNone(description.groupName);
-  channel->subGroupName = textOrNone(description.subGroupName);
-  if (description.channelInfo.asDictionary() != nullptr) channel->channelInfo = description.channelInfo;
-  return _addChannel(collection, channel, _getAggregateOpts(collection), error);
+  PlistArray places{PlistValue::int64(description.channelID),
+                    PlistValue::int64(static_cast<std::int64_t>(description.channelType.bits))};
+  if (description.channelName) places.push_back(PlistValue::string(*description.channelName));
+  const bool hasInfo = description.channelInfo.asDictionary() != nullptr;
+  const auto group = std::make_shared<const LegendGroup>(
+      LegendGroup{PlistValue::int64(description.driverID), textOrNone(description.driverName),
+                  textOrNone(description.groupName), textOrNone(description.subGroupName),
+                  hasInfo ? description.channelInfo : PlistValue()});
+  auto entry = usableLegendEntry(PlistValue::array(std::move(places)), *group, error);
+  if (!entry) return kKdError;
+  return _addChannel(collection, makeChannelRecord(group, std::move(entry)), _getAggregateOpts(collection),
+                     error);
 }
 
 std::uint32_t KdReportMergeChannels(ChannelCollection* destination, const ChannelCollection* source,
@@ -125,10 +127,11 @@ std::uint32_t KdReportMergeChannels(ChannelCollection* destination, const Channe
     return kKdReportWalkFailed;
   }
   const std::uint32_t options = _getAggregateOpts(destination);
-  return KdReportIterate(source, [destination, options, error](ChannelRecord& channel) -> std::uint32_t {
-    const KdStatus status = _addChannel(destination, channel.shared_from_this(), options, error);
-    return status == kKdSuccess ? kKdReportKeep : kKdReportStop;
-  });
+  return iterateRecords(source,
+                        [destination, options, error](const KdReportChannel& channel) -> std::uint32_t {
+                          const KdStatus status = _addChannel(destination, channel, options, error);
+                          return status == kKdSuccess ? kKdReportKeep : kKdReportStop;
+                        });
 }
 
 }  // namespace tbdaily

@@ -13,45 +13,59 @@ using namespace kd_report_key;
 // A filed collection has four levels: all, driver, group, subgroup.
 constexpr int kMostLevels = 4;
 
-struct RecordValue {
-  std::string_view key;
-  PlistValue ChannelRecord::*value;
+template <typename Part>
+struct Key {
+  std::string_view name;
+  PlistValue Part::*value;
 };
 
-// A function and no constant: the compiler confuses pointers to members in constant tables.
-std::array<RecordValue, 9> recordValues() {
+// Functions and no constants: the compiler confuses pointers to members in constant tables.
+std::array<Key<LegendGroup>, 5> groupKeys() {
   return {{
-      {kDriverID, &ChannelRecord::driverID},
-      {kDriverName, &ChannelRecord::driverName},
-      {kGroupName, &ChannelRecord::groupName},
-      {kSubGroupName, &ChannelRecord::subGroupName},
-      {kChannelInfo, &ChannelRecord::channelInfo},
-      {kChannelName, &ChannelRecord::channelName},
-      {kUnitLabel, &ChannelRecord::unitLabel},
-      {kProcessedChannelConfig, &ChannelRecord::processedChannelConfig},
-      {kStateNames, &ChannelRecord::stateNames},
+      {kDriverID, &LegendGroup::driverID},
+      {kDriverName, &LegendGroup::driverName},
+      {kGroupName, &LegendGroup::groupName},
+      {kSubGroupName, &LegendGroup::subGroupName},
+      {kChannelInfo, &LegendGroup::channelInfo},
   }};
+}
+std::array<Key<CachedAnswers>, 4> cachedKeys() {
+  return {{
+      {kChannelName, &CachedAnswers::channelName},
+      {kUnitLabel, &CachedAnswers::unitLabel},
+      {kProcessedChannelConfig, &CachedAnswers::processedChannelConfig},
+      {kStateNames, &CachedAnswers::stateNames},
+  }};
+}
+
+PlistValue plistOfLegend(const LegendEntry& entry) {
+  PlistArray places{entry.channelID, entry.channelType, entry.channelName};
+  while (!places.empty() && places.back().isNone()) places.pop_back();
+  return PlistValue::array(std::move(places));
 }
 
 PlistValue plistOfChannel(const ChannelRecord& channel) {
   PlistDictionary entries;
-  for (const auto& [key, value] : recordValues()) entries.set(key, channel.*value);
-  if (channel.legendChannel != nullptr)
-    entries.set(kLegendChannel, PlistValue::array(*channel.legendChannel));
-  if (channel.rawElements != nullptr) entries.set(kRawElements, PlistValue::data(*channel.rawElements));
+  for (const auto& [name, value] : groupKeys()) entries.set(name, channel.group().*value);
+  for (const auto& [name, value] : cachedKeys()) entries.set(name, channel.cached().*value);
+  if (channel.source->legendChannel)
+    entries.set(kLegendChannel, plistOfLegend(*channel.source->legendChannel));
+  const auto elements = channel.rawElements.bytes();
+  if (channel.rawElements) entries.set(kRawElements, PlistValue::data({elements.begin(), elements.end()}));
   return PlistValue::dictionary(std::move(entries));
 }
 
 KdReportChannel channelOfPlist(const PlistValue& value) {
   const PlistDictionary* entries = value.asDictionary();
   if (entries == nullptr) return nullptr;
-  auto channel = std::make_shared<ChannelRecord>();
-  for (const auto& [key, member] : recordValues()) channel.get()->*member = entries->get(key);
-  const PlistValue legend = entries->get(kLegendChannel), elements = entries->get(kRawElements);
-  if (const PlistArray* entry = legend.asArray())
-    channel->legendChannel = std::make_shared<PlistArray>(*entry);
-  if (const auto bytes = elements.asData())
-    channel->rawElements = std::make_shared<PlistData>(bytes->begin(), bytes->end());
+  auto group = std::make_shared<LegendGroup>();
+  for (const auto& [name, member] : groupKeys()) (*group).*member = entries->get(name);
+  KdReportChannel channel = makeChannelRecord(std::move(group), legendEntryOf(entries->get(kLegendChannel)));
+  for (const auto& [name, member] : cachedKeys()) {
+    if (const PlistValue* answer = entries->find(name)) channel->cache(member, *answer);
+  }
+  const PlistValue elements = entries->get(kRawElements);
+  if (const auto bytes = elements.asData()) channel->rawElements = ElementData(*bytes);
   return channel;
 }
 

@@ -4,6 +4,7 @@
 
 #include "drivermetrics/channel_collection.h"
 #include "drivermetrics/channel_pairing.h"
+#include "drivermetrics/object_blocks.h"
 #include "drivermetrics/raw_elements.h"
 
 namespace tbdaily {
@@ -11,7 +12,7 @@ namespace tbdaily {
 namespace {
 
 struct Visit {
-  const KdReportVisitor& visitor;
+  const std::function<std::uint32_t(const KdReportChannel&)>& visitor;
 };
 struct Prune {
   const KdReportVisitor& visitor;
@@ -44,11 +45,18 @@ template <typename Mode>
 std::uint32_t walk(const Mode& mode, Walked<Mode, ChannelCollection>* collection,
                    const ChannelCollection* other, KdReportCollection* result);
 
+// What the records of a large collection refer to lies far apart; it is asked for before its turn comes.
+constexpr std::size_t kPrefetchDistance = 8;
+void prefetchSource(const Channels& channels, std::size_t index) {
+  if (index < channels.size() && channels[index] != nullptr)
+    __builtin_prefetch(channels[index]->source.get());
+}
+
 std::uint32_t visitChannels(const Visit& mode, const Channels& channels) {
   std::uint32_t status = 0;
   for (std::size_t i = 0; i < channels.size(); ++i) {
     const KdReportChannel channel = channels[i];  // stays while it is visited, whatever the visitor does
-    const std::uint32_t answer = channel != nullptr ? mode.visitor(*channel) : kKdReportWalkFailed;
+    const std::uint32_t answer = channel != nullptr ? mode.visitor(channel) : kKdReportWalkFailed;
     if (isOdd(answer)) return answer;
     status |= answer;
   }
@@ -70,10 +78,13 @@ std::uint32_t pruneChannels(const Prune& mode, Channels& channels) {
 
 std::uint32_t cloneChannels(const Clone& mode, const Channels& channels, Channels& copies) {
   std::uint32_t status = 0;
+  ObjectBlocks<ChannelRecord> memory(channels.size());
   copies.reserve(channels.size());
-  for (const KdReportChannel& channel : channels) {
+  for (std::size_t i = 0; i < channels.size(); ++i) {
+    const KdReportChannel& channel = channels[i];
     if (channel == nullptr) return kKdReportWalkFailed;
-    KdReportChannel copy = std::make_shared<ChannelRecord>(*channel);
+    prefetchSource(channels, i + kPrefetchDistance);
+    KdReportChannel copy = memory.add(*channel);
     const std::uint32_t answer = mode.visitor(*channel, *copy);
     if (isOdd(answer)) return answer;
     if (answer == kKdReportKeep) copies.push_back(std::move(copy));
@@ -86,15 +97,19 @@ std::uint32_t compareChannels(const Compare& mode, const Channels& channels, con
                               Channels& copies) {
   std::uint32_t status = 0;
   ChannelPairing pairing(earlier);
+  ObjectBlocks<ChannelRecord> memory(channels.size());
+  ElementBlocks elements;
   copies.reserve(channels.size());
   for (std::size_t i = 0; i < channels.size(); ++i) {
     if (channels[i] == nullptr) return kKdReportWalkFailed;
-    KdReportChannel copy = std::make_shared<ChannelRecord>(*channels[i]);
+    prefetchSource(channels, i + kPrefetchDistance);
+    KdReportChannel copy = memory.add(*channels[i]);
     const auto [isReadable, partner] = pairing.partnerOf(*channels[i], i);
     if (!isReadable) return kKdReportWalkFailed;
     std::uint32_t answer = kKdReportKeep;
     if (partner != nullptr) {
-      if (cloneElements(*copy, *partner, ElementValues::Invalidate) != kKdSuccess) return kKdReportWalkFailed;
+      if (cloneElements(*copy, *partner, ElementValues::Invalidate, &elements) != kKdSuccess)
+        return kKdReportWalkFailed;
       answer = mode.visitor(*partner, *channels[i], *copy);
     }
     if (isOdd(answer)) return answer;
@@ -175,7 +190,13 @@ std::uint32_t walk(const Mode& mode, Walked<Mode, ChannelCollection>* collection
 }  // namespace
 
 std::uint32_t KdReportIterate(const ChannelCollection* collection, const KdReportVisitor& visitor) {
-  return visitor ? walk(Visit{visitor}, collection, nullptr, nullptr) : kKdReportWalkFailed;
+  if (!visitor) return kKdReportWalkFailed;
+  return iterateRecords(collection, [&visitor](const KdReportChannel& channel) { return visitor(*channel); });
+}
+
+std::uint32_t iterateRecords(const ChannelCollection* collection,
+                             const std::function<std::uint32_t(const KdReportChannel&)>& visitor) {
+  return walk(Visit{visitor}, collection, nullptr, nullptr);
 }
 
 std::uint32_t KdReportPrune(ChannelCollection* collection, const KdReportVisitor& visitor) {

@@ -40,11 +40,12 @@ class RandomChannels {
     std::vector<KdReportChannel> channels(below(most + 1));
     for (KdReportChannel& channel : channels) {
       channel = channelOf(1 + below(3), 1 + below(12), channelType(1 + below(2)));
-      if (below(3) != 0) channel->groupName = PlistValue::string(below(2) != 0 ? "G" : "H");
-      if (below(2) != 0) channel->subGroupName = PlistValue::string("S");
-      channel->rawElements = std::make_shared<PlistData>();
-      testing::appendElement(*channel->rawElements, 0, 0,
-                             channelType(KdReportChannelGetFormat(channel.get())), {.words = {1, 2, 3, 4}});
+      if (below(3) != 0) testing::groupOf(*channel).groupName = PlistValue::string(below(2) != 0 ? "G" : "H");
+      if (below(2) != 0) testing::groupOf(*channel).subGroupName = PlistValue::string("S");
+      PlistData bytes;
+      testing::appendElement(bytes, 0, 0, channelType(KdReportChannelGetFormat(channel.get())),
+                             {.words = {1, 2, 3, 4}});
+      channel->rawElements = ElementData(bytes);
     }
     return channels;
   }
@@ -63,14 +64,16 @@ std::vector<ChannelRecord*> inWalkOrder(const std::vector<KdReportChannel>& chan
   using Key = std::vector<std::ptrdiff_t>;
   std::vector<std::pair<Key, ChannelRecord*>> keyed;
   for (const KdReportChannel& channel : channels) {
-    const auto driver = [](const ChannelRecord& c) { return c.driverID; };
-    const auto group = [](const ChannelRecord& c) { return std::pair(c.driverID, c.groupName); };
+    const auto driver = [](const ChannelRecord& c) { return c.group().driverID; };
+    const auto group = [](const ChannelRecord& c) {
+      return std::pair(c.group().driverID, c.group().groupName);
+    };
     const auto subGroup = [](const ChannelRecord& c) {
-      return std::tuple(c.driverID, c.groupName, c.subGroupName);
+      return std::tuple(c.group().driverID, c.group().groupName, c.group().subGroupName);
     };
     Key key{rank(driver, channel.get()), -1, -1};
-    if (channel->groupName) key[1] = rank(group, channel.get());
-    if (channel->groupName && channel->subGroupName) key[2] = rank(subGroup, channel.get());
+    if (channel->group().groupName) key[1] = rank(group, channel.get());
+    if (channel->group().groupName && channel->group().subGroupName) key[2] = rank(subGroup, channel.get());
     keyed.emplace_back(key, channel.get());
   }
   std::ranges::stable_sort(keyed, {}, &std::pair<Key, ChannelRecord*>::first);
@@ -101,8 +104,8 @@ TEST(CollectionWalk, VisitsClonesAndPrunesLikeAList) {
     ASSERT_EQ(copies.size(), expected.size());
     for (std::size_t i = 0; i < copies.size(); ++i) {
       EXPECT_NE(copies[i], expected[i]);
-      EXPECT_EQ(copies[i]->legendChannel, expected[i]->legendChannel);
-      EXPECT_EQ(copies[i]->rawElements, expected[i]->rawElements);
+      EXPECT_EQ(copies[i]->source, expected[i]->source);
+      EXPECT_EQ(copies[i]->rawElements.bytes().data(), expected[i]->rawElements.bytes().data());
     }
     EXPECT_TRUE(copy->queryOptions.isNone());
 
@@ -129,7 +132,9 @@ TEST(CollectionWalk, PairsChannelsInTheirOrder) {
   for (unsigned round = 0; round < kRounds; ++round) {
     const auto earlier = random.make(12), later = random.make(12);
     const auto pairs = [](const KdReportChannel& a, const KdReportChannel& b) {
-      return a->driverID == b->driverID && *a->legendChannel == *b->legendChannel;
+      return KdReportChannelGetDriverID(a.get()) == KdReportChannelGetDriverID(b.get()) &&
+             KdReportChannelGetChannelID(a.get()) == KdReportChannelGetChannelID(b.get()) &&
+             KdReportChannelGetFormat(a.get()) == KdReportChannelGetFormat(b.get());
     };
     // Index by index, else forward from behind the last hit.
     std::vector<const ChannelRecord*> expected, partners;
@@ -149,7 +154,7 @@ TEST(CollectionWalk, PairsChannelsInTheirOrder) {
         before.get(), after.get(),
         [&](const ChannelRecord& partner, const ChannelRecord&, ChannelRecord& copy) {
           partners.push_back(&partner);
-          EXPECT_NE(copy.rawElements, partner.rawElements);
+          EXPECT_NE(copy.rawElements.bytes().data(), partner.rawElements.bytes().data());
           EXPECT_EQ(getRawElements(&copy, KdReportChannelGetFormat(&copy))->word(0, 3), kKdReportInvalid);
           return std::uint32_t{0};
         });

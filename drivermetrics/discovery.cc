@@ -1,6 +1,7 @@
 // Reading the legends that drivers publish in the registry.
 
 #include "drivermetrics/channel_collection.h"
+#include "drivermetrics/object_blocks.h"
 #include "drivermetrics/report_error.h"
 #include "drivermetrics/text_format.h"
 #include "platform/driver_handle.h"
@@ -21,14 +22,12 @@ class Publisher {
  public:
   Publisher(DriverRegistry& registry, KdHandle driver) : registry_(registry), driver_(driver) {}
 
-  // A record for the legend entry, or null with the error filled.
-  KdReportChannel channel(const PlistValue& legendEntry, KdReportErrorOut error) {
+  // The driver's part of a legend group, or none with the error filled.
+  std::optional<LegendGroup> group(KdReportErrorOut error) {
     if (!isRead_) read();
-    if (status_ != kKdSuccess) {
-      setError(error, status_, "error extracting driver info");
-      return nullptr;
-    }
-    return makeChannelRecord(identifier_, name_, legendEntry, error);
+    if (status_ == kKdSuccess) return LegendGroup{identifier_, name_, {}, {}, {}};
+    setError(error, status_, "error extracting driver info");
+    return std::nullopt;
   }
 
  private:
@@ -49,18 +48,23 @@ class Publisher {
 };
 
 // The channels of one legend group. kKdError when one cannot be built or filed.
-KdStatus addGroupChannels(ChannelCollection& collection, Publisher& publisher, const PlistDictionary& group,
-                          const PlistArray& entries, std::uint32_t options) {
-  const PlistValue groupName = stringOrNone(group.get(kd_report_key::kGroupName));
-  const PlistValue subGroupName = stringOrNone(group.get(kd_report_key::kSubGroupName));
-  const PlistValue info = dictionaryOrNone(group.get(kd_report_key::kChannelInfo));
-  for (const PlistValue& entry : entries) {
-    if (entry.asArray() == nullptr) break;
-    const KdReportChannel channel = publisher.channel(entry, nullptr);
-    if (channel == nullptr) return kKdError;
-    channel->groupName = groupName;
-    channel->subGroupName = subGroupName;
-    channel->channelInfo = info;
+KdStatus addGroupChannels(ChannelCollection& collection, Publisher& publisher,
+                          const PlistDictionary& legendGroup, const PlistArray& entries,
+                          std::uint32_t options) {
+  if (entries.empty() || entries.front().asArray() == nullptr) return kKdSuccess;
+  auto described = publisher.group(nullptr);
+  if (!described) return kKdError;
+  described->groupName = stringOrNone(legendGroup.get(kd_report_key::kGroupName));
+  described->subGroupName = stringOrNone(legendGroup.get(kd_report_key::kSubGroupName));
+  described->channelInfo = dictionaryOrNone(legendGroup.get(kd_report_key::kChannelInfo));
+  const auto group = std::make_shared<const LegendGroup>(std::move(*described));
+  ObjectBlocks<ChannelSource> sources(entries.size());
+  ObjectBlocks<ChannelRecord> records(entries.size());
+  for (const PlistValue& value : entries) {
+    if (value.asArray() == nullptr) break;
+    auto entry = usableLegendEntry(value, *group, nullptr);
+    if (!entry) return kKdError;
+    const KdReportChannel channel = records.add(ChannelRecord(sources.add({group, std::move(entry)})));
     if (_addChannel(&collection, channel, options) != kKdSuccess) return kKdError;
   }
   return kKdSuccess;
@@ -178,9 +182,12 @@ KdReportCollection KdReportCopyChannelsWithID(DriverRegistry& registry, const Pl
   const PlistValue entry = PlistValue::array({PlistValue::int64(channelID), PlistValue::int64(0)});
   bool isExplained = false;
   const KdStatus status = walkMatchingDrivers(registry, matching, [&](KdHandle driver) {
-    const KdReportChannel channel = Publisher(registry, driver).channel(entry, error);
+    const auto group = Publisher(registry, driver).group(error);
+    auto usable = group ? usableLegendEntry(entry, *group, error) : std::nullopt;
     const bool isFiled =
-        channel != nullptr && _addChannel(all.get(), channel, kKdReportFlat, error) == kKdSuccess;
+        usable &&
+        _addChannel(all.get(), makeChannelRecord(std::make_shared<const LegendGroup>(*group), usable),
+                    kKdReportFlat, error) == kKdSuccess;
     isExplained = !isFiled;
     return isFiled ? kKdSuccess : kKdError;
   });

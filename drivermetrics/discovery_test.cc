@@ -167,8 +167,8 @@ TEST_F(Discovery, SelectsByCategoryFormatUnitAndGroup) {
 }
 
 TEST(ChannelRecords, AnswerForWhatIsMissing) {
-  ChannelRecord empty;
-  for (ChannelRecord* channel : {&empty, static_cast<ChannelRecord*>(nullptr)}) {
+  const KdReportChannel empty = testing::emptyChannel();
+  for (ChannelRecord* channel : {empty.get(), static_cast<ChannelRecord*>(nullptr)}) {
     EXPECT_EQ(KdReportChannelGetDriverID(channel), kKdReportInvalid);
     EXPECT_EQ(KdReportChannelGetChannelID(channel), kKdReportInvalid);
     EXPECT_EQ(KdReportChannelGetFormat(channel), 0);
@@ -181,7 +181,7 @@ TEST(ChannelRecords, AnswerForWhatIsMissing) {
   }
   const KdReportCollection byDriver = KdReportCreateAggregate(kKdReportFileByDriver);
   std::optional<ReportError> error;
-  EXPECT_EQ(_addChannel(byDriver.get(), std::make_shared<ChannelRecord>(), 1, &error), kKdError);
+  EXPECT_EQ(_addChannel(byDriver.get(), testing::emptyChannel(), 1, &error), kKdError);
   EXPECT_EQ(error->reason, "_addChannel() failed");
   EXPECT_EQ(KdReportAddChannelDescription(byDriver.get(), {.channelID = kKdReportInvalid}, &error), kKdError);
   EXPECT_EQ(KdReportAddChannelDescription(

@@ -103,8 +103,9 @@ std::int64_t KdReportHistogramGetMaxValue(const ChannelRecord* channel) {
 KdStatus KdReportHistogramGetBucketBounds(ChannelRecord* channel, std::int32_t bucket, std::int64_t* lower,
                                           std::int64_t* upper) {
   if (channel == nullptr) return kKdError;
-  if (channel->processedChannelConfig.isNone()) channel->processedChannelConfig = boundsOf(*channel);
-  const PlistArray* bounds = channel->processedChannelConfig.asArray();
+  if (channel->cached().processedChannelConfig.isNone())
+    channel->cache(&CachedAnswers::processedChannelConfig, boundsOf(*channel));
+  const PlistArray* bounds = channel->cached().processedChannelConfig.asArray();
   if (bounds == nullptr || bucket < 0 || static_cast<std::size_t>(bucket) >= bounds->size()) return kKdError;
   const auto place = static_cast<std::size_t>(bucket);
   const std::int64_t above = integerOrInvalid((*bounds)[place]);

@@ -14,10 +14,24 @@ inline ChannelType channelType(unsigned format, unsigned elements = 1, unsigned 
 // A record as discovery makes it, of the driver "D<driver>".
 inline KdReportChannel channelOf(std::int64_t driver, std::int64_t identifier,
                                  ChannelType type = channelType(1)) {
-  return makeChannelRecord(PlistValue::int64(driver), PlistValue::string("D" + std::to_string(driver)),
-                           PlistValue::array({PlistValue::int64(identifier),
-                                              PlistValue::int64(static_cast<std::int64_t>(type.bits))}),
-                           nullptr);
+  const LegendGroup group{
+      PlistValue::int64(driver), PlistValue::string("D" + std::to_string(driver)), {}, {}, {}};
+  return makeChannelRecord(
+      std::make_shared<LegendGroup>(group),
+      LegendEntry{
+          PlistValue::int64(identifier), PlistValue::int64(static_cast<std::int64_t>(type.bits)), {}});
+}
+
+// A record without any key.
+inline KdReportChannel emptyChannel() {
+  return makeChannelRecord(std::make_shared<LegendGroup>(), std::nullopt);
+}
+
+// The record's group, to be changed.
+inline LegendGroup& groupOf(ChannelRecord& channel) {
+  auto group = std::make_shared<LegendGroup>(channel.group());
+  channel.source->group = group;
+  return *group;
 }
 
 inline KdReportCollection collectionOf(const std::vector<KdReportChannel>& channels,
@@ -59,9 +73,10 @@ inline void appendElement(PlistData& bytes, std::int64_t driver, std::int64_t id
 inline KdReportChannel sampled(ChannelType type, const std::vector<Element>& elements,
                                PlistDictionary info = {}) {
   KdReportChannel channel = channelOf(1, 0x4348, type);
-  channel->channelInfo = PlistValue::dictionary(std::move(info));
-  channel->rawElements = std::make_shared<PlistData>();
-  for (const Element& element : elements) appendElement(*channel->rawElements, 1, 0x4348, type, element);
+  groupOf(*channel).channelInfo = PlistValue::dictionary(std::move(info));
+  PlistData bytes;
+  for (const Element& element : elements) appendElement(bytes, 1, 0x4348, type, element);
+  channel->rawElements = ElementData(bytes);
   return channel;
 }
 

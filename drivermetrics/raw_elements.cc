@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "drivermetrics/object_blocks.h"
 #include "platform/byte_reader.h"
 
 namespace tbdaily {
@@ -47,16 +48,18 @@ bool RawElements::copyFrom(const RawElements& other) {
 }
 
 std::optional<RawElements> getRawElements(const ChannelRecord* channel, std::uint8_t format) {
-  if (channel == nullptr || channel->rawElements == nullptr) return std::nullopt;
-  const std::span<std::byte> bytes(*channel->rawElements);
+  if (channel == nullptr) return std::nullopt;
+  const std::span<std::byte> bytes = channel->rawElements.bytes();
   if (bytes.size() < kElementSize || ByteReader(bytes).at<std::uint8_t>(element_offset::kType) != format)
     return std::nullopt;
   return RawElements(bytes, static_cast<std::uint16_t>(bytes.size() / kElementSize));
 }
 
-KdStatus cloneElements(ChannelRecord& destination, const ChannelRecord& source, ElementValues values) {
-  if (source.rawElements == nullptr) return kKdError;
-  destination.rawElements = std::make_shared<PlistData>(*source.rawElements);
+KdStatus cloneElements(ChannelRecord& destination, const ChannelRecord& source, ElementValues values,
+                       ElementBlocks* memory) {
+  if (!source.rawElements) return kKdError;
+  const auto bytes = source.rawElements.bytes();
+  destination.rawElements = memory != nullptr ? memory->copy(bytes) : ElementData(bytes);
   if (values == ElementValues::Keep) return kKdSuccess;
   auto elements = getRawElements(&destination, KdReportChannelGetFormat(&destination));
   if (!elements) return kKdError;

@@ -8,6 +8,8 @@
 
 namespace tbdaily {
 
+class ElementBlocks;
+
 inline constexpr std::size_t kElementSize = 64;
 inline constexpr std::size_t kElementWords = 4;
 
@@ -46,6 +48,8 @@ enum class ElementValues : std::uint8_t { Keep, Invalidate };
 
 // Gives `destination` a copy of its own of the source's elements, when asked with every value word invalid.
 // kKdError when the source has none, or when they are not of the destination's format (the copy stays).
-KdStatus cloneElements(ChannelRecord& destination, const ChannelRecord& source, ElementValues values);
+// They lie in `memory` when it is given.
+KdStatus cloneElements(ChannelRecord& destination, const ChannelRecord& source, ElementValues values,
+                       ElementBlocks* memory = nullptr);
 
 }  // namespace tbdaily

@@ -1,9 +1,12 @@
 // Samples: copies of the subscribed channels that carry their elements of a moment.
 
+#include <algorithm>
 #include <bit>
-#include <unordered_map>
+#include <utility>
+#include <vector>
 
 #include "drivermetrics/channel_collection.h"
+#include "drivermetrics/object_blocks.h"
 #include "drivermetrics/raw_elements.h"
 #include "drivermetrics/report_error.h"
 #include "drivermetrics/subscription.h"
@@ -15,7 +18,7 @@ namespace {
 
 // The channels of a sample buffer, found by their identifiers. The buffer is a chain: each channel's first
 // element says how many it has, and the next channel begins behind them. The first channel with given
-// identifiers counts. Announced lengths are checked here, once: the buffer may change while it is read.
+// identifiers counts.
 class SampleBuffer {
  public:
   // How the chain ends.
@@ -24,55 +27,76 @@ class SampleBuffer {
     Overrun,   // a channel announces more elements than are left
     NoLength,  // a channel announces none
   };
-  struct Found {
+  struct Channel {
     ChannelType type;
     std::span<const std::byte> elements;  // empty when they run over the end
   };
 
   explicit SampleBuffer(std::span<const std::byte> buffer)
-      : buffer_(buffer.first(buffer.size() / kElementSize * kElementSize)) {
-    const ByteReader reader(buffer_);
-    std::size_t at = 0;
-    for (; at < buffer_.size();) {
-      const ChannelType type{*reader.at<std::uint64_t>(at + element_offset::kType)};
-      if (type.elementCount() == 0) {
-        end_ = End::NoLength;
-        return;
-      }
-      const std::size_t size = type.elementCount() * kElementSize;
-      const bool fits = size <= buffer_.size() - at;
-      const Key key{*reader.at<std::uint64_t>(at + element_offset::kProvider),
-                    *reader.at<std::uint64_t>(at + element_offset::kChannel)};
-      channels_.try_emplace(key,
-                            Found{type, fits ? buffer_.subspan(at, size) : std::span<const std::byte>()});
-      at += size;
-    }
-    end_ = at == buffer_.size() ? End::Exact : End::Overrun;
+      : buffer_(buffer.first(std::min(buffer.size() / kElementSize, kMostElements) * kElementSize)) {
+    slots_.resize(std::bit_ceil(2 * (buffer_.size() / kElementSize) + 1), kFree);
+    end_ = walkChain([this](std::size_t element) {
+      std::uint32_t& slot = slotOf(identifiersAt(element));
+      if (slot == kFree) slot = static_cast<std::uint32_t>(element);
+    });
   }
 
-  // Null when the chain ends before such a channel.
-  const Found* find(const ChannelRecord& channel) const {
-    const auto found = channels_.find({static_cast<std::uint64_t>(KdReportChannelGetDriverID(&channel)),
-                                       static_cast<std::uint64_t>(KdReportChannelGetChannelID(&channel))});
-    return found != channels_.end() ? &found->second : nullptr;
+  // None when the chain ends before such a channel.
+  std::optional<Channel> find(const ChannelRecord& channel) {
+    const std::uint32_t element = slotOf({static_cast<std::uint64_t>(KdReportChannelGetDriverID(&channel)),
+                                          static_cast<std::uint64_t>(KdReportChannelGetChannelID(&channel))});
+    if (element == kFree) return std::nullopt;
+    // Read once, then checked: the buffer may change meanwhile.
+    const ChannelType type = typeAt(element);
+    const std::size_t offset = element * kElementSize, size = type.elementCount() * kElementSize;
+    return Channel{
+        type, size <= buffer_.size() - offset ? buffer_.subspan(offset, size) : std::span<const std::byte>()};
   }
   End end() const { return end_; }
 
  private:
-  struct Key {
-    std::uint64_t provider, channel;
-    friend bool operator==(const Key&, const Key&) = default;
-  };
-  struct KeyHash {
-    std::size_t operator()(const Key& key) const {
-      constexpr std::uint64_t kOdd = 0x9E3779B97F4A7C15;
-      return (std::rotl(key.provider * kOdd, 32) ^ key.channel) * kOdd;
+  using Identifiers = std::pair<std::uint64_t, std::uint64_t>;  // driver, channel
+
+  static constexpr std::size_t kMostElements = 0xFFFFFFFF;
+  static constexpr std::uint32_t kFree = 0xFFFFFFFF;
+
+  // Hands the first element of each channel to the step.
+  template <typename Step>
+  End walkChain(const Step& step) const {
+    const std::size_t end = buffer_.size() / kElementSize;
+    std::size_t element = 0;
+    while (element < end) {
+      const std::size_t count = typeAt(element).elementCount();
+      if (count == 0) return End::NoLength;
+      step(element);
+      element += count;
     }
-  };
+    return element == end ? End::Exact : End::Overrun;
+  }
+
+  std::uint64_t fieldAt(std::size_t element, std::size_t offset) const {
+    return *ByteReader(buffer_).at<std::uint64_t>(element * kElementSize + offset);
+  }
+  ChannelType typeAt(std::size_t element) const { return {fieldAt(element, element_offset::kType)}; }
+  Identifiers identifiersAt(std::size_t element) const {
+    return {fieldAt(element, element_offset::kProvider), fieldAt(element, element_offset::kChannel)};
+  }
+
+  // The slot that holds the channel's first element, or the free one where it belongs.
+  std::uint32_t& slotOf(const Identifiers& wanted) {
+    constexpr std::uint64_t kOdd = 0x9E3779B97F4A7C15;
+    const std::uint64_t hash = (std::rotl(wanted.first * kOdd, 32) ^ wanted.second) * kOdd;
+    std::size_t slot = static_cast<std::size_t>(hash >> 32) & (slots_.size() - 1);
+    for (std::size_t tried = 1; tried < slots_.size(); ++tried) {
+      if (slots_[slot] == kFree || identifiersAt(slots_[slot]) == wanted) break;
+      slot = (slot + 1) & (slots_.size() - 1);
+    }
+    return slots_[slot];
+  }
 
   std::span<const std::byte> buffer_;
-  std::unordered_map<Key, Found, KeyHash> channels_;
-  End end_ = End::Exact;
+  End end_;
+  std::vector<std::uint32_t> slots_;  // open addressing, a power of two long, at most half full
 };
 
 // Fills copies of the subscribed channels from a buffer.
@@ -81,11 +105,11 @@ class Sampler {
   explicit Sampler(std::span<const std::byte> buffer) : buffer_(buffer) {}
 
   std::uint32_t operator()(ChannelRecord& copy) {
-    const SampleBuffer::Found* found = buffer_.find(copy);
-    if (found == nullptr) return answerForMissing();
+    const auto found = buffer_.find(copy);
+    if (!found) return answerForMissing();
     if (found->elements.empty()) return leaveOut();
     if (KdReportChannelGetFormat(&copy) == kKdReportUnknownFormat) setChannelType(&copy, found->type);
-    copy.rawElements = std::make_shared<PlistData>(found->elements.begin(), found->elements.end());
+    copy.rawElements = memory_.copy(found->elements);
     return kKdReportKeep;
   }
 
@@ -109,6 +133,7 @@ class Sampler {
   }
 
   SampleBuffer buffer_;
+  ElementBlocks memory_;
   KdStatus status_ = kKdError;
 };
 

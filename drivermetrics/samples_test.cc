@@ -81,7 +81,7 @@ TEST(Subscription, LeavesNothingBehindWhenAStepFails) {
   const KdReportCollection odd = KdReportCreateAggregateFromPropertyList(
       PlistValue::dictionary({{"KdReportChannels", PlistValue::array({PlistValue::int64(1)})}}));
   EXPECT_EQ(device.failure(odd), "iteration error " + code(kKdBadArgument));
-  EXPECT_EQ(device.failure(collectionOf({std::make_shared<ChannelRecord>()})),
+  EXPECT_EQ(device.failure(collectionOf({testing::emptyChannel()})),
             "createInterestList() failed " + code(kKdNoMemory));
   EXPECT_EQ(device.failure(good, std::pmr::null_memory_resource()), noReason + code(kKdNoMemory));
   const std::vector<std::tuple<KdStatus&, KdStatus, std::string>> steps = {
@@ -115,7 +115,7 @@ std::string sample(const KdReportCollection& channels, const PlistData& buffer) 
   std::string outcome;
   for (const ChannelRecord* channel : channelsIn(samples.get())) {
     outcome += std::to_string(KdReportChannelGetChannelID(channel)) + ":";
-    outcome += std::to_string(channel->rawElements ? channel->rawElements->size() / kElementSize : 0) + " ";
+    outcome += std::to_string(channel->rawElements.bytes().size() / kElementSize) + " ";
   }
   return outcome;
 }
@@ -166,7 +166,7 @@ TEST(Samples, FindOutUnknownTypesForTheSubscribedRecordToo) {
   buffer.assign(buffer.size(), std::byte{0xFF});
   EXPECT_EQ(KdReportChannelGetFormat(channelsIn(subscribed.get())[0]), 4);
   EXPECT_EQ(KdReportArrayGetValueAtIndex(channelsIn(samples.get())[0], 4), 5);
-  EXPECT_EQ(channelsIn(subscribed.get())[0]->rawElements, nullptr);
+  EXPECT_FALSE(channelsIn(subscribed.get())[0]->rawElements);
   EXPECT_EQ(KdReportCreateSamplesRaw(subscribed.get(), std::nullopt), nullptr);
 }
 

@@ -55,8 +55,8 @@ std::uint32_t KdReportStateGetIndexForID(const ChannelRecord* channel, std::int6
 
 std::optional<std::string_view> KdReportStateGetNameForIndex(ChannelRecord* channel, std::int32_t index) {
   if (channel == nullptr) return std::nullopt;
-  if (channel->stateNames.isNone()) channel->stateNames = namesOf(*channel);
-  const PlistArray* names = channel->stateNames.asArray();
+  if (channel->cached().stateNames.isNone()) channel->cache(&CachedAnswers::stateNames, namesOf(*channel));
+  const PlistArray* names = channel->cached().stateNames.asArray();
   if (names == nullptr || index < 0 || static_cast<std::size_t>(index) >= names->size()) return std::nullopt;
   return (*names)[static_cast<std::size_t>(index)].asString();
 }

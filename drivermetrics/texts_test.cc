@@ -74,7 +74,7 @@ TEST(Descriptions, OfChannels) {
   EXPECT_EQ(KdReportChannelCopyDescription(channel.get(), 0, "> "),
             "> D1 CH < 0x4348 (ns) | G/g (none)/(none) | cat 0x100 | format 0x01 | elts 1 >\n");
   const auto bare = testing::channelOf(1, 0xFF, channelType(0, 0));
-  bare->groupName = PlistValue::string("G");
+  testing::groupOf(*bare).groupName = PlistValue::string("G");
   EXPECT_EQ(KdReportChannelCopyDescription(bare.get(), 0, {}),
             "D1 (null) < 0xff ((null)) | G/g G/(none) | cat 0000 | format 0000 | elts 0 >\n");
   EXPECT_EQ(KdReportChannelCopyDescription(nullptr, 0, {}), std::nullopt);
@@ -110,9 +110,10 @@ TEST(Descriptions, OfSamples) {
   EXPECT_EQ(describe(sampled(channelType(5), {{}})), "none");
   EXPECT_EQ(describe(testing::channelOf(1, 2)), "none");
 
-  const auto nameless = sampled(channelType(1), {});
-  (*nameless->legendChannel)[0] = PlistValue::int64(0x123456789A);
-  testing::appendElement(*nameless->rawElements, 1, 0x123456789A, channelType(1));
+  const auto nameless = testing::channelOf(1, 0x123456789A);
+  PlistData bytes;
+  testing::appendElement(bytes, 1, 0x123456789A, channelType(1));
+  nameless->rawElements = ElementData(bytes);
   EXPECT_EQ(describe(nameless), ">                       0x1234567 = {            0 (null) }\n");
 }
 

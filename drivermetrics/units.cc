@@ -124,11 +124,12 @@ std::optional<std::string> copyUnitLabel(std::int64_t unit) {
 
 std::optional<std::string_view> KdReportChannelGetUnitLabel(ChannelRecord* channel) {
   if (channel == nullptr) return std::nullopt;
-  if (channel->unitLabel.isNone()) {
-    if (const auto label = copyUnitLabel(KdReportChannelGetUnit(channel)))
-      channel->unitLabel = PlistValue::string(*label);
+  if (channel->cached().unitLabel.isNone()) {
+    const auto label = copyUnitLabel(KdReportChannelGetUnit(channel));
+    if (!label) return std::nullopt;
+    channel->cache(&CachedAnswers::unitLabel, PlistValue::string(*label));
   }
-  return channel->unitLabel.asString();
+  return channel->cached().unitLabel.asString();
 }
 
 PlistValue KdReportCreateUnitInfo(std::int64_t unit) {

@@ -50,7 +50,7 @@ TEST(Values, Histogram) {
   EXPECT_EQ(KdReportHistogramGetMinValue(histogram.get()), 11);
   EXPECT_EQ(KdReportHistogramGetMaxValue(histogram.get()), 19);
   // Elements that are not as many as the type says cannot be read.
-  histogram->rawElements->resize(2 * kElementSize);
+  histogram->rawElements = ElementData(histogram->rawElements.bytes().first(2 * kElementSize));
   EXPECT_EQ(KdReportHistogramGetBucketHits(histogram.get(), 1), kNone);
   EXPECT_EQ(KdReportHistogramGetMinValue(histogram.get()), kNone);
   EXPECT_EQ(KdReportStateGetCount(histogram.get()), kKdReportNoIndex);
@@ -94,7 +94,8 @@ TEST(Values, HistogramBounds) {
       found.push_back(upper);
     }
     EXPECT_EQ(found, bounds);
-    EXPECT_EQ(histogram->processedChannelConfig.isNone(), bounds.empty()) << "only what is right is cached";
+    EXPECT_EQ(histogram->cached().processedChannelConfig.isNone(), bounds.empty())
+        << "only what is right is cached";
     EXPECT_EQ(KdReportHistogramGetBucketBounds(histogram.get(), -1, nullptr, nullptr), kKdError);
   }
 }
@@ -118,7 +119,7 @@ TEST(Values, States) {
   EXPECT_TRUE(std::isnan(KdReportStateGetDutyCycle(idle.get(), 0)));
   EXPECT_EQ(KdReportStateGetNameForIndex(idle.get(), 0), std::nullopt)
       << "one state without a name, no names";
-  EXPECT_TRUE(idle->stateNames.isNone());
+  EXPECT_TRUE(idle->cached().stateNames.isNone());
 }
 
 struct DeltaCase {
@@ -177,7 +178,7 @@ TEST(Deltas, CollectionsCarryChannelsWithoutAPartner) {
   EXPECT_THAT(wordsOf(channels[1]), ElementsAre(1, 2, 3, 4));
   EXPECT_EQ(KdReportSimpleGetIntegerValue(a.get()), 5);
 
-  a->rawElements.reset();
+  a->rawElements = {};
   EXPECT_EQ(KdReportCreateSamplesDelta(before.get(), after.get()), nullptr);
 }
 
