@@ -1,8 +1,8 @@
 // Channels and samples as readable text.
 
-#include "drivermetrics/raw_elements.h"
 #include "drivermetrics/text_format.h"
 #include "drivermetrics/units.h"
+#include "drivermetrics/values.h"
 
 namespace tbdaily {
 
@@ -22,6 +22,9 @@ std::string objectText(const std::optional<std::string_view>& text) {
 struct Line {
   ChannelRecord& channel;
   std::string prefix, name, unitLabel;
+  // Of state channels: all states have names, or none has.
+  bool hasStateNames = false;
+  double residency = 0;  // of all states
 };
 
 std::string displayName(ChannelRecord& channel, const RawElements& elements) {
@@ -40,17 +43,18 @@ LineText simpleLine(const Line& line, std::int32_t) {
 
 LineText stateLine(const Line& line, std::int32_t index) {
   const auto unsignedOf = [](std::int64_t value) { return static_cast<std::uint64_t>(value); };
-  const auto name = KdReportStateGetNameForIndex(&line.channel, index);
+  const auto name = line.hasStateNames ? KdReportStateGetNameForIndex(&line.channel, index) : std::nullopt;
   const std::string state =
       name ? std::string(*name)
            : alternateHexadecimal(unsignedOf(KdReportStateGetIDForIndex(&line.channel, index)))
                  .substr(0, kLongestStateID);
-  const double seconds = KdReportScaleValue(unsignedOf(KdReportStateGetResidency(&line.channel, index)),
-                                            KdReportChannelGetUnit(&line.channel), kSecondsUnit);
+  const std::int64_t residency = KdReportStateGetResidency(&line.channel, index);
+  const double seconds =
+      KdReportScaleValue(unsignedOf(residency), KdReportChannelGetUnit(&line.channel), kSecondsUnit);
   return formatText("%s%20s[%8s] = { # %-8llu %9.3e %s / %4.1f%% }\n", line.prefix.c_str(), line.name.c_str(),
                     state.c_str(),
                     static_cast<unsigned long long>(KdReportStateGetInTransitions(&line.channel, index)),
-                    seconds, "s", KdReportStateGetDutyCycle(&line.channel, index) * kPercent);
+                    seconds, "s", shareOfResidency(residency, line.residency) * kPercent);
 }
 
 LineText histogramLine(const Line& line, std::int32_t bucket) {
@@ -114,8 +118,12 @@ std::optional<std::string> KdReportSampleCopyDescription(ChannelRecord* channel,
   const std::uint8_t format = KdReportChannelGetFormat(channel);
   const auto elements = getRawElements(channel, format);
   if (!elements) return std::nullopt;
-  const Line line{*channel, std::string(prefix.value_or("")), displayName(*channel, *elements),
-                  objectText(KdReportChannelGetUnitLabel(channel))};
+  Line line{*channel, std::string(prefix.value_or("")), displayName(*channel, *elements),
+            objectText(KdReportChannelGetUnitLabel(channel))};
+  if (format == kKdReportState) {
+    line.hasStateNames = KdReportStateGetNameForIndex(channel, 0).has_value();
+    line.residency = residencyOfAllStates(channel);
+  }
   std::string text;
   for (std::int32_t element = 0; element < std::int32_t{elements->count()}; ++element) {
     const LineText added = elementLine(line, format, element);

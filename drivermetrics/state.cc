@@ -61,18 +61,25 @@ std::optional<std::string_view> KdReportStateGetNameForIndex(ChannelRecord* chan
   return (*names)[static_cast<std::size_t>(index)].asString();
 }
 
-double KdReportStateGetDutyCycle(const ChannelRecord* channel, std::int32_t index) {
+double residencyOfAllStates(const ChannelRecord* channel) {
   constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
   const auto states = announcedRawElements(channel, kKdReportState);
-  if (!states || index < 0 || index >= std::int32_t{states->count()}) return kNone;
   double all = 0;
-  for (std::size_t i = 0; i < states->count(); ++i) {
+  for (std::size_t i = 0; states && i < states->count(); ++i) {
     const std::int64_t residency = states->word(i, state_word::kResidency);
     if (residency == kKdReportInvalid) return kNone;
     all += static_cast<double>(residency);
   }
-  if (all == 0) return kNone;
-  return static_cast<double>(states->word(static_cast<std::size_t>(index), state_word::kResidency)) / all;
+  return all != 0 ? all : kNone;
+}
+
+double shareOfResidency(std::int64_t residency, double all) {
+  if (residency == kKdReportInvalid) return std::numeric_limits<double>::quiet_NaN();
+  return static_cast<double>(residency) / all;
+}
+
+double KdReportStateGetDutyCycle(const ChannelRecord* channel, std::int32_t index) {
+  return shareOfResidency(KdReportStateGetResidency(channel, index), residencyOfAllStates(channel));
 }
 
 std::uint32_t KdReportStateGetCurrent(const ChannelRecord* channel) {

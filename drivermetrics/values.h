@@ -28,4 +28,9 @@ std::optional<RawElements> announcedRawElements(const ChannelRecord* channel, st
 std::int64_t elementWord(const ChannelRecord* channel, std::uint8_t format, std::int32_t index,
                          std::size_t word);
 
+// The time spent in all states of a channel; not a number when there is none or one cannot be read. Who asks
+// for the share of each state adds them up once.
+double residencyOfAllStates(const ChannelRecord* channel);
+double shareOfResidency(std::int64_t residency, double all);
+
 }  // namespace tbdaily

@@ -64,12 +64,19 @@ SocketResult connectUnixSocket(const std::filesystem::path& path) {
 SocketResult listenUnixSocket(const std::filesystem::path& path) {
   FileDescriptor fd(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
   if (!fd.isOpen()) return {FileDescriptor(), errno};
+  // Under another name until it listens: whoever sees the socket can connect to it.
+  std::filesystem::path unready = path;
+  unready += ".starting";
+  ::unlink(unready.c_str());
   const mode_t mask = ::umask(0177);
-  const int error =
-      withAddress(path, [&fd](const sockaddr* a, socklen_t n) { return ::bind(fd.get(), a, n); });
+  int error = withAddress(unready, [&fd](const sockaddr* a, socklen_t n) { return ::bind(fd.get(), a, n); });
   ::umask(mask);
   if (error != 0) return {FileDescriptor(), error};
-  if (::listen(fd.get(), SOMAXCONN) != 0) return {FileDescriptor(), errno};
+  if (::listen(fd.get(), SOMAXCONN) != 0 || ::rename(unready.c_str(), path.c_str()) != 0) {
+    error = errno;
+    ::unlink(unready.c_str());
+    return {FileDescriptor(), error};
+  }
   return {std::move(fd), 0};
 }
 

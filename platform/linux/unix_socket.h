@@ -16,7 +16,8 @@ struct SocketResult {
 // A connection to the socket at the path.
 SocketResult connectUnixSocket(const std::filesystem::path& path);
 
-// A listening, non-blocking socket of mode 0600 at the path, where nothing may be yet.
+// A listening, non-blocking socket of mode 0600 at the path, in the place of whatever is there. It appears
+// when it can be connected to; the caller sees to it that nobody else makes it at the same time.
 SocketResult listenUnixSocket(const std::filesystem::path& path);
 
 // The first listening Unix stream socket that the service manager passed to this process (LISTEN_PID,

@@ -4,8 +4,8 @@
 #include <array>
 #include <cmath>
 
-#include "drivermetrics/raw_elements.h"
 #include "drivermetrics/units.h"
+#include "drivermetrics/values.h"
 
 namespace tbdaily {
 
@@ -34,19 +34,9 @@ ChannelValues readDescription(ChannelRecord& channel) {
   return values;
 }
 
-// As KdReportStateGetDutyCycle, which adds all residencies up for each state: too slow for thousands.
-void addDutyCycles(std::vector<StateValues>& states) {
-  double all = 0;
-  for (const StateValues& state : states) {
-    if (state.residency == kKdReportInvalid) return;
-    all += static_cast<double>(state.residency);
-  }
-  if (all == 0) return;
-  for (StateValues& state : states) state.dutyCycle = static_cast<double>(state.residency) / all;
-}
-
 void readStates(ChannelRecord& channel, ChannelValues& values) {
   values.states.resize(values.elementCount);
+  const double all = residencyOfAllStates(&channel);
   bool named = true;  // all states have names, or none has
   for (std::int32_t i = 0; i < values.elementCount; ++i) {
     StateValues& state = values.states[static_cast<std::size_t>(i)];
@@ -55,8 +45,8 @@ void readStates(ChannelRecord& channel, ChannelValues& values) {
     named = state.name.has_value();
     state.entries = KdReportStateGetInTransitions(&channel, i);
     state.residency = KdReportStateGetResidency(&channel, i);
+    state.dutyCycle = shareOfResidency(state.residency, all);
   }
-  addDutyCycles(values.states);
   values.currentState = KdReportStateGetCurrent(&channel);
 }
 
