@@ -86,6 +86,35 @@ TEST_F(Discovery, ReadsALegendUntilItIsMalformed) {
   registry_.KdObjectRelease(handle);
 }
 
+TEST_F(Discovery, TakesAnyKindOfValueInALegend) {
+  const std::string failed = "createPVErr() passed a NULL string! 700";
+  for (const PlistValue& odd :
+       {PlistValue::boolean(true), PlistValue::string("S"), PlistValue::int64(INT64_MIN),
+        PlistValue::float64(1.5), PlistValue::data(PlistData(3)), PlistValue::array({}),
+        PlistValue::dictionary({}), PlistValue(PlistDate{1})}) {
+    const bool isString = odd.asString().has_value(), isArray = odd.asArray() != nullptr;
+    const auto groupWith = [&odd](const char* key) {
+      PlistDictionary fields = *group("G", "S", {entry(0x41, 1)}).asDictionary();
+      fields.set(key, odd);
+      return PlistValue::array({PlistValue::dictionary(fields)});
+    };
+    const auto entryWith = [&odd](std::size_t place) {
+      PlistArray places = *entry(0x41, 1, "A").asArray();
+      places[place] = odd;
+      return PlistValue::array({group("G", "S", {PlistValue::array(places)})});
+    };
+    const std::string number = odd.asNumber() && odd.asNumber()->isReal() ? "A " : failed;
+    EXPECT_EQ(read(groupWith("KdReportGroupName"), 3), isString ? "A " : "") << "a subgroup needs a group";
+    EXPECT_EQ(read(groupWith("KdReportSubGroupName"), 3), "A ");
+    EXPECT_EQ(read(groupWith("KdReportChannelInfo"), 3), "A ");
+    EXPECT_EQ(read(groupWith("KdReportChannels"), 3), "");
+    EXPECT_EQ(read(PlistValue::array({group("G", "S", {odd})}), 3), isArray ? failed : "");
+    EXPECT_EQ(read(entryWith(0), 3), number);
+    EXPECT_EQ(read(entryWith(1), 3), number);
+    EXPECT_EQ(read(entryWith(2), 3), isString ? "S " : "A ");
+  }
+}
+
 TEST_F(Discovery, FilesChannelsByDriverGroupAndSubgroup) {
   registry_.drivers = {driver(0x2A, "D",
                               PlistValue::array({group("G", "S", {entry(1, 0x1000001, "a")}),

@@ -122,6 +122,43 @@ TEST(Values, States) {
   EXPECT_TRUE(idle->cached().stateNames.isNone());
 }
 
+TEST(Values, OfElementsOfEveryLengthAndFormat) {
+  for (unsigned format = 0; format <= 5; ++format) {
+    const auto whole = sampled(channelType(format, 2), {{1, {kOn, 1, 2, 3}}, {2, {kOff, 4, 5, 6}}},
+                               {{"KdReportChannelConfig", PlistValue::data(bucketConfig({{10, 0, 2}}))}});
+    for (unsigned announced = 0; announced <= 3; ++announced) {
+      for (unsigned carried = 0; carried <= 5; ++carried) {  // the format that the elements carry
+        for (std::size_t length = 0; length <= 2 * kElementSize; length += 7) {
+          const auto channel = sampled(channelType(format, announced), {});
+          channel->source->group = whole->source->group;
+          PlistData bytes(whole->rawElements.bytes().begin(), whole->rawElements.bytes().end());
+          bytes[16] = static_cast<std::byte>(carried);
+          channel->rawElements = ElementData(std::span(bytes).first(length));
+          const std::size_t elements = length / kElementSize;
+          const bool isReadable = elements > 0 && carried == format;
+          const bool isComplete = isReadable && elements == announced;
+          const auto is = [format](unsigned f, bool condition) { return format == f && condition; };
+          const ChannelRecord* c = channel.get();
+          EXPECT_EQ(KdReportSimpleGetIntegerValue(c) != kNone, carried == 1 && elements == 1);
+          EXPECT_EQ(KdReportArrayGetValueAtIndex(c, 4) != kNone, carried == 4 && elements > 1);
+          EXPECT_EQ(KdReportHistogramGetBucketHits(c, 0) != kNone, is(3, isComplete));
+          EXPECT_EQ(KdReportHistogramGetMinValue(c) != kNone, is(3, isComplete));
+          EXPECT_EQ(KdReportHistogramGetMaxValue(c) != kNone, is(3, isComplete));
+          EXPECT_EQ(KdReportStateGetResidency(c, 0) != kNone, is(2, isComplete));
+          EXPECT_EQ(KdReportStateGetNameForIndex(channel.get(), 0).has_value(), is(2, isComplete));
+          EXPECT_EQ(KdReportStateGetCurrent(c) != kKdReportNoIndex, is(2, isComplete));
+          EXPECT_EQ(KdReportSampleCreateDelta(c, c) != nullptr, is(1, isReadable && elements == 1) ||
+                                                                    is(4, isReadable) || is(2, isComplete) ||
+                                                                    is(3, isComplete));
+          EXPECT_EQ(
+              KdReportSampleCopyDescription(channel.get(), 0, "").has_value(),
+              isReadable && format >= 1 && format <= 4 && (format != 3 || (isComplete && announced == 2)));
+        }
+      }
+    }
+  }
+}
+
 struct DeltaCase {
   KdReportChannel earlier, later;
   std::vector<std::int64_t> words;  // empty: the delta fails
