@@ -1,5 +1,7 @@
 // Making collections and filing channels in them.
 
+#include <limits>
+
 #include "drivermetrics/channel_collection.h"
 #include "drivermetrics/report_error.h"
 
@@ -76,7 +78,10 @@ KdReportCollection KdReportCreateAggregate(std::uint32_t options) {
 
 std::uint32_t _getAggregateOpts(const ChannelCollection* collection) {
   const auto options = collection != nullptr ? collection->queryOptions.asNumber() : std::nullopt;
-  return options ? static_cast<std::uint32_t>(options->toInt64()) : std::uint32_t{kKdReportFlat};
+  const bool isConvertible = options && options->toDouble() == static_cast<double>(options->toInt64()) &&
+                             options->toInt64() >= std::numeric_limits<std::int32_t>::min() &&
+                             options->toInt64() <= std::int64_t{std::numeric_limits<std::uint32_t>::max()};
+  return isConvertible ? static_cast<std::uint32_t>(options->toInt64()) : std::uint32_t{kKdReportFlat};
 }
 
 KdStatus _addChannel(ChannelCollection* collection, const KdReportChannel& channel, std::uint32_t options,

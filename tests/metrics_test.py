@@ -111,14 +111,14 @@ class Metrics(unittest.TestCase):
             self.assertEqual(names("--driver", driver), ["reads", "found out"])
         for arguments, wanted in ((["--group", "Power", "--subgroup", "Rails"], [0xFF, "not in the hub"]), (["--group", "power"], []),
                                   (["--subgroup", "Rails", "--format", "histogram"], ["wait", "unbounded"]),
-                                  (["--format", "9"], ["format nine"]),
-                                  (["--category", "0x12"], ["COU", "not in the hub", "format nine", "reads"]), (["--category", "0"], []),
+                                  (["--format", "0x109"], ["format nine"]),
+                                  (["--category", "0x70012"], ["COU", "not in the hub", "format nine", "reads"]), (["--category", "0"], []),
                                   (["--format", "unknown"], ["found out"]), (["--unit", "ns"], ["COU", 0xFF, "wait"]),
                                   (["--unit", "24Mticks"], ["odd states"]),
                                   (["--unit", hex(NS), "--category", "256"], ["wait"]), (["--unit", ""], ["speeds", "reads"]),
                                   (["--unit", str(NONE)], ["not in the hub", "unbounded", "format nine", "found out"])):
             self.assertEqual(names(*arguments), wanted, arguments)
-        for words in ("list --category 65536", "list --category x", "list --format 256", "list --format Simple", "delta",
+        for words in ("list --category 4294967296", "list --category x", "list --format 4294967296", "list --format Simple", "delta",
                       "watch --interval 0", "watch --interval nan", "delta --interval 86401", "sample --describe --json"):
             self.metrics(*words.split(), status=2)
 

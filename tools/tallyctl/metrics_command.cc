@@ -78,8 +78,7 @@ CLI::App* addChannelCommand(CLI::App& metrics, Tool& tool, const std::string& na
       ->add_option_function<std::string>(
           "--category",
           [request](const std::string& text) {
-            requireUsable(setCategories(request->filter, text), "--category",
-                          "a mask of 16 bits, decimal or 0x...");
+            requireUsable(setCategories(request->filter, text), "--category", "a mask, decimal or 0x...");
           },
           "Channels of any category of the mask")
       ->type_name("MASK");
@@ -88,7 +87,7 @@ CLI::App* addChannelCommand(CLI::App& metrics, Tool& tool, const std::string& na
           "--format",
           [request](const std::string& text) {
             requireUsable(setFormat(request->filter, text), "--format",
-                          "unknown, simple, state, histogram, array, or a number from 0 to 255");
+                          "unknown, simple, state, histogram, array, or a number");
           },
           "Channels of this format: unknown, simple, state, histogram, array, or its number")
       ->type_name("FORMAT");
@@ -107,12 +106,14 @@ CLI::App* addChannelCommand(CLI::App& metrics, Tool& tool, const std::string& na
   return command;
 }
 
-void addInterval(CLI::App* command, const std::shared_ptr<double>& interval) {
+// `least` is the shortest interval; a watch without any would never rest.
+void addInterval(CLI::App* command, const std::shared_ptr<double>& interval, double least) {
   command
       ->add_option_function<double>(
           "--interval",
-          [interval](double seconds) {
-            requireUsable(seconds > 0 && seconds <= 86400, "--interval", "seconds above 0, at most 86400");
+          [interval, least](double seconds) {
+            requireUsable(seconds >= least && seconds <= 86400, "--interval",
+                          "seconds from " + realText(least) + " to 86400");
             *interval = seconds;
           },
           "Seconds from one sample to the next")
@@ -126,7 +127,7 @@ void addDelta(CLI::App& metrics, Tool& tool) {
                                 [&tool, interval](const MetricsRequest& request) {
                                   runMetricsDelta(tool, request, *interval);
                                 }),
-              interval);
+              interval, 0);
 }
 
 void addWatch(CLI::App& metrics, Tool& tool) {
@@ -137,7 +138,7 @@ void addWatch(CLI::App& metrics, Tool& tool) {
       [&tool, interval, count](const MetricsRequest& request) {
         runMetricsWatch(tool, request, *interval, *count);
       });
-  addInterval(command, interval);
+  addInterval(command, interval, 0.001);
   command->add_option("--count", *count, "End after so many samples")
       ->type_name("N")
       ->check(CLI::PositiveNumber);

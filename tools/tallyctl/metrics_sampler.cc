@@ -3,6 +3,7 @@
 #include <array>
 #include <cstdio>
 
+#include "drivermetrics/report_error.h"
 #include "tools/tallyctl/tool.h"
 
 namespace tbdaily {
@@ -36,7 +37,9 @@ std::string_view whatIsMissing(DriverRegistry& registry) {
 void failMetrics(Tool& tool, std::string_view what, const std::optional<ReportError>& error) {
   std::string line(what);
   if (error) {
-    line += ": " + printable(error->reason) + " (" + statusText(error->code) + ")";
+    const bool hasReason = error->reason != createPVErr(error->code, std::nullopt).reason;
+    if (hasReason) line += ": " + printable(error->reason);
+    line += " (" + statusText(error->code) + ")";
     // What the library answers where the registry or the hub itself is not there.
     if (error->code == kKdNotFound || error->code == kKdNoMemory)
       line += whatIsMissing(tool.platform().services().driverRegistry);

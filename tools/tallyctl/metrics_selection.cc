@@ -20,11 +20,11 @@ std::optional<T> wholeNumber(std::string_view text, int base) {
   return value;
 }
 
-// A code that fits the narrower type.
+// The low bits of a 32-bit number: as the library takes masks and formats.
 template <typename T>
-std::optional<T> parseNarrow(std::string_view text) {
+std::optional<T> parseLowBits(std::string_view text) {
   const auto code = parseCode(text);
-  if (!code || *code > std::numeric_limits<T>::max()) return std::nullopt;
+  if (!code || *code > std::numeric_limits<std::uint32_t>::max()) return std::nullopt;
   return static_cast<T>(*code);
 }
 
@@ -84,12 +84,12 @@ std::optional<std::uint64_t> parseCode(std::string_view text) {
 
 bool setFormat(ChannelFilter& filter, std::string_view text) {
   filter.format = formatOfName(text);
-  if (!filter.format) filter.format = parseNarrow<std::uint8_t>(text);
+  if (!filter.format) filter.format = parseLowBits<std::uint8_t>(text);
   return filter.format.has_value();
 }
 
 bool setCategories(ChannelFilter& filter, std::string_view text) {
-  filter.categories = parseNarrow<std::uint16_t>(text);
+  filter.categories = parseLowBits<std::uint16_t>(text);
   return filter.categories.has_value();
 }
 

@@ -27,8 +27,8 @@ struct ChannelFilter {
 };
 
 // Condition from the words of the command line; false when they make none.
-bool setFormat(ChannelFilter& filter, std::string_view text);      // its name or number
-bool setCategories(ChannelFilter& filter, std::string_view text);  // a mask of 16 bits
+bool setFormat(ChannelFilter& filter, std::string_view text);  // its name, or a number whose low 8 bits count
+bool setCategories(ChannelFilter& filter, std::string_view text);  // a mask, of its low 16 bits
 void setUnit(ChannelFilter& filter, const std::string& text);      // a code, else a label
 
 struct ChannelSelection {
