@@ -1,57 +1,23 @@
 // Reading histogram channels: the values of their buckets, and the bounds that the configuration gives.
 
+#include "drivermetrics/bucket_bounds.h"
 #include "drivermetrics/values.h"
-#include "platform/byte_reader.h"
 
 namespace tbdaily {
 
 namespace {
 
-// One segment of a bucket configuration. The bounds of all segments follow one another; they are absolute.
-struct Segment {
-  static constexpr std::size_t kSize = 16;
-
-  std::uint32_t base;
-  bool isExponential;    // upper bounds base, base^2, base^3 ... instead of base, 2 base, 3 base ...
-  std::int32_t buckets;  // 0 or less: none
-};
-
-std::optional<Segment> segmentAt(std::span<const std::byte> config, std::size_t index) {
-  const ByteReader reader(config);
-  const std::size_t at = index * Segment::kSize;
-  const auto base = reader.at<std::uint32_t>(at);
-  const auto progression = reader.at<std::uint32_t>(at + 4);
-  const auto buckets = reader.at<std::uint32_t>(at + 12);
-  if (!buckets) return std::nullopt;
-  return Segment{*base, *progression != 0, static_cast<std::int32_t>(*buckets)};
-}
-
-// Appends the segment's upper bounds; false when one does not lie above its predecessor or they become more
-// than `most`.
-bool appendBounds(PlistArray& bounds, const Segment& segment, std::int64_t& last, std::size_t most) {
-  std::uint64_t power = 1;
-  for (std::int32_t bucket = 0; bucket < segment.buckets; ++bucket) {
-    power *= segment.base;
-    const std::uint32_t multiple = segment.base * (static_cast<std::uint32_t>(bucket) + 1);
-    const auto bound = static_cast<std::int64_t>(segment.isExponential ? power : multiple);
-    if (bound <= last || bounds.size() == most) return false;
-    bounds.push_back(PlistValue::int64(bound));
-    last = bound;
-  }
-  return true;
-}
-
 // None when the configuration is missing or wrong.
 PlistValue boundsOf(const ChannelRecord& channel) {
   const std::uint32_t buckets = announcedElements(&channel, kKdReportHistogram);
   const auto config = getChannelConfig(&channel);
-  if (buckets == kKdReportNoIndex || !config || config->size() < Segment::kSize) return {};
-  PlistArray bounds;
-  std::int64_t last = 0;
-  for (std::size_t i = 0; const auto segment = segmentAt(*config, i); ++i) {
-    if (!appendBounds(bounds, *segment, last, buckets)) return {};
-  }
-  return PlistValue::array(std::move(bounds));
+  if (buckets == kKdReportNoIndex || !config) return {};
+  const auto bounds = bucketBounds(*config, buckets);
+  if (!bounds) return {};
+  PlistArray numbers;
+  numbers.reserve(bounds->size());
+  for (const std::int64_t bound : *bounds) numbers.push_back(PlistValue::int64(bound));
+  return PlistValue::array(std::move(numbers));
 }
 
 std::int64_t bucketWord(const ChannelRecord* channel, std::int32_t bucket, std::size_t word) {

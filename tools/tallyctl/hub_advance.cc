@@ -6,7 +6,7 @@
 #include <optional>
 #include <vector>
 
-#include "drivermetrics/raw_elements.h"
+#include "drivermetrics/values.h"
 #include "tools/tallyctl/hub_legends.h"
 
 namespace tbdaily {
@@ -23,12 +23,7 @@ constexpr std::uint64_t kMostStretches = 64;
 // Quantities that are measured rather than counted: W, A, V, F, H, Hz, C.
 constexpr std::array<std::uint8_t, 7> kMeasuredQuantities = {2, 4, 5, 6, 7, 8, 10};
 
-namespace state_word {
-constexpr std::size_t kEntries = 1, kResidency = 2, kCount = 3;
-}
-namespace bucket_word {
-constexpr std::size_t kHits = 0, kMinimum = 1, kMaximum = 2, kSum = 3;
-}
+constexpr std::size_t kStateWords = state_word::kResidency + 1;
 
 struct Element {
   std::uint64_t stamp = 0;
@@ -133,7 +128,7 @@ class ChannelMotion {
     const std::uint64_t stretches = std::min(seconds_, kMostStretches);
     const auto latest = std::ranges::max_element(elements_, {}, &Element::stamp);
     auto current = static_cast<std::size_t>(latest - elements_.begin());
-    for (Element& state : elements_) state.wordCount = std::max(state.wordCount, state_word::kCount);
+    for (Element& state : elements_) state.wordCount = std::max(state.wordCount, kStateWords);
     for (std::uint64_t i = 0; i < stretches; ++i) {
       const std::uint64_t now = stampAfter(i + 1, stretches);
       grow(elements_[current].words[state_word::kResidency], total / stretches + (i < total % stretches));
@@ -141,7 +136,7 @@ class ChannelMotion {
       if (elements_.size() == 1 || noise_.below(4) != 0) continue;
       --elements_[current].stamp;  // left just before the other one is entered
       current = (current + 1 + noise_.below(elements_.size() - 1)) % elements_.size();
-      grow(elements_[current].words[state_word::kEntries], seconds_ / stretches);
+      grow(elements_[current].words[state_word::kTransitions], seconds_ / stretches);
       elements_[current].stamp = now;
     }
   }
@@ -169,12 +164,12 @@ class ChannelMotion {
     const std::uint64_t sum = hits == 1 ? low : low + high + (low + (high - low) / 2) * (hits - 2);
 
     auto& words = bucket.words;
-    const bool isFirst = words[bucket_word::kHits] == 0;
-    words[bucket_word::kMinimum] = isFirst ? low : std::min(words[bucket_word::kMinimum], low);
-    words[bucket_word::kMaximum] = isFirst ? high : std::max(words[bucket_word::kMaximum], high);
-    if (isFirst) words[bucket_word::kSum] = 0;
-    grow(words[bucket_word::kSum], sum);
-    grow(words[bucket_word::kHits], hits);
+    const bool isFirst = words[histogram_word::kHits] == 0;
+    words[histogram_word::kMinimum] = isFirst ? low : std::min(words[histogram_word::kMinimum], low);
+    words[histogram_word::kMaximum] = isFirst ? high : std::max(words[histogram_word::kMaximum], high);
+    if (isFirst) words[histogram_word::kSum] = 0;
+    grow(words[histogram_word::kSum], sum);
+    grow(words[histogram_word::kHits], hits);
     bucket.wordCount = words.size();
     bucket.stamp = stampAfter(1, 1);
   }
