@@ -3,6 +3,7 @@
 #include "drivermetrics/text_format.h"
 #include "drivermetrics/units.h"
 #include "drivermetrics/values.h"
+#include "platform/utf8.h"
 
 namespace tbdaily {
 

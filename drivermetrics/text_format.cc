@@ -3,8 +3,6 @@
 #include <cstdarg>
 #include <cstdio>
 
-#include "platform/utf8.h"
-
 namespace tbdaily {
 
 std::string formatText(const char* format, ...) {
@@ -21,15 +19,6 @@ std::string formatText(const char* format, ...) {
 
 std::string alternateHexadecimal(std::uint64_t value) {
   return formatText("%#llx", static_cast<unsigned long long>(value));
-}
-
-bool isUtf8(std::string_view text) {
-  while (!text.empty()) {
-    const std::size_t length = utf8CharacterLength(text);
-    if (length == 0) return false;
-    text.remove_prefix(length);
-  }
-  return true;
 }
 
 }  // namespace tbdaily

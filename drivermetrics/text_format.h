@@ -3,7 +3,6 @@
 
 #include <cstdint>
 #include <string>
-#include <string_view>
 
 namespace tbdaily {
 
@@ -12,8 +11,5 @@ namespace tbdaily {
 
 // "0x1f"; 0 has no prefix.
 std::string alternateHexadecimal(std::uint64_t value);
-
-// Whether all of the text is well-formed UTF-8.
-bool isUtf8(std::string_view text);
 
 }  // namespace tbdaily

@@ -6,6 +6,7 @@
 
 #include "drivermetrics/kd_report.h"
 #include "drivermetrics/text_format.h"
+#include "platform/utf8.h"
 
 namespace tbdaily {
 

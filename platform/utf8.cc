@@ -30,13 +30,27 @@ std::size_t carriedCharacterLength(std::string_view text) {
   return isControl || character == "\xEF\xBF\xBE" || character == "\xEF\xBF\xBF" ? 0 : length;
 }
 
-bool isCarriedText(std::string_view text) {
+namespace {
+
+// Whether the length that the function gives is never 0 on the way through the text.
+template <typename CharacterLength>
+bool holdsOnly(std::string_view text, CharacterLength characterLength) {
   while (!text.empty()) {
-    const std::size_t length = carriedCharacterLength(text);
+    const std::size_t length = characterLength(text);
     if (length == 0) return false;
     text.remove_prefix(length);
   }
   return true;
+}
+
+}  // namespace
+
+bool isUtf8(std::string_view text) {
+  return holdsOnly(text, utf8CharacterLength);
+}
+
+bool isCarriedText(std::string_view text) {
+  return holdsOnly(text, carriedCharacterLength);
 }
 
 void appendUtf8(std::string& out, char32_t codePoint) {

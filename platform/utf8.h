@@ -14,8 +14,11 @@ inline constexpr std::string_view kReplacementCharacter = "\xEF\xBF\xBD";
 // formed (overlong forms, surrogates and everything above U+10FFFF are not) or is empty.
 std::size_t utf8CharacterLength(std::string_view text);
 
-// The same for the characters that an XML document can carry: no control characters but tab, line feed and
-// carriage return, no U+FFFE and U+FFFF.
+// Whether all of the text is well-formed UTF-8.
+bool isUtf8(std::string_view text);
+
+// The length of the first character when an XML document can carry it: no control characters but tab, line
+// feed and carriage return, no U+FFFE and U+FFFF. Else 0.
 std::size_t carriedCharacterLength(std::string_view text);
 
 // Whether all of the text can be stored and reported.

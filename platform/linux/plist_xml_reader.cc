@@ -66,15 +66,6 @@ bool looksWide(std::string_view text) {
          text.substr(0, 2).find('\0') != std::string_view::npos;
 }
 
-bool isUtf8(std::string_view text) {
-  while (!text.empty()) {
-    const std::size_t length = utf8CharacterLength(text);
-    if (length == 0) return false;
-    text.remove_prefix(length);
-  }
-  return true;
-}
-
 class XmlReader {
  public:
   XmlReader();
