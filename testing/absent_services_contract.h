@@ -1,26 +1,34 @@
 // What every family of a host that has nothing answers. The subject is default-constructible and has
-// `Platform& service()`.
+// `Platform& services`.
 #pragma once
 
 #include <chrono>
 #include <string>
 #include <thread>
 
+#include "platform/app_registry.h"
+#include "platform/device_answers.h"
 #include "platform/driver_registry.h"
-#include "platform/platform.h"
+#include "platform/dynamic_loader.h"
+#include "platform/file_system.h"
+#include "platform/kernel.h"
+#include "platform/locale_settings.h"
+#include "platform/log_submission.h"
+#include "platform/preferences_store.h"
+#include "platform/service_listener.h"
 #include "platform/stack_snapshot.h"
 #include "platform/usage_service.h"
 #include "testing/analytics_lines.h"
-#include "testing/service_contracts.h"
+#include "testing/contract_test.h"
 
 namespace tbdaily::testing {
 
 template <typename Subject>
-struct AbsentServicesContract : ServiceContract<Subject> {};
+struct AbsentServicesContract : ContractTest<Subject> {};
 TYPED_TEST_SUITE_P(AbsentServicesContract);
 
 TYPED_TEST_P(AbsentServicesContract, AnswersNothing) {
-  Platform& host = this->service;
+  Platform& host = this->services;
   EXPECT_TRUE(host.preferences.getValue("k", "d").isNone());
   EXPECT_FALSE(host.deviceAnswers.booleanAnswer("InternalBuild"));
   EXPECT_TRUE(host.deviceAnswers.copyAnswer("DiskUsage").isNone());
@@ -59,7 +67,7 @@ TYPED_TEST_P(AbsentServicesContract, AnswersNothing) {
 }
 
 TYPED_TEST_P(AbsentServicesContract, HasNoDrivers) {
-  DriverRegistry& registry = this->service.driverRegistry;
+  DriverRegistry& registry = this->services.driverRegistry;
   EXPECT_TRUE(registry.KdServiceMatching("STXStorage").isNone());
   const PlistValue matching = PlistValue::dictionary({{"KdPropertyMatch", PlistValue::dictionary({})}});
   EXPECT_EQ(registry.KdServiceGetMatchingService(matching), 0U);

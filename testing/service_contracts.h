@@ -1,29 +1,20 @@
-// What callers may rely on in the service families, whoever provides them. Each subject is
-// default-constructible, has `service()`, which answers the family's interface, and lets the tests arrange
-// what the service then answers:
+// What callers may rely on in the services of a platform, whoever provides it. The subject is
+// that of ContractTest and lets the tests arrange what the services then answer:
 //
-//   PreferencesContract       PreferencesStore& another(): the same store, as another process has it
-//   DeviceAnswersContract     answer(key, PlistValue), setBuild(text), setMultiUser(bool),
-//   addContainer(identifier, path) KernelContract            setSysctl(name, PlistData), setClock(PlistDate,
-//   ticks, Timebase) LogSubmissionContract     enable(PlistValue), setTaskingValue(key, PlistValue); logs():
-//   the bytes of the written
-//                             logs in order, options(): those of the last one
-//   AppRegistryContract       addBundle(type)
-//   LocaleSettingsContract    set(preferred, system, country)
-//   NotificationsContract     posts(name): how many so far
-//   ServiceListenerContract   connectPeer(), send(PlistDictionary): as the peer that connected; no more is
-//   asked of
-//                             one that comes after createListener
-//   FileSystemContract        put(path, text)
-//   DynamicLoaderContract     library(), symbolName(): a library that is there and a symbol that it has
-//   MessageDigestContract     nothing more
+//   PreferencesStore& anotherStore()    the same store, as another process has it
+//   answer(key, PlistValue), setBuild(text), setMultiUser(bool), addContainer(identifier, path)
+//   setSysctl(name, PlistData), setTime(PlistDate, ticks, Timebase)
+//   enableLogs(PlistValue), setTaskingValue(key, PlistValue)
+//   logs(), logOptions()                the bytes of the written logs in order, the options of the last one
+//   addBundle(type), setLanguages(preferred, system, country)
+//   posts(name)                         how many so far
+//   connectPeer(), send(PlistDictionary)  as the peer that connected, once there is a listener
+//   setDrivers(std::vector<FakeDriver>)
+//   put(path, text), library(), symbolName()  a file; a library that is there and a symbol that it has
 #pragma once
-
-#include <gtest/gtest.h>
 
 #include <cmath>
 #include <limits>
-#include <span>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -36,31 +27,21 @@
 #include "platform/kernel.h"
 #include "platform/locale_settings.h"
 #include "platform/log_submission.h"
-#include "platform/message_digest.h"
 #include "platform/notifications.h"
 #include "platform/preferences_store.h"
 #include "platform/service_listener.h"
+#include "testing/contract_test.h"
+#include "testing/fake_drivers.h"
 
 namespace tbdaily::testing {
 
-inline PlistData bytesOf(std::string_view text) {
-  const auto bytes = std::as_bytes(std::span(text));
-  return {bytes.begin(), bytes.end()};
-}
-
 template <typename Subject>
-struct ServiceContract : ::testing::Test {
-  Subject subject;
-  decltype(subject.service())& service = subject.service();
-};
+struct ServiceContract : ContractTest<Subject> {};
+TYPED_TEST_SUITE_P(ServiceContract);
 
-template <typename Subject>
-struct PreferencesContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(PreferencesContract);
-
-TYPED_TEST_P(PreferencesContract, KeepsValuesByDomainVisibleAtOnceUntilTheyAreRemoved) {
-  PreferencesStore& here = this->service;
-  PreferencesStore& there = this->subject.another();
+TYPED_TEST_P(ServiceContract, PreferencesAreVisibleAtOnceUntilTheyAreRemoved) {
+  PreferencesStore& here = this->services.preferences;
+  PreferencesStore& there = this->subject.anotherStore();
   const PlistValue nested = PlistValue::dictionary(
       {{"n", PlistValue::int8(-3)}, {"a", PlistValue::array({PlistValue::float32(0.1F)})}});
   EXPECT_TRUE(here.getValue("k", "a.b").isNone());
@@ -73,17 +54,15 @@ TYPED_TEST_P(PreferencesContract, KeepsValuesByDomainVisibleAtOnceUntilTheyAreRe
   here.synchronize("a.b");
   here.synchronize("never.written");
   EXPECT_EQ(here.copyApplicationValue("other", "a.b"), nested);
-  EXPECT_EQ(here.getValue("k", "a.b"), PlistValue::int32(2));
   there.setValue("k", PlistValue(), "a.b");
   there.setValue("k", PlistValue(), "never.written");
   EXPECT_TRUE(here.getValue("k", "a.b").isNone());
   EXPECT_EQ(here.getValue("k", "a"), PlistValue::string(""));
   here.setOwnValue("seen", PlistValue::boolean(true));
-  here.synchronizeOwn();
   EXPECT_EQ(there.getValue("seen", "com.velmora.sysmetrics.tbdaily"), PlistValue::boolean(true));
 }
 
-TYPED_TEST_P(PreferencesContract, ReadsNumbersAndBooleansAsTheirKindsAlone) {
+TYPED_TEST_P(ServiceContract, PreferencesAreNumbersOrBooleansByTheirKindAlone) {
   struct Case {
     PlistValue value;
     std::int64_t integer;
@@ -99,67 +78,54 @@ TYPED_TEST_P(PreferencesContract, ReadsNumbersAndBooleansAsTheirKindsAlone) {
       {PlistValue::string("1"), 0, false, false, false},
       {PlistValue(), 0, false, false, false},
   };
+  PreferencesStore& preferences = this->services.preferences;
   for (const Case& c : cases) {
-    this->service.setValue("k", c.value, "d");
+    preferences.setValue("k", c.value, "d");
     bool valid = !c.isNumber;
-    EXPECT_EQ(this->service.getInteger("k", "d", &valid), c.integer);
+    EXPECT_EQ(preferences.getInteger("k", "d", &valid), c.integer);
     EXPECT_EQ(valid, c.isNumber) << c.integer;
-    const PreferenceBoolean boolean = this->service.getApplicationBoolean("k", "d");
+    const PreferenceBoolean boolean = preferences.getApplicationBoolean("k", "d");
     EXPECT_TRUE(boolean.value == c.boolean && boolean.valid == c.isBoolean) << c.integer;
   }
 }
 
-TYPED_TEST_P(PreferencesContract, ASeriesOfChangesComesToTheSameAsOneAfterTheOther) {
-  this->service.setValue("old", PlistValue::int64(1), "a");
+TYPED_TEST_P(ServiceContract, ASeriesOfChangesComesToTheSameAsOneAfterTheOther) {
   const PlistValue one = PlistValue::int32(1), two = PlistValue::int32(2);
-  this->service.applyChanges(std::vector<PreferenceChange>{{"old", PlistValue(), "a"},
-                                                           {"k", one, "a"},
-                                                           {"k", one, "b"},
-                                                           {"k", two, "a"},
-                                                           {"back", PlistValue(), "b"},
-                                                           {"back", one, "b"},
-                                                           {"gone", one, "a"},
-                                                           {"gone", PlistValue(), "a"}});
-  PreferencesStore& there = this->subject.another();
+  this->services.preferences.setValue("old", one, "a");
+  this->services.preferences.applyChanges(std::vector<PreferenceChange>{{"old", PlistValue(), "a"},
+                                                                        {"k", one, "a"},
+                                                                        {"k", one, "b"},
+                                                                        {"k", two, "a"},
+                                                                        {"back", PlistValue(), "b"},
+                                                                        {"back", one, "b"},
+                                                                        {"gone", one, "a"},
+                                                                        {"gone", PlistValue(), "a"}});
+  PreferencesStore& there = this->subject.anotherStore();
   EXPECT_EQ(there.getValue("k", "a"), two);
   EXPECT_EQ(there.getValue("k", "b"), one);
   EXPECT_EQ(there.getValue("back", "b"), one);
   EXPECT_TRUE(there.getValue("old", "a").isNone() && there.getValue("gone", "a").isNone());
 }
-REGISTER_TYPED_TEST_SUITE_P(PreferencesContract, KeepsValuesByDomainVisibleAtOnceUntilTheyAreRemoved,
-                            ReadsNumbersAndBooleansAsTheirKindsAlone,
-                            ASeriesOfChangesComesToTheSameAsOneAfterTheOther);
 
-template <typename Subject>
-struct DeviceAnswersContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(DeviceAnswersContract);
-
-TYPED_TEST_P(DeviceAnswersContract, AnswersByKindAndCurrently) {
-  for (const auto& [value, expected] : {std::pair(PlistValue::boolean(true), true),
-                                        {PlistValue::int64(1), false},
-                                        {PlistValue::boolean(false), false}}) {
+TYPED_TEST_P(ServiceContract, AnswersAreByKindAndCurrent) {
+  DeviceAnswers& answers = this->services.deviceAnswers;
+  for (const auto& [value, expected] :
+       {std::pair(PlistValue::boolean(true), true), {PlistValue::int64(1), false}}) {
     this->subject.answer("q", value);
-    EXPECT_EQ(this->service.booleanAnswer("q"), expected);
-    EXPECT_EQ(this->service.copyAnswer("q"), value);
+    EXPECT_EQ(answers.booleanAnswer("q"), expected);
+    EXPECT_EQ(answers.copyAnswer("q"), value);
   }
-  for (const bool multiUser : {true, false}) {
-    this->subject.setMultiUser(multiUser);
-    EXPECT_EQ(this->service.multiUserMode(), multiUser);
-  }
+  this->subject.setMultiUser(true);
+  EXPECT_EQ(answers.multiUserMode(), true);
   this->subject.setBuild("4N117");
-  EXPECT_EQ(this->service.currentOSBuildVersion(), "4N117");
+  EXPECT_EQ(answers.currentOSBuildVersion(), "4N117");
   this->subject.addContainer("g", "/private/g");
-  EXPECT_EQ(this->service.systemGroupContainerPath("g").path, "/private/g");
-  const SystemGroupContainer unknown = this->service.systemGroupContainerPath("G");
+  EXPECT_EQ(answers.systemGroupContainerPath("g").path, "/private/g");
+  const SystemGroupContainer unknown = answers.systemGroupContainerPath("G");
   EXPECT_TRUE(!unknown.path && unknown.error != 0);
 }
-REGISTER_TYPED_TEST_SUITE_P(DeviceAnswersContract, AnswersByKindAndCurrently);
 
-template <typename Subject>
-struct KernelContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(KernelContract);
-
-TYPED_TEST_P(KernelContract, FillsNoMoreThanTheRoomAndSaysHowMuch) {
+TYPED_TEST_P(ServiceContract, SysctlsFillNoMoreThanTheRoomAndSayHowMuch) {
   constexpr std::byte kUntouched{0xEE};
   constexpr int kNoSuchName = 2, kTooSmall = 12;
   this->subject.setSysctl("kern.three", bytesOf("abc"));
@@ -172,116 +138,75 @@ TYPED_TEST_P(KernelContract, FillsNoMoreThanTheRoomAndSaysHowMuch) {
                         Case{"kern.three", 0, kTooSmall}, Case{"kern.other", 8, kNoSuchName}}) {
     PlistData buffer(8, kUntouched);
     std::size_t length = c.room;
-    EXPECT_EQ(this->service.sysctlByName(c.name, buffer, length), c.error) << c.room;
+    EXPECT_EQ(this->services.kernel.sysctlByName(c.name, buffer, length), c.error) << c.room;
     if (c.error == 0) {
       EXPECT_EQ(length, 3U);
       EXPECT_EQ(PlistData(buffer.begin(), buffer.begin() + 3), bytesOf("abc"));
     }
     EXPECT_EQ(buffer[c.error == 0 ? 3 : 0], kUntouched) << c.room;
   }
-}
-
-TYPED_TEST_P(KernelContract, TellsTimeTicksAndTheProcess) {
   const PlistDate now = PlistDate::fromUnixSeconds(1795511224.25);
-  this->subject.setClock(now, 123456789012, {125, 3});
-  EXPECT_EQ(this->service.currentTime(), now);
-  EXPECT_EQ(this->service.tickCount(), 123456789012U);
-  const auto timebase = this->service.timebase();
+  this->subject.setTime(now, 123456789012, {125, 3});
+  EXPECT_EQ(this->services.kernel.currentTime(), now);
+  EXPECT_EQ(this->services.kernel.tickCount(), 123456789012U);
+  const auto timebase = this->services.kernel.timebase();
   EXPECT_TRUE(timebase && timebase->numerator == 125 && timebase->denominator == 3);
-  EXPECT_NE(this->service.processName(), "");
-  EXPECT_GT(this->service.processIdentifier(), 0);
 }
-REGISTER_TYPED_TEST_SUITE_P(KernelContract, FillsNoMoreThanTheRoomAndSaysHowMuch,
-                            TellsTimeTicksAndTheProcess);
 
-template <typename Subject>
-struct LogSubmissionContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(LogSubmissionContract);
-
-TYPED_TEST_P(LogSubmissionContract, WritesTheLogBeforeItReturnsAndNothingWhenTheWriterFails) {
+TYPED_TEST_P(ServiceContract, LogsAreWrittenBeforeTheCallReturnsAndNotAtAllWhenTheWriterFails) {
   const auto write = [&](const PlistValue& options, std::string_view text, bool whole) {
-    bool called = false;
-    const bool written =
-        this->service.writeLogForSubmission("193", "log", options, PlistValue(), [&](LogOutput& output) {
-          called = true;
+    return this->services.logSubmission.writeLogForSubmission(
+        "193", "log", options, PlistValue(), [&](LogOutput& output) {
           EXPECT_TRUE(output.write(bytesOf(text)) && output.write(bytesOf("!")));
           return whole;
         });
-    EXPECT_TRUE(called);
-    return written;
   };
   const PlistValue options = PlistValue::dictionary({{"o", PlistValue::string("1")}});
   EXPECT_TRUE(write(options, "one", true));
-  EXPECT_EQ(this->subject.options(), options);
+  EXPECT_EQ(this->subject.logOptions(), options);
   EXPECT_FALSE(write(options, "two", false));
   EXPECT_TRUE(write(PlistValue(), "three", true));
-  EXPECT_TRUE(this->subject.options().isNone());
+  EXPECT_TRUE(this->subject.logOptions().isNone());
   EXPECT_EQ(this->subject.logs(), (std::vector<std::string>{"one!", "three!"}));
 }
 
-TYPED_TEST_P(LogSubmissionContract, IsEnabledByTheBooleanAlone) {
-  EXPECT_FALSE(this->service.isDiagnosticLogSubmissionEnabled());
-  for (const PlistValue& no :
-       {PlistValue::int64(1), PlistValue::string("true"), PlistValue::boolean(false)}) {
-    this->subject.enable(no);
-    EXPECT_FALSE(this->service.isDiagnosticLogSubmissionEnabled());
+TYPED_TEST_P(ServiceContract, LogSubmissionIsEnabledByTheBooleanAlone) {
+  LogSubmission& logs = this->services.logSubmission;
+  for (const auto& [value, enabled] : {std::pair(PlistValue::int64(1), false),
+                                       {PlistValue::string("true"), false},
+                                       {PlistValue::boolean(false), false},
+                                       {PlistValue::boolean(true), true}}) {
+    this->subject.enableLogs(value);
+    EXPECT_EQ(logs.isDiagnosticLogSubmissionEnabled(), enabled);
   }
-  this->subject.enable(PlistValue::boolean(true));
-  EXPECT_TRUE(this->service.isDiagnosticLogSubmissionEnabled());
   this->subject.setTaskingValue("AggressiveSubmissionDays", PlistValue::int64(3));
-  EXPECT_EQ(this->service.taskingValue("AggressiveSubmissionDays"), PlistValue::int64(3));
-  EXPECT_NE(this->service.incidentIdentifier(), this->service.incidentIdentifier());
+  EXPECT_EQ(logs.taskingValue("AggressiveSubmissionDays"), PlistValue::int64(3));
+  EXPECT_NE(logs.incidentIdentifier(), logs.incidentIdentifier());
 }
-REGISTER_TYPED_TEST_SUITE_P(LogSubmissionContract, WritesTheLogBeforeItReturnsAndNothingWhenTheWriterFails,
-                            IsEnabledByTheBooleanAlone);
 
-template <typename Subject>
-struct AppRegistryContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(AppRegistryContract);
+TYPED_TEST_P(ServiceContract, BundlesLanguagesAndPostsKeepTheirOrderAndNumber) {
+  using Texts = std::vector<std::string>;
+  const Texts bundles{std::string(this->services.appRegistry.userApplicationType()), "System", "System"};
+  for (const std::string& type : bundles) this->subject.addBundle(type);
+  Texts types;
+  this->services.appRegistry.enumerateBundles(BundleKind::Application,
+                                              [&](std::string_view type) { types.emplace_back(type); });
+  EXPECT_EQ(types, bundles);
 
-TYPED_TEST_P(AppRegistryContract, CallsBackOnceForEachBundle) {
-  const std::string user(this->service.userApplicationType());
-  for (const std::string& type : {user, std::string("System"), user}) this->subject.addBundle(type);
-  std::vector<std::string> types;
-  this->service.enumerateBundles(BundleKind::Application,
-                                 [&](std::string_view type) { types.emplace_back(type); });
-  EXPECT_EQ(types, (std::vector<std::string>{user, "System", user}));
-}
-REGISTER_TYPED_TEST_SUITE_P(AppRegistryContract, CallsBackOnceForEachBundle);
+  this->subject.setLanguages({"fr", "de-AT"}, {"sv", "de", "fr"}, "AT");
+  EXPECT_EQ(this->services.localeSettings.preferredLanguages(), (Texts{"fr", "de-AT"}));
+  EXPECT_EQ(this->services.localeSettings.systemLanguages(), (Texts{"sv", "de", "fr"}));
+  EXPECT_EQ(this->services.localeSettings.countryCode(), "AT");
 
-template <typename Subject>
-struct LocaleSettingsContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(LocaleSettingsContract);
-
-TYPED_TEST_P(LocaleSettingsContract, KeepsTheOrderOfTheLists) {
-  const std::vector<std::string> preferred{"fr", "de-AT"}, system{"sv", "de", "fr"};
-  this->subject.set(preferred, system, "AT");
-  EXPECT_EQ(this->service.preferredLanguages(), preferred);
-  EXPECT_EQ(this->service.systemLanguages(), system);
-  EXPECT_EQ(this->service.countryCode(), "AT");
-}
-REGISTER_TYPED_TEST_SUITE_P(LocaleSettingsContract, KeepsTheOrderOfTheLists);
-
-template <typename Subject>
-struct NotificationsContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(NotificationsContract);
-
-TYPED_TEST_P(NotificationsContract, EveryPostCountsByItsName) {
-  for (const char* name : {"a.b", "a", "a.b"}) this->service.post(name);
+  for (const char* name : {"a.b", "a", "a.b"}) this->services.notifications.post(name);
   EXPECT_EQ(this->subject.posts("a.b"), 2U);
   EXPECT_EQ(this->subject.posts("a"), 1U);
-  EXPECT_EQ(this->subject.posts("b"), 0U);
 }
-REGISTER_TYPED_TEST_SUITE_P(NotificationsContract, EveryPostCountsByItsName);
 
-template <typename Subject>
-struct ServiceListenerContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(ServiceListenerContract);
-
-TYPED_TEST_P(ServiceListenerContract, DeliversOneEventASliceToWhatWasResumed) {
+TYPED_TEST_P(ServiceContract, OneEventASliceGoesToWhatWasResumed) {
   constexpr double kShort = 0.02, kLong = 30;
   const PlistDictionary message{{"operation", PlistValue::int64(2)}};
-  ServiceListener& listener = this->service;
+  ServiceListener& listener = this->services.serviceListener;
   const ServiceConnection endpoint = listener.createListener("com.example.endpoint", DeliveryQueue::Main);
   ASSERT_NE(endpoint, 0U);
   std::vector<PlistDictionary> received;
@@ -312,49 +237,72 @@ TYPED_TEST_P(ServiceListenerContract, DeliversOneEventASliceToWhatWasResumed) {
   listener.resume(kUnknown);
   EXPECT_EQ(listener.runSlice(0), SliceResult::TimedOut);
 }
-REGISTER_TYPED_TEST_SUITE_P(ServiceListenerContract, DeliversOneEventASliceToWhatWasResumed);
 
-template <typename Subject>
-struct FileSystemContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(FileSystemContract);
+TYPED_TEST_P(ServiceContract, DriversAreFoundInOrderAndCountUntilTheyAreReleased) {
+  const auto dictionary = [](PlistDictionary entries) { return PlistValue::dictionary(std::move(entries)); };
+  DriverRegistry& registry = this->services.driverRegistry;
+  this->subject.setDrivers(
+      {{1, "child", "C", {{"own", PlistValue::string("near")}}, 2},
+       {2, "parent", "P", {{"p", PlistValue::string("far")}, {"q", PlistValue::int64(1)}}, 1},
+       {{}, {}, "C", {}, 4711, 0}});
+  KdHandle iterator = 0;
+  ASSERT_EQ(registry.KdServiceGetMatchingServices(registry.KdServiceMatching("C"), iterator), kKdSuccess);
+  const KdHandle child = registry.KdIteratorNext(iterator), nameless = registry.KdIteratorNext(iterator);
+  EXPECT_EQ(registry.KdIteratorNext(iterator), 0U);
+  EXPECT_TRUE(registry.KdIteratorIsValid(iterator));
+  std::uint64_t identifier = 0;
+  std::string name;
+  EXPECT_EQ(registry.KdRegistryEntryGetRegistryEntryID(child, identifier), kKdSuccess);
+  EXPECT_EQ(identifier, 1U);
+  EXPECT_EQ(registry.KdRegistryEntryGetRegistryEntryID(nameless, identifier), kKdNotFound);
+  EXPECT_EQ(registry.KdRegistryEntryGetName(nameless, name), kKdNotFound);
+  EXPECT_EQ(registry.KdObjectGetUserRetainCount(child), 1U);
+  EXPECT_EQ(registry.KdObjectGetUserRetainCount(nameless), 0U);
+  const auto search = [&](const char* key) {
+    return registry.KdRegistryEntrySearchCFProperty(child, KdRegistryPlane::KdService, key,
+                                                    KdSearchOptions::RecursivelyTowardsParents);
+  };
+  EXPECT_EQ(search("p").asString(), "far");
+  EXPECT_EQ(search("own").asString(), "near");
+  EXPECT_TRUE(search("none").isNone());  // though the parents go in a circle
+  EXPECT_TRUE(registry.KdRegistryEntryCreateCFProperty(child, "p").isNone());
+  const auto matching = [&](std::int64_t q) {
+    return dictionary({{"KdPropertyMatch", dictionary({{"q", PlistValue::int64(q)}})}});
+  };
+  const KdHandle parent = registry.KdServiceGetMatchingService(matching(1));
+  EXPECT_EQ(registry.KdRegistryEntryGetName(parent, name), kKdSuccess);
+  EXPECT_EQ(name, "parent");
+  EXPECT_EQ(registry.KdServiceGetMatchingService(matching(2)), 0U);
+  for (const KdHandle handle : {iterator, child, nameless, parent})
+    EXPECT_EQ(registry.KdObjectRelease(handle), kKdSuccess);
+  EXPECT_EQ(registry.KdObjectRelease(child), kKdBadArgument);
+}
 
-TYPED_TEST_P(FileSystemContract, ReadsWholeFilesByAbsolutePath) {
+TYPED_TEST_P(ServiceContract, FilesAreReadWholeAndLibrariesByTheirPath) {
+  FileSystem& files = this->services.fileSystem;
   for (const std::string& contents : {std::string(), std::string("a\0b\n", 4), std::string(100'000, 'x')}) {
     this->subject.put("/Library/Some where/file", contents);
-    const auto status = this->service.status("/Library/Some where/file");
+    const auto status = files.status("/Library/Some where/file");
     EXPECT_TRUE(status && status->size == static_cast<std::int64_t>(contents.size()));
-    EXPECT_EQ(this->service.readFile("/Library/Some where/file"), bytesOf(contents));
+    EXPECT_EQ(files.readFile("/Library/Some where/file"), bytesOf(contents));
   }
-  EXPECT_FALSE(this->service.status("/Library/none"));
-  EXPECT_FALSE(this->service.readFile("/Library/none"));
-}
-REGISTER_TYPED_TEST_SUITE_P(FileSystemContract, ReadsWholeFilesByAbsolutePath);
+  EXPECT_FALSE(files.status("/Library/none") || files.readFile("/Library/none"));
 
-template <typename Subject>
-struct DynamicLoaderContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(DynamicLoaderContract);
-
-TYPED_TEST_P(DynamicLoaderContract, FindsWhatIsThereAndNothingElse) {
-  const LibraryHandle library = this->service.open(this->subject.library());
+  DynamicLoader& loader = this->services.dynamicLoader;
+  const LibraryHandle library = loader.open(this->subject.library());
   ASSERT_NE(library, nullptr);
-  EXPECT_NE(this->service.symbol(library, this->subject.symbolName()), nullptr);
-  EXPECT_EQ(this->service.symbol(library, "NoSuchSymbol"), nullptr);
-  EXPECT_EQ(this->service.open("/Library/none"), nullptr);
-  EXPECT_EQ(this->service.symbol(nullptr, this->subject.symbolName()), nullptr);
+  EXPECT_NE(loader.symbol(library, this->subject.symbolName()), nullptr);
+  EXPECT_EQ(loader.symbol(library, "NoSuchSymbol"), nullptr);
+  EXPECT_EQ(loader.open("/Library/none"), nullptr);
+  EXPECT_EQ(loader.symbol(nullptr, this->subject.symbolName()), nullptr);
 }
-REGISTER_TYPED_TEST_SUITE_P(DynamicLoaderContract, FindsWhatIsThereAndNothingElse);
 
-template <typename Subject>
-struct MessageDigestContract : ServiceContract<Subject> {};
-TYPED_TEST_SUITE_P(MessageDigestContract);
-
-TYPED_TEST_P(MessageDigestContract, DependsOnTheBytesAlone) {
-  EXPECT_EQ(this->service.md5(bytesOf("abc")), this->service.md5(bytesOf(std::string("abc"))));
-  for (const std::string_view other :
-       {std::string_view("abd"), std::string_view(), std::string_view("abc\0", 4)}) {
-    EXPECT_NE(this->service.md5(bytesOf("abc")), this->service.md5(bytesOf(other)));
-  }
-}
-REGISTER_TYPED_TEST_SUITE_P(MessageDigestContract, DependsOnTheBytesAlone);
+REGISTER_TYPED_TEST_SUITE_P(
+    ServiceContract, PreferencesAreVisibleAtOnceUntilTheyAreRemoved,
+    PreferencesAreNumbersOrBooleansByTheirKindAlone, ASeriesOfChangesComesToTheSameAsOneAfterTheOther,
+    AnswersAreByKindAndCurrent, SysctlsFillNoMoreThanTheRoomAndSayHowMuch,
+    LogsAreWrittenBeforeTheCallReturnsAndNotAtAllWhenTheWriterFails, LogSubmissionIsEnabledByTheBooleanAlone,
+    BundlesLanguagesAndPostsKeepTheirOrderAndNumber, OneEventASliceGoesToWhatWasResumed,
+    DriversAreFoundInOrderAndCountUntilTheyAreReleased, FilesAreReadWholeAndLibrariesByTheirPath);
 
 }  // namespace tbdaily::testing

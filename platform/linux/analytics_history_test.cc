@@ -5,9 +5,9 @@
 #include <fstream>
 
 #include "platform/linux/analytics_store.h"
-#include "platform/linux/linux_analytics_client.h"
+#include "platform/linux/test_host.h"
 #include "testing/analytics_contract.h"
-#include "testing/temporary_folder.h"
+#include "testing/fake_services.h"
 
 namespace tbdaily {
 namespace {
@@ -15,71 +15,41 @@ namespace {
 namespace fs = std::filesystem;
 using testing::Lines;
 
-class StoredHistory {
+class StoredAnalytics : public testing::TestPlatform {
  public:
-  AnalyticsHistory& service() { return history_; }
+  void setToday(PlistDate now) { setClock(now.unixSeconds()); }
+  std::optional<std::int64_t> scalar(std::string_view key, DayNumber day) {
+    std::optional<std::int64_t> found;
+    services.analyticsHistory.open()->enumerateScalars(
+        key, day, day, [&](std::string_view, DayNumber, std::int64_t value, bool&) { found = value; });
+    return found;
+  }
   void addScalar(std::string_view key, DayNumber day, std::int64_t value) {
-    EXPECT_TRUE(store_.setScalar(key, day, value).ok());
+    EXPECT_TRUE(store.setScalar(key, day, value).ok());
   }
   void addDistribution(std::string_view key, DayNumber day, const std::vector<double>& values) {
-    EXPECT_TRUE(store_.appendDistributionValues(key, day, 0, values).ok());
+    EXPECT_TRUE(store.appendDistributionValues(key, day, 0, values).ok());
   }
-  const fs::path& file() const { return store_.file(); }
   // What another program does to the file.
   void sql(const char* statements) {
     SqliteDatabase database;
-    ASSERT_EQ(database.open(file(), SqliteMode::ReadWrite, kStoreBusyTimeout), 0);
+    ASSERT_EQ(database.open(store.file(), SqliteMode::ReadWrite, kStoreBusyTimeout), 0);
     ASSERT_EQ(database.execute(statements), 0) << database.errorMessage();
   }
 
- private:
-  testing::TemporaryFolder folder_;
-  AnalyticsStore store_{folder_.path() / "store"};
-  LinuxAnalyticsHistory history_{[this] { return std::optional(store_.file()); }};
-};
-
-class SettableClock : public Kernel {
- public:
-  PlistDate now;
-  PlistDate currentTime() override { return now; }
-  int sysctlByName(std::string_view, std::span<std::byte>, std::size_t&) override { return ENOENT; }
-  std::uint64_t tickCount() override { return 0; }
-  std::optional<Timebase> timebase() override { return std::nullopt; }
-  std::string processName() override { return {}; }
-  std::int32_t processIdentifier() override { return 0; }
-};
-
-class StoredClient {
- public:
-  AnalyticsClient& service() { return client_; }
-  void setToday(PlistDate now) { clock_.now = now; }
-  std::optional<std::int64_t> scalar(std::string_view key, DayNumber day) {
-    std::optional<std::int64_t> found;
-    LinuxAnalyticsHistory([this] { return std::optional(file_); })
-        .open()
-        ->enumerateScalars(key, day, day,
-                           [&](std::string_view, DayNumber, std::int64_t value, bool&) { found = value; });
-    return found;
-  }
-
- private:
-  testing::TemporaryFolder folder_;
-  fs::path file_ = folder_.path() / "store";
-  SettableClock clock_;
-  LinuxAnalyticsClient client_{[this] { return std::optional(file_); }, clock_};
+  AnalyticsStore store{host.devicePath("/var/mobile/Library/Tallybook/TBDataStore.sqlitedb")};
 };
 
 }  // namespace
 
 namespace testing {
-INSTANTIATE_TYPED_TEST_SUITE_P(Stored, AnalyticsHistoryContract, StoredHistory);
-INSTANTIATE_TYPED_TEST_SUITE_P(Stored, AnalyticsClientContract, StoredClient);
+INSTANTIATE_TYPED_TEST_SUITE_P(Stored, AnalyticsContract, StoredAnalytics);
 }  // namespace testing
 
 namespace {
 
 TEST(LinuxAnalyticsHistory, PassesOverWhatAForeignProgramLeft) {
-  StoredHistory history;
+  StoredAnalytics history;
   history.addScalar("good", 1, 1);
   history.addDistribution("good", 1, {1, 2, 3, 4});
   history.sql(
@@ -94,23 +64,23 @@ TEST(LinuxAnalyticsHistory, PassesOverWhatAForeignProgramLeft) {
       " (13, 2, 'seq', 0, 1), (13, 3, 0, 0, 'v'), (13, 3, 1, 0, 33);"
       "UPDATE distribution_values SET seconds = 'noon' WHERE seq = 0 AND key_id = 1;"
       "UPDATE distribution_values SET seconds = 99999999999 WHERE seq = 2 AND key_id = 1;");
-  const auto opened = history.service().open();
+  const auto opened = history.services.analyticsHistory.open();
   EXPECT_EQ(testing::scalarLines(*opened), (Lines{"days 4 44", "good 1 1"}));
   EXPECT_EQ(testing::distributionLines(*opened), (Lines{"days 2:", "days 3: nan 33", "good 1: 2 4"}));
 }
 
 TEST(LinuxAnalyticsHistory, EndsAtADamagedPageOfALargeStore) {
-  StoredHistory history;
+  StoredAnalytics history;
   const std::vector<double> values(500000, 1.25);
   history.addDistribution("k", 1, values);
   history.addScalar("k", 1, 1);
   history.sql("PRAGMA wal_checkpoint(TRUNCATE)");
-  const auto middle = static_cast<std::streamoff>(fs::file_size(history.file()) / 2 / 4096 * 4096);
+  const auto middle = static_cast<std::streamoff>(fs::file_size(history.store.file()) / 2 / 4096 * 4096);
   ASSERT_GT(middle, 4 << 20);
-  std::fstream(history.file(), std::ios::in | std::ios::out | std::ios::binary).seekp(middle)
+  std::fstream(history.store.file(), std::ios::in | std::ios::out | std::ios::binary).seekp(middle)
       << std::string(4096, '\xA5');
 
-  const auto opened = history.service().open();
+  const auto opened = history.services.analyticsHistory.open();
   EXPECT_EQ(testing::scalarLines(*opened), Lines{"k 1 1"});
   std::size_t delivered = 0;
   int rows = 0;
@@ -126,44 +96,28 @@ TEST(LinuxAnalyticsHistory, EndsAtADamagedPageOfALargeStore) {
   EXPECT_LT(delivered, values.size());
 }
 
-class Device : public DeviceAnswers, public FileSystem {
- public:
-  bool internal = false, marker = false;
-  std::optional<bool> multiUser;
-  std::optional<std::string> container;
-
-  bool booleanAnswer(std::string_view question) override { return question == "InternalBuild" && internal; }
-  PlistValue copyAnswer(std::string_view) override { return {}; }
-  std::optional<std::string> currentOSBuildVersion() override { return std::nullopt; }
-  std::optional<bool> multiUserMode() override { return multiUser; }
-  SystemGroupContainer systemGroupContainerPath(std::string_view) override { return {container, 2}; }
-  std::optional<FileStatus> status(std::string_view path) override {
-    return marker && path == "/var/db/forceMultiUserMode" ? std::optional(FileStatus{}) : std::nullopt;
-  }
-  std::optional<std::vector<std::byte>> readFile(std::string_view) override { return std::nullopt; }
-};
-
 TEST(AnalyticsHome, IsTheContainerInMultiUserModeAndIsAskedForUntilItIsFound) {
-  Device device;
+  testing::FakeDeviceAnswers device;
+  testing::FakeFileSystem files;
   const testing::TemporaryFolder root;
   const Host host(root.path(), false);
-  const auto place = [&] { return analyticsStoreLocator(host, device, device)().value_or("none"); };
+  const auto place = [&] { return analyticsStoreLocator(host, device, files)().value_or("none"); };
   const fs::path single = root.path() / "var/mobile/Library/Tallybook/TBDataStore.sqlitedb";
   EXPECT_EQ(place(), single);
-  device.marker = true;
+  files.files["/var/db/forceMultiUserMode"] = {};
   EXPECT_EQ(place(), single);
-  device.internal = true;
+  device.answers.set("InternalBuild", PlistValue::boolean(true));
   EXPECT_EQ(place(), "none");
-  device.internal = false;
+  device.answers.set("InternalBuild", PlistValue());
   device.multiUser = true;
-  const AnalyticsStoreLocator locate = analyticsStoreLocator(host, device, device);
+  const AnalyticsStoreLocator locate = analyticsStoreLocator(host, device, files);
   EXPECT_EQ(locate(), std::nullopt);
   EXPECT_EQ(testing::scalarLines(*LinuxAnalyticsHistory(locate).open()), Lines{});
-  device.container = "/group";
+  device.containers["systemgroup.com.velmora.sysmetrics"] = "/group";
   EXPECT_EQ(locate(), root.path() / "group/Library/Tallybook/TBDataStore.sqlitedb");
 
   const Host absent(root.path() / "absent", false);
-  EXPECT_EQ(analyticsStoreLocator(absent, device, device)(), std::nullopt);
+  EXPECT_EQ(analyticsStoreLocator(absent, device, files)(), std::nullopt);
   EXPECT_FALSE(fs::exists(absent.root()));
 }
 

@@ -14,7 +14,6 @@
 #include "platform/linux/test_host.h"
 #include "platform/locale_settings.h"
 #include "platform/log_submission.h"
-#include "platform/message_digest.h"
 #include "platform/preferences_store.h"
 #include "platform/system_log.h"
 
@@ -215,26 +214,6 @@ TEST(HostIdentityTest, ReadsTextsAsTheirWritersMeantThem) {
       << uuid;
 }
 
-TEST(LinuxLocaleSettingsTest, ChoosesTheBestLocalizations) {
-  TestPlatform device;
-  struct Case {
-    Texts available, preferred;
-    std::string best;
-  };
-  for (const Case& c : {
-           Case{{"de", "en"}, {"en-GB"}, "en "},
-           Case{{"en", "en-GB"}, {"en-GB", "en-US"}, "en-GB en "},
-           Case{{"zh", "zh_Hant", "zh_Hant_TW"}, {"zh-Hant-TW"}, "zh_Hant_TW "},
-           Case{{"zh", "ZH_hant"}, {"zh-Hant-TW"}, "ZH_hant "},
-           Case{{"pt-BR"}, {"pt", "PT_br"}, "pt-BR "},
-           Case{{"de", "en"}, {"en-GB", "de", "en-US"}, "en de "},
-           Case{{"", "de"}, {"fr", ""}, ""},
-           Case{{}, {"fr"}, ""},
-       }) {
-    EXPECT_EQ(joined(device.services.localeSettings.bestLocalizations(c.available, c.preferred)), c.best);
-  }
-}
-
 TEST(LinuxAppRegistryTest, CountsTheApplicationsAmongTheDesktopEntries) {
   TestPlatform device(true);
   const std::string application = "[Desktop Entry]\nName=a\nType = Application \r\n[Other]\nHidden=true\n";
@@ -282,19 +261,6 @@ TEST(LinuxDynamicLoaderTest, RefusesWhatOthersCanWrite) {
   ASSERT_EQ(::mkfifo((folder / "pipe").c_str(), 0600), 0);
   EXPECT_FALSE(opens("/lib/pipe"));  // and does not wait for a writer
   EXPECT_FALSE(opens("/lib"));
-}
-
-TEST(LinuxMessageDigestTest, IsMd5) {
-  TestPlatform device;
-  for (const auto& [message, digest] :
-       {std::pair("", "<d41d8cd98f00b204e9800998ecf8427e>"),
-        {"message digest", "<f96b697d7cb7938d525a2f31aaf161d0>"},
-        {"12345678901234567890123456789012345678901234567890123456789012345678901234567890",
-         "<57edf4a22be3c955ac49da2e2107b67a>"}}) {
-    const Md5Digest md5 =
-        device.services.messageDigest.md5(std::as_bytes(std::span(std::string_view(message))));
-    EXPECT_EQ(plistText(PlistValue::data({md5.begin(), md5.end()})), digest);
-  }
 }
 
 }  // namespace

@@ -12,19 +12,8 @@
 #include <vector>
 
 #include "testing/binary_plist_builder.h"
-#include "testing/property_list_codec_contract.h"
 
 namespace tbdaily {
-namespace testing {
-
-struct LinuxCodecSubject {
-  LinuxPropertyListCodec codec;
-  PropertyListCodec& service() { return codec; }
-};
-INSTANTIATE_TYPED_TEST_SUITE_P(Linux, PropertyListCodecContract, LinuxCodecSubject);
-
-}  // namespace testing
-
 namespace {
 
 using namespace std::string_literals;
