@@ -19,7 +19,8 @@ AT_ONCE = 2 * (os.cpu_count() or 1)
 def rows(device):
     with sqlite3.connect(device.store_path) as store:
         assert store.execute("PRAGMA integrity_check").fetchall() == [("ok",)]
-        return {table: set(store.execute(f"SELECT * FROM {table}")) for table in ("keys", "scalars", "distribution_values")}
+        return {table: set(store.execute(f"SELECT * FROM {table}"))
+                for table in ("keys", "scalars", "distribution_values")}
 
 
 def latest_report(device):

@@ -10,6 +10,7 @@ import sqlite3
 import subprocess
 import tempfile
 import time
+import unittest
 
 BIN = pathlib.Path(os.environ["TBDAILY_BIN"])
 EPOCH = datetime.datetime(1970, 1, 1)
@@ -17,14 +18,15 @@ NOW = datetime.datetime(2026, 11, 24, 9, 7, 4)
 TODAY = (NOW - EPOCH).days
 YESTERDAY = TODAY - 1
 NO_CONTROLLER = "Could not get matching KdKit service for exporting classes"  # said by each run without one
-ENDPOINT = "com.velmora.tallyd.tbdaily"
-LOGGING = "com.velmora.tallyd.tbdaily.logging"
+JOB = "com.velmora.tallyd.tbdaily"  # its preferences domain and its endpoint
+LOGGING = JOB + ".logging"
 
 
 class Device:
     """Dependent on its recordings alone, unless `live`; the clock stands at NOW."""
 
-    def __init__(self, sample=False, live=False, name="root"):
+    def __init__(self, sample=False, live=False, name="root", profile=None, value=False):
+        """`sample` or a `profile`: as `tallyctl init` makes it; `value`: the scalar k, allowed, was 3 yesterday."""
         self.base = pathlib.Path(tempfile.mkdtemp(prefix="tbdaily-e2e-"))
         self.root = self.base / name
         self.root.mkdir(parents=True)
@@ -33,9 +35,12 @@ class Device:
                         UBSAN_OPTIONS="print_stacktrace=1")
         self.record("clock", {"now": NOW, "ticks": 3600000000000, "numerator": 125, "denominator": 3})
         self.record("usage", {"records": []})  # without one every run waits for a reply that never comes
-        if sample:
+        if sample or profile:
             self.path("System/Device/usage.plist").unlink()
-            self.tally("init")
+            self.tally("init", *(["--profile", profile] if profile else []))
+        if value:
+            self.allow(ScalarKeys={"k": {}})
+            self.record_scalar("k", 3)
 
     def close(self):
         shutil.rmtree(self.base, ignore_errors=True)
@@ -62,13 +67,16 @@ class Device:
         place = self.path(relative)
         return plistlib.loads(place.read_bytes()) if place.exists() else {}
 
-    def enable(self):
-        self.preferences("com.velmora.Crashferry", {"DiagnosticLogSubmissionEnabled": True})
+    def last_day(self):
+        return self.preferences(JOB).get("LastCrashLogSerializationDateInDaysSince1970")
 
     def allow(self, **tables):
         """Submission on, and one whitelist group with these tables."""
-        self.enable()
+        self.preferences("com.velmora.Crashferry", {"DiagnosticLogSubmissionEnabled": True})
         self.whitelist({"G": tables})
+
+    def record_scalar(self, key, value, day=YESTERDAY):
+        self.tally("record", "scalar", key, str(value), "--day", str(day))
 
     @property
     def store_path(self):
@@ -77,10 +85,15 @@ class Device:
     def store(self):
         return sqlite3.connect(f"file:{self.store_path}?mode=ro", uri=True)
 
+    def scalars(self):
+        """Every scalar of the store, summed over its days."""
+        rows = "SELECT name, SUM(value) FROM scalars JOIN keys ON id = key_id GROUP BY name"
+        return dict(self.store().execute(rows))
+
     def run(self, *arguments, **options):
         """The job; it must end with status 0 whatever happens."""
-        result = subprocess.run([BIN / "tbdaily", *arguments], env=dict(self.env, **options), capture_output=True, text=True,
-                                timeout=120)
+        result = subprocess.run([BIN / "tbdaily", *arguments], env=dict(self.env, **options), capture_output=True,
+                                text=True, timeout=120)
         assert result.returncode == 0, (result.returncode, result.stderr)
         assert "runtime error" not in result.stderr and "Sanitizer" not in result.stderr, result.stderr
         return result
@@ -100,11 +113,11 @@ class Device:
 
     @property
     def socket_path(self):
-        return self.path("var/run", ENDPOINT + ".sock")
+        return self.path("var/run", JOB + ".sock")
 
     def tally(self, *arguments, status=0, stdin=None):
-        result = subprocess.run([BIN / "tallyctl", *arguments], env=self.env, capture_output=True, text=True, input=stdin,
-                                timeout=120)
+        result = subprocess.run([BIN / "tallyctl", *arguments], env=self.env, capture_output=True, text=True,
+                                input=stdin, timeout=120)
         assert result.returncode == status, (arguments, result.returncode, result.stdout, result.stderr)
         if status != 0:
             assert len(result.stderr.splitlines()) == 1, result.stderr
@@ -117,9 +130,15 @@ class Device:
         place = self.path("var/log/tbdaily.log")
         return place.read_text(errors="replace") if place.exists() else ""
 
-    def messages(self):
-        """(level, message) of every log line."""
-        return [tuple(line.split("] ", 1)[1].split(": ", 1)) for line in self.log().splitlines() if "] " in line]
+    def texts(self, *levels):
+        """The messages of the log, or those of some levels."""
+        lines = [line.split("] ", 1)[1].split(": ", 1) for line in self.log().splitlines() if "] " in line]
+        return [message for level, message in lines if not levels or level in levels]
+
+    def posts(self, name):
+        """How often a notification was posted."""
+        place = self.path("var/run/notifications", name)
+        return int(place.read_text()) if place.exists() else 0
 
     def pending(self, suffix=".193"):
         return sorted(self.path("var/mobile/Library/Logs/Pending").glob("*" + suffix))
@@ -130,3 +149,10 @@ class Device:
     def snapshot(self):
         """Every file of the root with its bytes."""
         return {str(p.relative_to(self.root)): p.read_bytes() for p in self.root.rglob("*") if p.is_file()}
+
+
+class DeviceTest(unittest.TestCase):
+    def device(self, **options):
+        device = Device(**options)
+        self.addCleanup(device.close)
+        return device

@@ -68,8 +68,8 @@ def with_values(row, stamps, elements):
     elif answer["format"] == 3:
         uppers, hit = row[9] or [], [e for e in elements if e[0]]
         bounds = list(zip([0] + uppers, uppers)) + [(None, None)] * len(elements)
-        answer["buckets"] = [{"lower": low, "upper": up, "hits": e[0], "minimum": e[1], "maximum": e[2], "sum": known(e[3])}
-                             for e, (low, up) in zip(elements, bounds)]
+        answer["buckets"] = [{"lower": low, "upper": up, "hits": e[0], "minimum": e[1], "maximum": e[2],
+                              "sum": known(e[3])} for e, (low, up) in zip(elements, bounds)]
         answer["minimum"], answer["maximum"] = (hit[0][1], hit[-1][2]) if hit else (None, None)
     elif answer["format"] == 4:
         answer["values"] = [known(word) for e in elements for word in e]

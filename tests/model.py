@@ -70,7 +70,8 @@ def history_part(device, whitelist, day):
     """The scalars, distributions and histograms that the store's rows come to."""
     scalars, distributions, histograms = {}, {}, {}
     database = device.store()
-    rows = "SELECT name, day, value FROM scalars JOIN keys ON keys.id = key_id WHERE day BETWEEN ? AND ? ORDER BY name, day"
+    rows = ("SELECT name, day, value FROM scalars JOIN keys ON keys.id = key_id WHERE day BETWEEN ? AND ? "
+            "ORDER BY name, day")
     for key, _, value in database.execute(rows, (day - 1, day)):
         options = whitelist.options("Scalar", key)
         if options is not None:

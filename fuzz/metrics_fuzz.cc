@@ -1,0 +1,68 @@
+// Fuzzer of the driver metrics library: property lists as legends and as collections, and bytes as a hub's
+// buffer. Built as a program of its own with clang, from the top of the tree (bash):
+//
+//   parts=(plist_{binary_reader,builder,scalar_text,xml_reader,xml_writer} property_list_codec base64 xml_doctype)
+//   parts+=(../utf8 ../number_text ../plist_value)
+//   flags="-std=c++20 -g -O1 -fsanitize=fuzzer,address,undefined -I."
+//   clang++ $flags fuzz/metrics_fuzz.cc $(ls drivermetrics/*.cc | grep -v _test.cc)
+//     $(printf 'platform/linux/%s.cc ' ${parts[@]}) -lexpat -o metrics_fuzz
+//   ./metrics_fuzz -max_len=4096 CORPUS
+#include <cstddef>
+#include <cstdint>
+
+#include "drivermetrics/kd_report.h"
+#include "platform/linux/property_list_codec.h"
+#include "testing/fake_drivers.h"
+
+using namespace tbdaily;
+
+namespace {
+
+// Asks everything of every channel.
+void readAll(ChannelCollection* collection, ChannelCollection* earlier) {
+  KdReportIterate(collection, [](ChannelRecord& channel) -> std::uint32_t {
+    (void)KdReportChannelCopyDescription(&channel, 0, "");
+    (void)KdReportSampleCopyDescription(&channel, 0, "");
+    (void)KdReportSampleCreateDelta(&channel, &channel);
+    for (const std::int32_t i : {-1, 0, 1, 65535}) {
+      (void)KdReportArrayGetValueAtIndex(&channel, i);
+      (void)KdReportHistogramGetBucketSum(&channel, i);
+      (void)KdReportStateGetDutyCycle(&channel, i);
+    }
+    (void)KdReportHistogramGetMinValue(&channel);
+    (void)KdReportHistogramGetMaxValue(&channel);
+    (void)KdReportStateGetIndexForID(&channel, 0x4F4E);
+    (void)KdReportStateGetCurrent(&channel);
+    return kKdReportKeep;
+  });
+  (void)KdReportCreateSamplesDelta(earlier, collection);
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  static LinuxPropertyListCodec codec;
+  if (size == 0) return 0;
+  // The first byte is the length of the property list, in sixteenths of the rest; the buffer follows.
+  const auto bytes = std::as_bytes(std::span(data, size)).subspan(1);
+  const std::size_t split = bytes.size() * (data[0] & 15U) / 15;
+  const PlistValue value = codec.parse(bytes.first(split)).value;
+
+  testing::FakeDriverRegistry registry;
+  registry.drivers = {
+      {.identifier = 1,
+       .name = "D",
+       .serviceClass = "D",
+       .properties = {{"KdReportLegendPublic", PlistValue::boolean(true)}, {"KdReportLegend", value}},
+       .parent = {}}};
+  for (const KdReportCollection& channels :
+       {KdReportCopyChannelsForDriver(
+            registry, registry.KdServiceGetMatchingService(registry.KdServiceMatching("D")), 3),
+        KdReportCreateAggregateFromPropertyList(value)}) {
+    const KdReportCollection samples = KdReportCreateSamplesRaw(channels.get(), bytes.subspan(split));
+    readAll(channels.get(), samples.get());
+    readAll(samples.get(), channels.get());
+    (void)KdReportCreateAggregateFromPropertyList(KdReportCopyPropertyList(samples.get()));
+  }
+  return 0;
+}
