@@ -39,7 +39,7 @@ void ChannelPairing::buildIndex() {
   places_.reserve(earlier_.size());
   for (std::size_t i = 0; i < earlier_.size(); ++i) {
     if (const auto identity = identityOf(earlier_[i].get())) {
-      places_.push_back({*identity, i});
+      places_.emplace_back(*identity, i);
     } else {
       unreadable_.push_back(i);
     }

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <tuple>
+#include <utility>
 #include <vector>
 
 #include "drivermetrics/channel_record.h"

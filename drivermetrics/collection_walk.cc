@@ -54,8 +54,7 @@ void prefetchSource(const Channels& channels, std::size_t index) {
 
 std::uint32_t visitChannels(const Visit& mode, const Channels& channels) {
   std::uint32_t status = 0;
-  for (std::size_t i = 0; i < channels.size(); ++i) {
-    const KdReportChannel channel = channels[i];  // stays while it is visited, whatever the visitor does
+  for (const KdReportChannel& channel : channels) {
     const std::uint32_t answer = channel != nullptr ? mode.visitor(channel) : kKdReportWalkFailed;
     if (isOdd(answer)) return answer;
     status |= answer;
