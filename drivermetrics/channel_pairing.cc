@@ -24,8 +24,7 @@ ChannelPairing::Result ChannelPairing::search(const Identity& wanted) {
   buildIndex();
   const std::size_t from = *resume_;
   const auto found = std::lower_bound(places_.begin(), places_.end(), Place{wanted, from});
-  const std::size_t hit =
-      found != places_.end() && found->identity == wanted ? found->index : earlier_.size();
+  const std::size_t hit = found != places_.end() && found->first == wanted ? found->second : earlier_.size();
   const auto odd = std::lower_bound(unreadable_.begin(), unreadable_.end(), from);
   if (odd != unreadable_.end() && *odd < hit) return {.isReadable = false};
   if (hit == earlier_.size()) return {};

@@ -26,11 +26,7 @@ class ChannelPairing {
 
  private:
   using Identity = std::tuple<std::int64_t, std::int64_t, std::uint64_t>;  // driver, channel, type
-  struct Place {
-    Identity identity;
-    std::size_t index;
-    friend auto operator<=>(const Place&, const Place&) = default;
-  };
+  using Place = std::pair<Identity, std::size_t>;                          // and its index
 
   static std::optional<Identity> identityOf(const ChannelRecord* channel);
   Result search(const Identity& wanted);

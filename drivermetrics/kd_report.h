@@ -144,7 +144,8 @@ inline constexpr std::uint32_t kKdReportWalkFailed = 0x111;
 using KdReportVisitor = std::function<std::uint32_t(ChannelRecord&)>;
 
 // Calls the visitor for every channel at every level: those filed at the top first, then those per driver,
-// then those per group. Returns the bitwise OR of its answers, or the odd value that stopped the walk.
+// then those per group. The visitor may change channels, but not the collection. Returns the bitwise OR of
+// its answers, or the odd value that stopped the walk.
 std::uint32_t KdReportIterate(const ChannelCollection* collection, const KdReportVisitor& visitor);
 // The same, and removes in place the channels for which the visitor answers kKdReportRemove, with the levels
 // that become empty.
