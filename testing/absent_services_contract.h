@@ -2,22 +2,6 @@
 // `Platform& services`.
 #pragma once
 
-#include <chrono>
-#include <string>
-#include <thread>
-
-#include "platform/app_registry.h"
-#include "platform/device_answers.h"
-#include "platform/driver_registry.h"
-#include "platform/dynamic_loader.h"
-#include "platform/file_system.h"
-#include "platform/kernel.h"
-#include "platform/locale_settings.h"
-#include "platform/log_submission.h"
-#include "platform/preferences_store.h"
-#include "platform/service_listener.h"
-#include "platform/stack_snapshot.h"
-#include "platform/usage_service.h"
 #include "testing/analytics_lines.h"
 #include "testing/contract_test.h"
 

@@ -103,10 +103,9 @@ class FakeDriverRegistry : public DriverRegistry {
     return kKdSuccess;
   }
   KdStatus KdRegistryEntryGetName(KdHandle entry, std::string& name) override {
-    constexpr std::size_t kMaximumLength = 128;
     const FakeDriver* driver = driverOf(entry);
     if (driver == nullptr || !driver->name) return kKdNotFound;
-    name = driver->name->substr(0, kMaximumLength);
+    name = *driver->name;
     return kKdSuccess;
   }
 
@@ -239,19 +238,14 @@ class FakeUsageService : public UsageService {
  public:
   PlistValue records;  // none: the reply never comes
   std::chrono::milliseconds delay{0};
-  bool workspaceFails = false, feedFails = false;
-  int requests = 0;
 
-  std::unique_ptr<UsageWorkspace> createWorkspace() override {
-    return workspaceFails ? nullptr : std::make_unique<Workspace>(*this);
-  }
+  std::unique_ptr<UsageWorkspace> createWorkspace() override { return std::make_unique<Workspace>(*this); }
   void waitForReplies() { replies_.clear(); }
 
  private:
   struct Feed : UsageFeed {
     explicit Feed(FakeUsageService& service) : fake(service) {}
     void requestUsageToDate(std::span<const std::string>, UsageNameKind, UsageReplyHandler handler) override {
-      ++fake.requests;
       if (fake.records.isNone()) return;
       fake.replies_.emplace_back([handler = std::move(handler), records = fake.records, delay = fake.delay] {
         std::this_thread::sleep_for(delay);
@@ -262,9 +256,7 @@ class FakeUsageService : public UsageService {
   };
   struct Workspace : UsageWorkspace {
     explicit Workspace(FakeUsageService& service) : fake(service) {}
-    std::unique_ptr<UsageFeed> createFeed() override {
-      return fake.feedFails ? nullptr : std::make_unique<Feed>(fake);
-    }
+    std::unique_ptr<UsageFeed> createFeed() override { return std::make_unique<Feed>(fake); }
     FakeUsageService& fake;
   };
 

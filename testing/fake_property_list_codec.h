@@ -18,10 +18,8 @@ class FakePropertyListCodec : public PropertyListCodec {
   std::vector<PlistForm> forms;
 
   void failNextWrite(std::string error) { writeError_ = std::move(error); }
-  void failNextParse(std::string error) { parseError_ = std::move(error); }
 
   PlistParseResult parse(std::span<const std::byte> bytes) override {
-    if (parseError_) return {{}, *std::exchange(parseError_, std::nullopt)};
     std::string text(bytes.size(), '\0');
     std::ranges::transform(bytes, text.begin(), [](std::byte byte) { return static_cast<char>(byte); });
     const auto found = written_.find(text);
@@ -40,7 +38,7 @@ class FakePropertyListCodec : public PropertyListCodec {
 
  private:
   std::map<std::string, PlistValue> written_;
-  std::optional<std::string> writeError_, parseError_;
+  std::optional<std::string> writeError_;
 };
 
 }  // namespace tbdaily::testing

@@ -56,14 +56,12 @@ class FakePreferences : public PreferencesStore {
 class FakeDeviceAnswers : public DeviceAnswers {
  public:
   bool booleanAnswer(std::string_view question) override {
-    asked.emplace_back(question);
     return answers.get(question).asBoolean().value_or(false);
   }
   PlistValue copyAnswer(std::string_view question) override { return answers.get(question); }
   std::optional<std::string> currentOSBuildVersion() override { return build; }
   std::optional<bool> multiUserMode() override { return multiUser; }
   SystemGroupContainer systemGroupContainerPath(std::string_view identifier) override {
-    asked.emplace_back(identifier);
     const auto path = found(containers, identifier);
     return {path, path ? 0U : 2U};
   }
@@ -72,7 +70,6 @@ class FakeDeviceAnswers : public DeviceAnswers {
   std::optional<std::string> build;
   std::optional<bool> multiUser;
   ByName<std::string> containers;
-  std::vector<std::string> asked;
 };
 
 class FakeKernel : public Kernel {
@@ -153,18 +150,18 @@ class FakeAppRegistry : public AppRegistry {
   int enumerations = 0;
 };
 
-// The best localizations are scripted like everything else here: the choice itself belongs to the host.
+// It has no best localizations: the choice belongs to the host.
 class FakeLocaleSettings : public LocaleSettings {
  public:
   std::vector<std::string> preferredLanguages() override { return preferred; }
   std::vector<std::string> systemLanguages() override { return system; }
   std::vector<std::string> bestLocalizations(std::span<const std::string>,
                                              std::span<const std::string>) override {
-    return best;
+    return {};
   }
   std::optional<std::string> countryCode() override { return country; }
 
-  std::vector<std::string> preferred, system, best;
+  std::vector<std::string> preferred, system;
   std::optional<std::string> country;
 };
 

@@ -55,10 +55,6 @@ struct FakeSubject : FakePlatform {
   std::string symbolName() { return "function"; }
 
   // Of AnalyticsContract.
-  void setToday(PlistDate now) { analyticsClient.today = dayNumberOf(now); }
-  std::optional<std::int64_t> scalar(std::string_view key, DayNumber day) {
-    return analyticsClient.scalar(key, day);
-  }
   void addScalar(std::string_view key, DayNumber day, std::int64_t value) {
     analyticsHistory.addScalar(key, day, value);
   }

@@ -1,11 +1,6 @@
 // What callers rely on in every PropertyListCodec. The subject is that of ContractTest.
 #pragma once
 
-#include <limits>
-#include <string>
-#include <vector>
-
-#include "platform/property_list_codec.h"
 #include "testing/contract_test.h"
 
 namespace tbdaily::testing {

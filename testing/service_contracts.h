@@ -13,23 +13,6 @@
 //   put(path, text), library(), symbolName()  a file; a library that is there and a symbol that it has
 #pragma once
 
-#include <cmath>
-#include <limits>
-#include <string>
-#include <string_view>
-#include <utility>
-#include <vector>
-
-#include "platform/app_registry.h"
-#include "platform/device_answers.h"
-#include "platform/dynamic_loader.h"
-#include "platform/file_system.h"
-#include "platform/kernel.h"
-#include "platform/locale_settings.h"
-#include "platform/log_submission.h"
-#include "platform/notifications.h"
-#include "platform/preferences_store.h"
-#include "platform/service_listener.h"
 #include "testing/contract_test.h"
 #include "testing/fake_drivers.h"
 
@@ -304,5 +287,38 @@ REGISTER_TYPED_TEST_SUITE_P(
     LogsAreWrittenBeforeTheCallReturnsAndNotAtAllWhenTheWriterFails, LogSubmissionIsEnabledByTheBooleanAlone,
     BundlesLanguagesAndPostsKeepTheirOrderAndNumber, OneEventASliceGoesToWhatWasResumed,
     DriversAreFoundInOrderAndCountUntilTheyAreReleased, FilesAreReadWholeAndLibrariesByTheirPath);
+
+// What a platform computes, and the fakes do not.
+template <typename Subject>
+struct ComputationContract : ContractTest<Subject> {};
+TYPED_TEST_SUITE_P(ComputationContract);
+GTEST_ALLOW_UNINSTANTIATED_PARAMETERIZED_TEST(ComputationContract);
+
+TYPED_TEST_P(ComputationContract, ChoosesTheBestLocalizations) {
+  using Texts = std::vector<std::string>;
+  struct Case {
+    Texts available, preferred, best;
+  };
+  for (const Case& c : {
+           Case{{"de", "en"}, {"en-GB"}, {"en"}},
+           Case{{"en", "en-GB"}, {"en-GB", "en-US"}, {"en-GB", "en"}},
+           Case{{"zh", "ZH_hant", "zh-Hant-HK"}, {"zh-Hant-TW"}, {"ZH_hant"}},
+           Case{{"pt-BR"}, {"pt", "PT_br"}, {"pt-BR"}},
+           Case{{"de", "en"}, {"en-GB", "de", "en-US"}, {"en", "de"}},
+           Case{{"", "de"}, {"fr", ""}, {}},
+       }) {
+    EXPECT_EQ(this->services.localeSettings.bestLocalizations(c.available, c.preferred), c.best);
+  }
+}
+
+TYPED_TEST_P(ComputationContract, DigestsAreMd5) {
+  for (const auto& [message, digest] : {std::pair("", "<d41d8cd98f00b204e9800998ecf8427e>"),
+                                        {"message digest", "<f96b697d7cb7938d525a2f31aaf161d0>"}}) {
+    const Md5Digest md5 = this->services.messageDigest.md5(bytesOf(message));
+    EXPECT_EQ(plistText(PlistValue::data({md5.begin(), md5.end()})), digest);
+  }
+}
+
+REGISTER_TYPED_TEST_SUITE_P(ComputationContract, ChoosesTheBestLocalizations, DigestsAreMd5);
 
 }  // namespace tbdaily::testing

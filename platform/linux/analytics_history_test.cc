@@ -18,12 +18,6 @@ using testing::Lines;
 class StoredAnalytics : public testing::TestPlatform {
  public:
   void setToday(PlistDate now) { setClock(now.unixSeconds()); }
-  std::optional<std::int64_t> scalar(std::string_view key, DayNumber day) {
-    std::optional<std::int64_t> found;
-    services.analyticsHistory.open()->enumerateScalars(
-        key, day, day, [&](std::string_view, DayNumber, std::int64_t value, bool&) { found = value; });
-    return found;
-  }
   void addScalar(std::string_view key, DayNumber day, std::int64_t value) {
     EXPECT_TRUE(store.setScalar(key, day, value).ok());
   }
@@ -44,6 +38,7 @@ class StoredAnalytics : public testing::TestPlatform {
 
 namespace testing {
 INSTANTIATE_TYPED_TEST_SUITE_P(Stored, AnalyticsContract, StoredAnalytics);
+INSTANTIATE_TYPED_TEST_SUITE_P(Stored, AnalyticsClientContract, StoredAnalytics);
 }  // namespace testing
 
 namespace {

@@ -8,7 +8,6 @@
 #include "platform/linux/unix_socket.h"
 #include "platform/system_log.h"
 #include "testing/absent_services_contract.h"
-#include "testing/computation_contract.h"
 #include "testing/property_list_codec_contract.h"
 #include "testing/service_contracts.h"
 
