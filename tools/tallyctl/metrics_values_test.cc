@@ -20,24 +20,17 @@ std::vector<ChannelValues> valuesOf(const std::vector<KdReportChannel>& channels
 }
 
 TEST(MetricsValuesTest, CodesAreDecimalNegativeOrHexadecimal) {
-  const std::pair<std::string_view, std::optional<std::uint64_t>> cases[] = {
-      {"0", 0},
+  const std::pair<std::string_view, std::uint64_t> codes[] = {
       {"18446744073709551615", UINT64_MAX},
       {"-1", UINT64_MAX},
       {"-9223372036854775808", std::uint64_t{1} << 63},
       {"0x0100007600000000", kNanoseconds},
       {"0XfF", 255},
-      {"18446744073709551616", std::nullopt},
-      {"-9223372036854775809", std::nullopt},
-      {"0x10000000000000000", std::nullopt},
-      {"", std::nullopt},
-      {"0x", std::nullopt},
-      {"0x-1", std::nullopt},
-      {"--1", std::nullopt},
-      {"+1", std::nullopt},
-      {"1 ", std::nullopt},
   };
-  for (const auto& [text, code] : cases) EXPECT_EQ(parseCode(text), code) << text;
+  for (const auto& [text, code] : codes) EXPECT_EQ(parseCode(text), code) << text;
+  for (const char* bad : {"18446744073709551616", "-9223372036854775809", "0x10000000000000000", "", "0x",
+                          "0x-1", "--1", "+1", "1 "})
+    EXPECT_EQ(parseCode(bad), std::nullopt) << bad;
 }
 
 // A channel that runs over the end of the hub's buffer keeps its place without elements.
@@ -74,7 +67,6 @@ TEST(MetricsValuesTest, ResidencyInSeconds) {
   EXPECT_EQ(residencySeconds(channel, 1), std::nullopt);
   channel.unit = kNanoseconds;
   EXPECT_EQ(residencySeconds(channel, 2'500'000'000), 2.5);
-  EXPECT_EQ(residencySeconds(channel, -2'500'000'000), -2.5);
   EXPECT_EQ(residencySeconds(channel, kKdReportInvalid), std::nullopt);
   channel.unit = 0;
   EXPECT_EQ(residencySeconds(channel, 1), std::nullopt);
