@@ -6,7 +6,6 @@
 #include <csignal>
 #include <filesystem>
 #include <fstream>
-#include <initializer_list>
 
 #include "platform/byte_reader.h"
 #include "platform/linux/linux_driver_registry.h"
@@ -17,23 +16,6 @@ namespace {
 
 using ::testing::ElementsAre;
 using Numbers = std::vector<std::uint64_t>;
-
-PlistValue number(std::int64_t n) {
-  return PlistValue::int64(n);
-}
-
-PlistValue element(std::int64_t stamp, std::initializer_list<std::int64_t> words) {
-  PlistArray array;
-  for (const std::int64_t word : words) array.push_back(number(word));
-  return PlistValue::dictionary({{"stamp", number(stamp)}, {"words", PlistValue::array(std::move(array))}});
-}
-
-PlistValue channel(std::int64_t driver, std::int64_t id, std::int64_t type, PlistArray elements) {
-  return PlistValue::dictionary({{"driver", number(driver)},
-                                 {"channel", number(id)},
-                                 {"type", number(type)},
-                                 {"elements", PlistValue::array(std::move(elements))}});
-}
 
 std::vector<std::byte> interests(const Numbers& channels) {
   std::vector<std::byte> list;
@@ -49,15 +31,15 @@ std::vector<std::byte> interests(const Numbers& channels) {
 
 class HubTest : public ::testing::Test {
  protected:
-  HubTest() { record({channel(7, 1, 1, {element(1, {1})})}); }
-  void record(PlistArray channels) {
-    device.record(recording::kHub, "channels", PlistValue::array(std::move(channels)));
+  HubTest() {
+    record(R"([{"driver": 7, "channel": 1, "type": 1, "elements": [{"stamp": 1, "words": [1]}]}])");
   }
-  void open(PlistDictionary client = {}) {
-    if (client.get("kind").isNone()) client.set("kind", PlistValue::string("hub"));
+  void record(std::string_view channels) {
+    device.record(recording::kHub, "channels", device.json(channels));
+  }
+  void open(std::string_view client = R"({"kind": "hub"})") {
     device.record(recording::kRegistry, "entries",
-                  PlistValue::array({PlistValue::dictionary(
-                      {{"class", PlistValue::string("H")}, {"client", PlistValue::dictionary(client)}})}));
+                  device.json(R"([{"class": "H", "client": )" + std::string(client) + "}]"));
     const KdHandle service = registry.KdServiceGetMatchingService(registry.KdServiceMatching("H"));
     openStatus = registry.KdServiceOpen(service, 0, connection);
     registry.KdObjectRelease(service);
@@ -115,13 +97,13 @@ class HubTest : public ::testing::Test {
 
 TEST_F(HubTest, LaysOutInterestsInOrderAndUpdatesInPlace) {
   constexpr std::int64_t kLyingType = 0x0900'0001'0002;
-  const PlistValue odd =
-      PlistValue::dictionary({{"stamp", PlistValue::string("x")},
-                              {"words", PlistValue::array({PlistValue::boolean(true), number(5)})}});
-  record({number(1), PlistValue::dictionary({{"driver", number(7)}}), channel(7, 1, 0x11, {element(10, {1})}),
-          channel(7, 1, 0x99, {element(9, {9}), element(9, {9})}), channel(8, 2, 0x12, {element(11, {1})}),
-          channel(7, 2, kLyingType, {element(20, {1, -2, 3, 4, 5}), odd, number(3)}), channel(7, 4, 1, {}),
-          PlistValue::dictionary({{"driver", number(7)}, {"channel", number(5)}, {"elements", number(1)}})});
+  record(R"([1, {"driver": 7},
+      {"driver": 7, "channel": 1, "type": 17, "elements": [{"stamp": 10, "words": [1]}]},
+      {"driver": 7, "channel": 1, "type": 99, "elements": [{"stamp": 9, "words": [9]}, {}]},
+      {"driver": 8, "channel": 2, "type": 18, "elements": [{"stamp": 11, "words": [1]}]},
+      {"driver": 7, "channel": 2, "type": 9895604715522, "elements": [
+          {"stamp": 20, "words": [1, -2, 3, 4, 5]}, {"stamp": "x", "words": [true, 5]}, 3]},
+      {"driver": 7, "channel": 4, "type": 1, "elements": []}, {"driver": 7, "channel": 5, "elements": 1}])");
   subscribe({2, 3, 1, 4, 5, 1});
   EXPECT_GT(identifier >> 32, 0U);
   EXPECT_NE(static_cast<std::uint32_t>(identifier), 0U);
@@ -129,22 +111,21 @@ TEST_F(HubTest, LaysOutInterestsInOrderAndUpdatesInPlace) {
   EXPECT_THAT(at(0), ElementsAre(7, 2, kLyingType, 20, 1, ~std::uint64_t{1}, 3, 4));
   EXPECT_THAT(at(1), ElementsAre(7, 2, kLyingType, 0, 0, 5, 0, 0));
   EXPECT_THAT(at(2), ElementsAre(7, 2, kLyingType, 0, 0, 0, 0, 0));
-  for (const std::size_t twice : {3U, 4U}) EXPECT_THAT(at(twice), ElementsAre(7, 1, 0x11, 10, 1, 0, 0, 0));
+  for (const std::size_t twice : {3U, 4U}) EXPECT_THAT(at(twice), ElementsAre(7, 1, 17, 10, 1, 0, 0, 0));
 
-  // Shorter, longer than laid out, and another type; seen through the same mapping.
-  record({channel(7, 1, 0x13, {element(30, {6, 7}), element(31, {8})}), channel(7, 2, 5, {element(32, {})})});
+  // Longer than laid out, shorter, and another type; seen through the same mapping.
+  record(R"([
+      {"driver": 7, "channel": 1, "type": 19, "elements": [{"stamp": 30, "words": [6, 7]}, {"stamp": 31}]},
+      {"driver": 7, "channel": 2, "type": 5, "elements": [{"stamp": 32, "words": []}]}])");
   EXPECT_EQ(update(), 0);
   EXPECT_THAT(at(0), ElementsAre(7, 2, 5, 32, 0, 0, 0, 0));
   EXPECT_THAT(at(1), ElementsAre(7, 2, kLyingType, 0, 0, 5, 0, 0));
-  EXPECT_THAT(at(3), ElementsAre(7, 1, 0x13, 30, 6, 7, 0, 0));
+  EXPECT_THAT(at(3), ElementsAre(7, 1, 19, 30, 6, 7, 0, 0));
   EXPECT_EQ(at(3), at(4));
   const Numbers before = at(3);
-  for (const PlistValue& gone : {PlistValue::array({channel(7, 2, 6, {element(33, {1})})}), number(1)}) {
-    device.record(recording::kHub, "channels", gone);
-    EXPECT_EQ(update(), 0);
-    EXPECT_EQ(at(3), before);
-    EXPECT_THAT(at(0), ElementsAre(7, 2, 6, 33, 1, 0, 0, 0));
-  }
+  record("1");
+  EXPECT_EQ(update(), 0);
+  EXPECT_EQ(at(3), before);
 }
 
 TEST_F(HubTest, LeavesNothingBehind) {
@@ -169,7 +150,7 @@ TEST_F(HubTest, LeavesNothingBehind) {
 }
 
 TEST_F(HubTest, IsStrict) {
-  open({{"kind", PlistValue::string("else")}});
+  open(R"({"kind": "else"})");
   EXPECT_EQ(openStatus, kKdNotFound);
   open();
   const auto list = interests({1});
@@ -202,9 +183,10 @@ TEST_F(HubTest, IsStrict) {
 TEST_F(HubTest, FailsAsRecorded) {
   constexpr std::int64_t kFailure = 0xE00002C5;
   // Of opening, method 0, configuring, mapping and updating, which one fails; what follows is refused.
-  const char* keys[] = {"openStatus", "userClientOpenStatus", "configureStatus", "mapStatus", "updateStatus"};
+  const std::string keys[] = {"openStatus", "userClientOpenStatus", "configureStatus", "mapStatus",
+                              "updateStatus"};
   for (std::size_t failing = 0; failing < std::size(keys); ++failing) {
-    open({{keys[failing], number(kFailure)}});
+    open(R"({"kind": "hub", ")" + keys[failing] + "\": " + std::to_string(kFailure) + "}");
     const KdStatus statuses[] = {openStatus, start(), configure(interests({1})), map(), update()};
     for (std::size_t step = 0; step <= failing; ++step)
       EXPECT_EQ(statuses[step], step == failing ? static_cast<KdStatus>(kFailure) : 0) << keys[failing];
@@ -212,7 +194,9 @@ TEST_F(HubTest, FailsAsRecorded) {
 }
 
 TEST_F(HubTest, WithoutMemoryItStaysUnconfigured) {
-  record({channel(7, 1, 1, PlistArray(4096, element(1, {1})))});
+  std::string elements = "{}";
+  for (int i = 1; i < 4096; ++i) elements += ", {}";
+  record(R"([{"driver": 7, "channel": 1, "type": 1, "elements": [)" + elements + "]}]");
   open();
   EXPECT_EQ(start(), 0);
   const auto one = interests({1});

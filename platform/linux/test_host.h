@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "platform/linux/linux_platform.h"
+#include "platform/linux/plist_json.h"
 #include "platform/linux/property_list_codec.h"
 #include "platform/linux/recordings.h"
 #include "testing/temporary_folder.h"
@@ -44,6 +45,7 @@ struct TestHost {
     return all;
   }
 
+  static PlistValue json(std::string_view text) { return plistFromJson(text).value; }
   PlistValue parse(std::string_view list) { return codec.parse(std::as_bytes(std::span(list))).value; }
 
   // Replaces one entry of a recording; a none value takes it away.
