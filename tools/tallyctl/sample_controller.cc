@@ -137,7 +137,7 @@ PlistData sampleDefects() {
         .u32(1'200 + 17 * i)
         .u32(300 + i)
         .u32(3 + i)
-        .u32(40 * i)
+        .u32(std::uint64_t{40} * i)
         .u32(temperature)
         .u32(i % 3);
   }
@@ -146,7 +146,7 @@ PlistData sampleDefects() {
 
 PlistData sampleTaskScheduler() {
   ByteWriter out;
-  for (std::uint32_t task = 0; task < 16; ++task)
+  for (std::uint64_t task = 0; task < 16; ++task)
     out.u32(task).u32(task * 250).u32(10'000 - task * 400).u32(0);
   return out.take();
 }
@@ -182,11 +182,11 @@ PlistData sampleSnapshotHeader() {
   constexpr std::string_view kTitle = "Snapshots of the sample controller";
   constexpr std::uint32_t kFieldTable = 80;
   ByteWriter out;
-  out.u32(0).u32(6).u32(kSnapshotWords * 4).u32(kSnapshots).u64(0).u32(kFieldTable).u64(0);
+  out.u32(0).u32(6).u32(std::uint64_t{kSnapshotWords} * 4).u32(kSnapshots).u64(0).u32(kFieldTable).u64(0);
   out.text(kTitle, kFieldTable - 36);
   out.u32(kFields.size()).u32(0);
   for (const Field& field : kFields)
-    out.u16(field.kind).u16(0).u32(field.word * 4).u32(field.size).text(field.format, 16);
+    out.u16(field.kind).u16(0).u32(std::uint64_t{field.word} * 4).u32(field.size).text(field.format, 16);
   return out.take();
 }
 
