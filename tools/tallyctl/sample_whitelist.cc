@@ -49,6 +49,7 @@ constexpr Entry kEntries[] = {
     {"Power", List::DistributionKeys, "power.batteryLevel", 0, 0, kPercent},
     {"Power", List::DistributionKeys, "power.batteryTemperature", 0, 0, kDegrees},
     {"Power", List::DistributionKeys, "power.drainRate", 0, 0, kNone},
+    {"Drivers", List::ScalarKeyPrefixes, "com.velmora.kdreport.", 0, 3, kNone},
     {"Network", List::ScalarKeyPrefixes, "net.wifi.", 0, 2, kNone},
     {"Network", List::ScalarKeyPrefixes, "net.", 100, 0, kNone},
     {"Network", List::ScalarKeyPrefixes, "datausage.", 0, 2, kNone},
