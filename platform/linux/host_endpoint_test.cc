@@ -1,6 +1,5 @@
 // The endpoint under peers that are slow, many, large or hostile.
 #include <gtest/gtest.h>
-#include <sys/resource.h>
 #include <unistd.h>
 
 #include <csignal>
@@ -70,16 +69,12 @@ class EndpointTest : public ::testing::Test {
 };
 
 TEST_F(EndpointTest, BelongsToOneListenerAndOnlyStaleSocketsAreReplaced) {
-  {
-    LinuxServiceListener second(device.host, device.codec);
-    EXPECT_EQ(second.createListener(kEndpoint, DeliveryQueue::Main), 0U);
-    EXPECT_EQ(second.runSlice(0), SliceResult::TimedOut);
-  }
+  LinuxServiceListener other(device.host, device.codec);
+  EXPECT_EQ(other.createListener(kEndpoint, DeliveryQueue::Main), 0U);
   EXPECT_TRUE(connect().isOpen());  // the refused one left the socket alone
-  for (const char* name : {"", "../e", ".e"})
-    EXPECT_EQ(listener.createListener(name, DeliveryQueue::Main), 0U);
   device.put("/var/run/taken.sock", "a file");
-  EXPECT_EQ(LinuxServiceListener(device.host, device.codec).createListener("taken", DeliveryQueue::Main), 0U);
+  for (const char* name : {"", "../e", ".e", "taken"})
+    EXPECT_EQ(other.createListener(name, DeliveryQueue::Main), 0U) << name;
   EXPECT_EQ(device.text("/var/run/taken.sock"), "a file");
   // Closing a bound socket leaves its file, as a job that was killed does.
   EXPECT_EQ(listenUnixSocket(endpointPath(device.host, "stale")).error, 0);
@@ -150,14 +145,12 @@ TEST_F(EndpointTest, LetsPeersTakeTurns) {
 TEST_F(EndpointTest, RestsWhenNoDescriptorIsLeftAndServesTheCrowdLater) {
   std::vector<FileDescriptor> crowd;
   for (int i = 0; i < 20; ++i) crowd.push_back(connect());
-  rlimit before{};
-  ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
-  const rlimit none{static_cast<rlim_t>(crowd.back().get()) + 1, before.rlim_max};
-  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &none), 0);
-  const std::clock_t start = std::clock();
-  EXPECT_EQ(listener.runSlice(0.4), SliceResult::TimedOut);
-  EXPECT_LT(std::clock() - start, CLOCKS_PER_SEC / 10);  // it did not spin
-  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &before), 0);
+  {
+    const testing::ResourceLimit none(RLIMIT_NOFILE, static_cast<rlim_t>(crowd.back().get()) + 1);
+    const std::clock_t start = std::clock();
+    EXPECT_EQ(listener.runSlice(0.4), SliceResult::TimedOut);
+    EXPECT_LT(std::clock() - start, CLOCKS_PER_SEC / 10);  // it did not spin
+  }
   EXPECT_EQ(serve().size(), crowd.size());
 }
 

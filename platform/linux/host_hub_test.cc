@@ -1,9 +1,7 @@
 // The driver metrics hub of a recording.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/resource.h>
 
-#include <csignal>
 #include <filesystem>
 #include <fstream>
 
@@ -203,15 +201,10 @@ TEST_F(HubTest, WithoutMemoryItStaysUnconfigured) {
   const auto tooMany = interests(Numbers(4097, 1));  // each of 256 KiB: one above a GiB
   EXPECT_EQ(configure(tooMany), kKdNoMemory);
 
-  rlimit before{};
-  ::getrlimit(RLIMIT_FSIZE, &before);
-  const auto handler = std::signal(SIGXFSZ, SIG_IGN);
-  const rlimit small{100, before.rlim_max};
-  ::setrlimit(RLIMIT_FSIZE, &small);
-  const KdStatus withoutRoom = configure(one);
-  ::setrlimit(RLIMIT_FSIZE, &before);
-  std::signal(SIGXFSZ, handler);
-  EXPECT_EQ(withoutRoom, kKdNoMemory);
+  {
+    const testing::ResourceLimit small(RLIMIT_FSIZE, 100);
+    EXPECT_EQ(configure(one), kKdNoMemory);
+  }
   EXPECT_EQ(held(), 0U);
   EXPECT_EQ(configure(one), 0);
 }

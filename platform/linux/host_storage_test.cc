@@ -1,12 +1,10 @@
 // What the host layer writes: preferences, the log spool, notifications, the system log.
 #include <errno.h>  // program_invocation_short_name
 #include <gtest/gtest.h>
-#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <cmath>
-#include <csignal>
 #include <limits>
 #include <thread>
 
@@ -15,16 +13,15 @@
 #include "platform/linux/log_spool.h"
 #include "platform/linux/test_host.h"
 #include "platform/system_log.h"
-#include "testing/binary_plist_builder.h"
 
 namespace tbdaily {
 namespace {
 
 namespace fs = std::filesystem;
+using namespace std::string_literals;
 using testing::TestHost;
 using testing::TestPlatform;
 using Names = std::vector<std::string>;
-using Builder = testing::BinaryPlistBuilder;
 
 constexpr double kNow = 1795511224.99951171875;
 const PlistDate kDate = PlistDate::fromUnixSeconds(kNow);
@@ -53,9 +50,9 @@ TEST_F(PreferencesTest, LoseNoUpdateBetweenThreadsAndProcesses) {
     write(0);
     ::_exit(0);
   }
-  std::vector<std::thread> threads;
-  for (int writer = 1; writer < kWriters; ++writer) threads.emplace_back(write, writer);
-  for (std::thread& thread : threads) thread.join();
+  std::thread second(write, 1), third(write, 2);
+  second.join();
+  third.join();
   ASSERT_EQ(::waitpid(process, nullptr, 0), process);
   for (int writer = 0; writer < kWriters; ++writer) {
     const std::string key = "writer " + std::to_string(writer);
@@ -90,9 +87,8 @@ TEST_F(PreferencesTest, MoveDamagedFilesAsideAndNeverOverwriteThem) {
 
 TEST_F(PreferencesTest, TouchNoFileForAHostileDomain) {
   device.put("/var/mobile/Library/secret.plist", "x");
-  for (const std::string& domain : {std::string("../secret"), std::string("a/b"), std::string(".hidden"),
-                                    std::string(), std::string(201, 'a'), std::string("a b"),
-                                    std::string("a\0b", 3), std::string("\xC3\xA9"), std::string("..")}) {
+  for (const std::string& domain :
+       {"../secret"s, "a/b"s, ".hidden"s, ""s, std::string(201, 'a'), "a b"s, "a\0b"s, "\xC3\xA9"s, ".."s}) {
     preferences.setValue("k", PlistValue::int64(1), domain);
     preferences.synchronize(domain);
     EXPECT_TRUE(preferences.getValue("k", domain).isNone());
@@ -103,13 +99,7 @@ TEST_F(PreferencesTest, TouchNoFileForAHostileDomain) {
   EXPECT_EQ(preferences.getInteger("k", std::string(200, 'a')), 1);
 }
 
-TEST_F(PreferencesTest, ReadEveryFormAndWriteTheExactOne) {
-  Builder binary;
-  binary.add(Builder::dictionary({1}, {2}));
-  binary.add(Builder::ascii("k"));
-  binary.add(Builder::integer(-7));
-  device.put(path("d.plist"), binary.build());
-  EXPECT_EQ(preferences.getValue("k", "d"), PlistValue::int64(-7));
+TEST_F(PreferencesTest, ReadFilesOfOthersAndWriteTheExactForm) {
   device.put(path("d.plist"), "<plist><dict><key>k</key><integer>8</integer></dict></plist>");
   EXPECT_EQ(preferences.getValue("k", "d"), PlistValue::int64(8));
   preferences.setValue("date", PlistValue(PlistDate{0.5}), "d");
@@ -179,15 +169,10 @@ TEST_F(SpoolTest, WritesStructuredLinesWholeOrNotAtAll) {
   EXPECT_EQ(text("Structured/172/2026-11-24.jsonl"), line);
   spool.appendStructured(172, data, kDate);
 
-  // The disk fills up in the middle of a line.
-  rlimit before{};
-  ::getrlimit(RLIMIT_FSIZE, &before);
-  const rlimit narrow{2 * line.size() + 30, before.rlim_max};
-  const auto previous = std::signal(SIGXFSZ, SIG_IGN);
-  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &narrow), 0);
-  spool.appendStructured(172, data, kDate);
-  ::setrlimit(RLIMIT_FSIZE, &before);
-  std::signal(SIGXFSZ, previous);
+  {
+    const testing::ResourceLimit full(RLIMIT_FSIZE, 2 * line.size() + 30);  // in the middle of a line
+    spool.appendStructured(172, data, kDate);
+  }
   spool.appendStructured(172, {}, PlistDate::fromUnixSeconds(kNow - 4));
   EXPECT_EQ(text("Structured/172/2026-11-24.jsonl"),
             line + line + "{\"time\": \"2026-11-24T09:07:00.999Z\", \"data\": {}}\n");
@@ -234,13 +219,12 @@ TEST_F(SpoolTest, SubmitsAllThatIsPendingOnceAndKeepsFiveCarewellLogs) {
 TEST(LinuxNotificationsTest, CountEveryPostOfSeveralThreads) {
   TestHost device;
   LinuxNotifications notifications(device.host);
-  std::vector<std::thread> threads;
-  for (int i = 0; i < 4; ++i) {
-    threads.emplace_back([&] {
-      for (int post = 0; post < 25; ++post) notifications.post("n");
-    });
-  }
-  for (std::thread& thread : threads) thread.join();
+  const auto post = [&] {
+    for (int i = 0; i < 50; ++i) notifications.post("n");
+  };
+  std::thread other(post);
+  post();
+  other.join();
   EXPECT_EQ(device.text("/var/run/notifications/n"), "100\n");
   device.put("/var/run/notifications/n", "rubbish");
   for (const char* name : {"n", "../out", "", ".n"}) notifications.post(name);
@@ -250,8 +234,9 @@ TEST(LinuxNotificationsTest, CountEveryPostOfSeveralThreads) {
 }
 
 TEST(LinuxSystemLogTest, WritesLinesThatStayLines) {
-  const auto logLines = [](TestPlatform& device) {
-    device.setClock(kNow);
+  TestPlatform device;
+  device.setClock(kNow);
+  const auto write = [&] {
     LinuxPlatform platform(device.host);
     SystemLog& log = platform.services().systemLog;
     log.message(LogLevel::Default, "day %d of %s", 20780, "text");
@@ -260,34 +245,31 @@ TEST(LinuxSystemLogTest, WritesLinesThatStayLines) {
     log.message(LogLevel::Error, "100%%");
     log.writePlain("plain %d\n");
   };
-  const std::string process(program_invocation_short_name);
-  const std::string start =
-      "2026-11-24T09:07:04.999511Z " + process + "[" + std::to_string(::getpid()) + "] ";
-  const auto expected = [&](const std::string& first, const std::string& second, const std::string& debug) {
-    return start + "default: " + first + start + "info: " + second + (debug.empty() ? "" : start + debug) +
-           start + "error: 100%\n" + start + "default: plain %d\n\t\n";
-  };
-  TestPlatform device, internal;
-  logLines(device);
-  EXPECT_EQ(device.text("/var/log/tbdaily.log"),
-            expected("day 20780 of <private>\n", "a\n\tb and <private>\n", ""));
-  internal.record("answers.plist", "InternalBuild", PlistValue::boolean(true));
-  ::setenv("TBDAILY_LOG_DEBUG", "1", 1);
-  logLines(internal);
-  ::unsetenv("TBDAILY_LOG_DEBUG");
-  EXPECT_EQ(internal.text("/var/log/tbdaily.log"),
-            expected("day 20780 of text\n", "a\n\tb and 1\n", "debug: debug\n"));
+  const std::string start = "2026-11-24T09:07:04.999511Z " + std::string(program_invocation_short_name) +
+                            "[" + std::to_string(::getpid()) + "] ";
+  const std::string end = start + "error: 100%\n" + start + "default: plain %d\n\t\n";
+  write();
+  const std::string lines =
+      start + "default: day 20780 of <private>\n" + start + "info: a\n\tb and <private>\n" + end;
+  EXPECT_EQ(device.text("/var/log/tbdaily.log"), lines);
 
   ::setenv("TBDAILY_LOG", "stderr", 1);
   ::setenv("JOURNAL_STREAM", "8:1", 1);
   ::testing::internal::CaptureStderr();
-  logLines(device);
-  const std::string journal = ::testing::internal::GetCapturedStderr();
+  write();
+  EXPECT_EQ(::testing::internal::GetCapturedStderr(), "<5>" + start + "default: day 20780 of <private>\n<6>" +
+                                                          start + "info: a\n<6>\tb and <private>\n<3>" +
+                                                          start + "error: 100%\n<5>" + start +
+                                                          "default: plain %d\n<5>\t\n");
   ::unsetenv("TBDAILY_LOG");
   ::unsetenv("JOURNAL_STREAM");
-  EXPECT_EQ(journal, "<5>" + start + "default: day 20780 of <private>\n<6>" + start +
-                         "info: a\n<6>\tb and <private>\n<3>" + start + "error: 100%\n<5>" + start +
-                         "default: plain %d\n<5>\t\n");
+
+  device.record("answers.plist", "InternalBuild", PlistValue::boolean(true));
+  ::setenv("TBDAILY_LOG_DEBUG", "1", 1);
+  write();
+  ::unsetenv("TBDAILY_LOG_DEBUG");
+  EXPECT_EQ(device.text("/var/log/tbdaily.log"), lines + start + "default: day 20780 of text\n" + start +
+                                                     "info: a\n\tb and 1\n" + start + "debug: debug\n" + end);
 }
 
 }  // namespace

@@ -1,7 +1,11 @@
 // A device root and a made-up live host in a folder of their own, for one test.
 #pragma once
 
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+
 #include <algorithm>
+#include <csignal>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -59,6 +63,28 @@ struct TestHost {
   void setClock(double unixSeconds) {
     record(recording::kClock, "now", PlistValue(PlistDate::fromUnixSeconds(unixSeconds)));
   }
+};
+
+// Lowers a limit of the process for as long as it lives. What then does not fit a file fails, without a
+// signal.
+class ResourceLimit {
+ public:
+  ResourceLimit(__rlimit_resource resource, rlim_t most) : resource_(resource) {
+    ::getrlimit(resource, &before_);
+    const rlimit lowered{most, before_.rlim_max};
+    EXPECT_EQ(::setrlimit(resource, &lowered), 0);
+  }
+  ~ResourceLimit() {
+    ::setrlimit(resource_, &before_);
+    std::signal(SIGXFSZ, handler_);
+  }
+  ResourceLimit(const ResourceLimit&) = delete;
+  ResourceLimit& operator=(const ResourceLimit&) = delete;
+
+ private:
+  __rlimit_resource resource_;
+  rlimit before_{};
+  void (*handler_)(int) = std::signal(SIGXFSZ, SIG_IGN);
 };
 
 // A Linux platform over it.
