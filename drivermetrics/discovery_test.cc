@@ -200,12 +200,11 @@ TEST(ChannelRecords, AnswerForWhatIsMissing) {
   for (ChannelRecord* channel : {empty.get(), static_cast<ChannelRecord*>(nullptr)}) {
     EXPECT_EQ(KdReportChannelGetDriverID(channel), kKdReportInvalid);
     EXPECT_EQ(KdReportChannelGetChannelID(channel), kKdReportInvalid);
+    EXPECT_EQ(KdReportChannelGetUnit(channel), kKdReportInvalid);
     EXPECT_EQ(KdReportChannelGetFormat(channel), 0);
     EXPECT_EQ(KdReportChannelGetCategories(channel), 0xFFFF);
-    EXPECT_EQ(KdReportChannelGetUnit(channel), kKdReportInvalid);
-    EXPECT_EQ(KdReportChannelGetGroup(channel), std::nullopt);
-    EXPECT_EQ(KdReportChannelGetChannelName(channel), std::nullopt);
-    EXPECT_EQ(KdReportChannelGetUnitLabel(channel), std::nullopt);
+    EXPECT_FALSE(KdReportChannelGetGroup(channel) || KdReportChannelGetChannelName(channel) ||
+                 KdReportChannelGetUnitLabel(channel));
     EXPECT_EQ(setChannelType(channel, channelType(1)), kKdError);
   }
   const KdReportCollection byDriver = KdReportCreateAggregate(kKdReportFileByDriver);
