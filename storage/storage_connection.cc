@@ -68,11 +68,7 @@ KdHandle findNandExporter(DriverRegistry& registry, const NandExporter*& descrip
 }
 
 StorageService::StorageService(DriverRegistry& registry, NandExporterTable exporters)
-    : registry_(registry), handle_(findNandExporter(registry, descriptor_, exporters)) {}
-
-StorageService::~StorageService() {
-  if (handle_ != 0) registry_.KdObjectRelease(handle_);
-}
+    : registry_(registry), handle_(registry, findNandExporter(registry, descriptor_, exporters)) {}
 
 StorageBuffer::StorageBuffer(std::size_t size)
     : memory_(static_cast<std::byte*>(::operator new(size, kPageAlignment, std::nothrow))), size_(size) {}

@@ -8,6 +8,7 @@
 #include <memory>
 #include <span>
 
+#include "platform/driver_handle.h"
 #include "platform/driver_registry.h"
 #include "storage/diagnostics.h"
 #include "storage/exporters.h"
@@ -24,12 +25,9 @@ KdHandle findNandExporter(DriverRegistry& registry, const NandExporter*& descrip
 class StorageService {
  public:
   explicit StorageService(DriverRegistry& registry, NandExporterTable exporters = nand_exporters);
-  ~StorageService();
-  StorageService(const StorageService&) = delete;
-  StorageService& operator=(const StorageService&) = delete;
 
-  explicit operator bool() const { return handle_ != 0; }
-  KdHandle handle() const { return handle_; }
+  explicit operator bool() const { return handle() != 0; }
+  KdHandle handle() const { return handle_.get(); }
   // Never null: the empty row when there is no service.
   const NandExporter& descriptor() const { return *descriptor_; }
   DriverRegistry& registry() const { return registry_; }
@@ -37,7 +35,7 @@ class StorageService {
  private:
   DriverRegistry& registry_;
   const NandExporter* descriptor_ = nullptr;
-  KdHandle handle_ = 0;
+  DriverHandle handle_;
 };
 
 // A page-aligned buffer that a driver fills. Its bytes are indeterminate until then.

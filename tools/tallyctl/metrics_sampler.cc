@@ -4,6 +4,7 @@
 #include <cstdio>
 
 #include "drivermetrics/report_error.h"
+#include "platform/driver_handle.h"
 #include "tools/tallyctl/tool.h"
 
 namespace tbdaily {
@@ -23,12 +24,11 @@ std::string_view whatIsMissing(DriverRegistry& registry) {
     return "; this device has no driver registry: record System/Device/registry.plist, or make a sample "
            "device with tallyctl init";
   }
-  const KdHandle service = registry.KdServiceGetMatchingService(hub);
-  if (service == 0) {
+  const DriverHandle service(registry, registry.KdServiceGetMatchingService(hub));
+  if (service.get() == 0) {
     return "; this device has no metrics hub: registry.plist needs an entry of the class KdReportHub with a "
            "client of the kind hub";
   }
-  registry.KdObjectRelease(service);
   return {};
 }
 
