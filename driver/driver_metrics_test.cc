@@ -15,16 +15,14 @@ constexpr std::int64_t kOneElement = std::int64_t{1} << 32;
 constexpr std::int64_t kDaily = 0x100 << 16;
 constexpr std::int64_t kOther = 0x200 << 16;
 
-struct Channel {
-  std::int64_t identifier, type;
-  const char* name;  // null: none
-};
+// Identifier, type and, unless null, name of each channel.
+using Channels = std::vector<std::tuple<std::int64_t, std::int64_t, const char*>>;
 
-testing::FakeDriver driverWith(std::uint64_t identifier, std::initializer_list<Channel> channels) {
+testing::FakeDriver driverWith(std::uint64_t identifier, const Channels& channels) {
   PlistArray entries;
-  for (const Channel& channel : channels) {
-    PlistArray entry{PlistValue::int64(channel.identifier), PlistValue::int64(channel.type)};
-    if (channel.name != nullptr) entry.push_back(PlistValue::string(channel.name));
+  for (const auto& [channel, type, name] : channels) {
+    PlistArray entry{PlistValue::int64(channel), PlistValue::int64(type)};
+    if (name != nullptr) entry.push_back(PlistValue::string(name));
     entries.push_back(PlistValue::array(entry));
   }
   const PlistValue group = PlistValue::dictionary({{"KdReportChannels", PlistValue::array(entries)}});
@@ -40,14 +38,12 @@ TEST(DriverMetrics, SimpleChannelsOfTheDailyCategoryBecomeScalars) {
   testing::FakePlatform fake;
   testing::ScriptedHub hub(fake.driverRegistry);
   const std::int64_t simple = kOneElement | kDaily | 1;
-  const auto element = [&hub](std::uint64_t driver, std::uint64_t identifier, std::int64_t type,
-                              std::int64_t value) {
-    for (const std::uint64_t word :
-         {driver, identifier, static_cast<std::uint64_t>(type), std::uint64_t{1},
-          static_cast<std::uint64_t>(value), std::uint64_t{0}, std::uint64_t{0}, std::uint64_t{0}}) {
+  const auto element = [&](std::uint64_t driver, std::uint64_t channel, std::int64_t value) {
+    for (const std::uint64_t word : {driver, channel, static_cast<std::uint64_t>(simple), std::uint64_t{1},
+                                     static_cast<std::uint64_t>(value)})
       for (unsigned shift = 0; shift < 64; shift += 8)
         hub.buffer.push_back(static_cast<std::byte>(word >> shift));
-    }
+    hub.buffer.resize(hub.buffer.size() + 24);
   };
   fake.driverRegistry.drivers.push_back(driverWith(10, {{1, simple, "Temp"},
                                                         {2, kOneElement | kDaily | 2, "State"},
@@ -55,10 +51,10 @@ TEST(DriverMetrics, SimpleChannelsOfTheDailyCategoryBecomeScalars) {
                                                         {4, simple, nullptr},
                                                         {0x434F55, simple, nullptr}}));
   fake.driverRegistry.drivers.push_back(driverWith(11, {{1, simple, "Temp"}, {2, simple, "Missing"}}));
-  element(10, 1, simple, 42);
-  element(10, 4, simple, 1);
-  element(10, 0x434F55, simple, -7);
-  element(11, 1, simple, 43);
+  element(10, 1, 42);
+  element(10, 4, 1);
+  element(10, 0x434F55, -7);
+  element(11, 1, 43);
 
   CollectDriverMetricScalars(fake.platform);
   EXPECT_THAT(fake.analyticsClient.calls,

@@ -1,7 +1,6 @@
 #include "driver/entry.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include "driver/daily_tasks.h"
 #include "driver/environment_probes.h"
@@ -38,7 +37,6 @@ class EntryTest : public ::testing::Test {
  protected:
   EntryTest() {
     gCommandState.gAppInfoRequested = false;
-    gCommandState.commandOnce.reset();
     gInternalDeviceAnswer.once.reset();
     gEnvironmentProbeCache = {};
     fake_.analyticsClient.today = kToday;
@@ -46,10 +44,8 @@ class EntryTest : public ::testing::Test {
     fake_.usageService.records = PlistValue::array({});  // a reply at once
     fake_.analyticsHistory.addScalar("k", kToday - 1, 1);
     fake_.analyticsHistory.addScalar("k", kToday, 2);
-    fake_.putPlist(
-        kWhitelistPath,
-        {{"G", PlistValue::dictionary(
-                   {{"ScalarKeys", PlistValue::dictionary({{"k", PlistValue::dictionary({})}})}})}});
+    const PlistValue keys = PlistValue::dictionary({{"k", PlistValue::dictionary({})}});
+    fake_.putPlist(kWhitelistPath, {{"G", PlistValue::dictionary({{"ScalarKeys", keys}})}});
   }
 
   // Runs the process and answers its log lines between the first and the last.
@@ -63,8 +59,15 @@ class EntryTest : public ::testing::Test {
     return {lines.begin() + 1, lines.end() - 1};
   }
   PlistValue lastDay() { return fake_.preferences.getValue(kLastDay, "com.velmora.tallyd.tbdaily"); }
-  PlistValue appInfoOfReport(std::size_t index) {
-    return fake_.plistOf(fake_.logSubmission.logs.at(index)).asDictionary()->get("TBActivatedAppInfo");
+  // Runs the process as a listener to which a peer sends these messages.
+  std::vector<std::string> receive(const std::vector<PlistDictionary>& messages) {
+    gCommandState.commandOnce.reset();
+    fake_.serviceListener.addPeer(kPeer);
+    for (const PlistDictionary& message : messages) fake_.serviceListener.addMessage(kPeer, message);
+    return run({});
+  }
+  PlistValue appInfoOfReport() {
+    return fake_.plistOf(fake_.logSubmission.logs.back()).asDictionary()->get("TBActivatedAppInfo");
   }
 
   testing::FakePlatform fake_;
@@ -92,16 +95,17 @@ TEST_F(EntryTest, ForcedRunsNeitherReadNorWriteTheLastDay) {
 }
 
 TEST_F(EntryTest, TheStepsRunInTheirOrderWithAndWithoutTheReport) {
-  RunDailyTasks(fake_.platform, 5, {});
-  EXPECT_THAT(fake_.analyticsClient.calls, Contains("checkpoint"));
-  EXPECT_THAT(fake_.logSubmission.calls, ElementsAre("enabled?", "dump", "roll"));  // day 5 has no rows
-  fake_.logSubmission.calls.clear();
-  RunDailyTasks(fake_.platform, kToday, {});
-  EXPECT_THAT(fake_.logSubmission.calls, ElementsAre("enabled?", "write", "dump", "roll"));
-  fake_.logSubmission.calls.clear();
-  fake_.logSubmission.enabled = false;
-  RunDailyTasks(fake_.platform, kToday, {});
-  EXPECT_THAT(fake_.logSubmission.calls, ElementsAre("enabled?", "dump", "roll"));
+  const std::tuple<DayNumber, bool, std::vector<std::string>> cases[] = {
+      {5, true, {"enabled?", "dump", "roll"}},  // day 5 has no rows
+      {kToday, true, {"enabled?", "write", "dump", "roll"}},
+      {kToday, false, {"enabled?", "dump", "roll"}}};
+  for (const auto& [day, isEnabled, calls] : cases) {
+    fake_.logSubmission.calls.clear();
+    fake_.logSubmission.enabled = isEnabled;
+    RunDailyTasks(fake_.platform, day, {});
+    EXPECT_EQ(fake_.logSubmission.calls, calls);
+  }
+  EXPECT_EQ(fake_.analyticsClient.calls[0], "checkpoint");
 }
 
 TEST_F(EntryTest, TheListenerEndsAfterOneQuietSlice) {
@@ -118,22 +122,18 @@ TEST_F(EntryTest, TheListenerEndsAfterOneQuietSlice) {
 }
 
 TEST_F(EntryTest, AppInfoThatWasAskedForStandsInTheReport) {
-  fake_.serviceListener.addPeer(kPeer);
-  fake_.serviceListener.addMessage(kPeer, operation(2));  // nobody asked yet
-  fake_.serviceListener.addMessage(kPeer, {});            // no operation counts as 0
   PlistDictionary info = operation(2 + (std::int64_t{7} << 32));
   info.set("app_data",
            PlistValue::array({app("one"), PlistValue::string("odd"), app("two", 15), app("three")}));
-  fake_.serviceListener.addMessage(kPeer, info);
-  fake_.serviceListener.addMessage(kPeer, operation(2));  // and nobody asks any more
-  const auto lines = run({});
+  // Nobody asked yet; no operation counts as 0; in the end nobody asks any more.
+  const auto lines = receive({operation(2), {}, info, operation(2)});
   EXPECT_EQ(lines[0], "default: tbdaily got (unsolicited -- so ignoring) AAI:\n[]");
   EXPECT_EQ(lines[1], "default: notified of logging status, waiting for activate app info");
   EXPECT_TRUE(lines[2].starts_with("default: tbdaily got requestedAAI:\n[{\"bundle\": \"one\""));
-  EXPECT_EQ(lines.back(), "default: tbdaily got (unsolicited -- so ignoring) AAI:\n[]");
+  EXPECT_EQ(lines.back(), lines[0]);
   EXPECT_THAT(fake_.notifications.posts, ElementsAre("com.velmora.tallyd.tbdaily.logging"));
-  ASSERT_EQ(fake_.logSubmission.logs.size(), 1U);
-  const PlistValue appInfo = appInfoOfReport(0);
+  EXPECT_EQ(fake_.logSubmission.logs.size(), 1U);
+  const PlistValue appInfo = appInfoOfReport();
   ASSERT_EQ(appInfo.asArray()->size(), 2U);
   EXPECT_EQ((*appInfo.asArray())[1],
             PlistValue::dictionary({{"bundle", PlistValue::string("three")},
@@ -143,39 +143,25 @@ TEST_F(EntryTest, AppInfoThatWasAskedForStandsInTheReport) {
                                     {"uuid", PlistValue::string("ABABABAB-ABAB-ABAB-ABAB-ABABABABABAB")}}));
 }
 
-TEST_F(EntryTest, AnAnswerThatNeverCameIsDoneWithout) {
-  fake_.serviceListener.addPeer(kPeer);
-  fake_.serviceListener.addMessage(kPeer, operation(0));
-  fake_.serviceListener.addMessage(kPeer, operation(1));  // the guard is used up
-  const auto lines = run({});
+TEST_F(EntryTest, AnEmptyListIsAnAnswerAndOneThatNeverCameIsDoneWithout) {
+  receive({operation(0), operation(2)});
+  EXPECT_EQ(appInfoOfReport(), PlistValue::array({}));
+
+  fake_.preferences.domains.clear();
+  const auto lines = receive({operation(0), operation(1)});  // the guard is used up
   EXPECT_EQ(lines[1], "default: never received requested AAI, so moving along without it");
   EXPECT_EQ(lines[2], "default: daily tasks for day 20780");
-  EXPECT_TRUE(appInfoOfReport(0).isNone());
-}
-
-TEST_F(EntryTest, AnEmptyListOfAppsIsAnAnswer) {
-  fake_.serviceListener.addPeer(kPeer);
-  fake_.serviceListener.addMessage(kPeer, operation(0));
-  fake_.serviceListener.addMessage(kPeer, operation(2));
-  run({});
-  EXPECT_EQ(appInfoOfReport(0), PlistValue::array({}));
+  EXPECT_TRUE(appInfoOfReport().isNone());
 }
 
 TEST_F(EntryTest, ARunForADayBypassesTheRuleAndUsesUpTheGuard) {
-  fake_.serviceListener.addPeer(kPeer);
   PlistDictionary message = operation(1);
   message.set("value", PlistValue::int64(-1));
-  fake_.serviceListener.addMessage(kPeer, message);
-  fake_.serviceListener.addMessage(kPeer, operation(0));
-  EXPECT_EQ(run({})[0], "default: daily tasks for day -1");
+  EXPECT_EQ(receive({message, operation(0)})[0], "default: daily tasks for day -1");
   EXPECT_THAT(fake_.notifications.posts, IsEmpty());
   EXPECT_FALSE(gCommandState.gAppInfoRequested);
   EXPECT_TRUE(lastDay().isNone());
-
-  gCommandState.commandOnce.reset();
-  fake_.serviceListener.addMessage(kPeer, operation(77));
-  fake_.serviceListener.addMessage(kPeer, operation(1));
-  EXPECT_THAT(run({}), IsEmpty());
+  EXPECT_THAT(receive({operation(77), operation(1)}), IsEmpty());
 }
 
 }  // namespace

