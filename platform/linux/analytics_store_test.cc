@@ -1,3 +1,4 @@
+// The analytics store: its rows, what becomes of damaged and foreign ones, writers beside each other.
 #include "platform/linux/analytics_store.h"
 
 #include <gtest/gtest.h>
@@ -7,14 +8,15 @@
 #include <unistd.h>
 
 #include <fstream>
-#include <iterator>
+#include <functional>
 #include <limits>
 #include <map>
 #include <thread>
 
 #include "platform/linux/analytics_history.h"
-#include "testing/analytics_lines.h"
-#include "testing/temporary_folder.h"
+#include "platform/linux/test_host.h"
+#include "testing/analytics_contract.h"
+#include "testing/fake_services.h"
 
 namespace tbdaily {
 namespace {
@@ -23,37 +25,41 @@ namespace fs = std::filesystem;
 using namespace std::chrono_literals;
 using testing::Lines;
 
-class AnalyticsStoreTest : public ::testing::Test {
- protected:
-  std::unique_ptr<OpenAnalyticsHistory> history() {
-    return LinuxAnalyticsHistory([this] { return std::optional(file); }, 50ms).open();
+struct StoredAnalytics : testing::TestPlatform {
+  const std::string folder = "/var/mobile/Library/Tallybook";
+  const fs::path file = host.devicePath(folder) / "TBDataStore.sqlitedb";
+  AnalyticsStore store{file, 50ms};
+
+  void setToday(PlistDate now) { setClock(now.unixSeconds()); }
+  void addScalar(std::string_view key, DayNumber day, std::int64_t value) {
+    EXPECT_TRUE(store.setScalar(key, day, value).ok());
   }
+  void addDistribution(std::string_view key, DayNumber day, const std::vector<double>& values) {
+    EXPECT_TRUE(store.appendDistributionValues(key, day, 0, values).ok());
+  }
+};
+
+class AnalyticsStoreTest : public ::testing::Test, protected StoredAnalytics {
+ protected:
+  std::unique_ptr<OpenAnalyticsHistory> history() { return services.analyticsHistory.open(); }
+  Lines scalars() { return testing::scalarLines(*history()); }
+  Lines distributions() { return testing::distributionLines(*history()); }
 
   // What another program does to the file.
-  void sql(const char* statements) {
-    if (!fs::exists(file)) put("");
+  void sql(const std::string& statements) {
+    if (!fs::exists(file)) putAt(file, "");
     SqliteDatabase database;
     ASSERT_EQ(database.open(file, SqliteMode::ReadWrite, 50ms), 0);
-    ASSERT_EQ(database.execute(statements), 0) << database.errorMessage();
-  }
-  void put(const std::string& contents) {
-    fs::create_directories(file.parent_path());
-    std::ofstream(file, std::ios::binary) << contents;
+    ASSERT_EQ(database.execute(statements.c_str()), 0) << database.errorMessage();
   }
   // Names and bytes of the store's folder.
   std::map<std::string, std::string> folderContents() {
     std::map<std::string, std::string> contents;
-    for (const auto& entry : fs::directory_iterator(file.parent_path())) {
-      if (!entry.is_regular_file()) continue;
-      std::ifstream stream(entry.path(), std::ios::binary);
-      contents[entry.path().filename()] = {std::istreambuf_iterator<char>(stream), {}};
+    for (const std::string& name : names(folder)) {
+      if (fs::is_regular_file(file.parent_path() / name)) contents[name] = text(folder + "/" + name);
     }
     return contents;
   }
-
-  testing::TemporaryFolder folder;
-  const fs::path file = folder.path() / "Library #1?" / "Tally%book" / "store";
-  AnalyticsStore store{file, 50ms};
 };
 
 unsigned modeOf(const fs::path& path) {
@@ -65,8 +71,8 @@ TEST_F(AnalyticsStoreTest, IsMadeAtTheFirstWriteForItsOwnerAlone) {
   PrunedRows pruned;
   EXPECT_TRUE(store.checkpoint().ok());
   EXPECT_TRUE(store.prune(5, pruned).ok());
-  EXPECT_EQ(testing::scalarLines(*history()), Lines{});
-  EXPECT_FALSE(fs::exists(folder.path() / "Library #1?"));
+  EXPECT_EQ(scalars(), Lines{});
+  EXPECT_FALSE(fs::exists(file.parent_path()));
 
   const mode_t previous = ::umask(0277);
   ::umask(0);
@@ -74,7 +80,7 @@ TEST_F(AnalyticsStoreTest, IsMadeAtTheFirstWriteForItsOwnerAlone) {
   ::umask(previous);
   EXPECT_EQ(modeOf(file.parent_path()), 0700U);
   for (const char* suffix : {"", "-wal", "-shm"}) EXPECT_EQ(modeOf(file.native() + suffix), 0600U) << suffix;
-  EXPECT_EQ(testing::scalarLines(*history()), Lines{"k 1 2"});
+  EXPECT_EQ(scalars(), Lines{"k 1 2"});
 }
 
 TEST_F(AnalyticsStoreTest, LeavesAStoreThatItCannotUseAsItIs) {
@@ -85,10 +91,10 @@ TEST_F(AnalyticsStoreTest, LeavesAStoreThatItCannotUseAsItIs) {
       "CREATE TABLE distribution_values (key_id INTEGER NOT NULL, day INTEGER NOT NULL, seq INTEGER NOT NULL,"
       " seconds INTEGER NOT NULL, value REAL, PRIMARY KEY (key_id, day, seq)) WITHOUT ROWID;"
       "INSERT INTO keys VALUES (1, 'k'); INSERT INTO scalars VALUES (1, 1, 1);";
-  const auto withTables = [&](const std::string& more) { sql((tables + more).c_str()); };
+  const auto withTables = [&](const std::string& more) { sql(tables + more); };
   const std::map<std::string, std::function<void()>> cases{
-      {"no database", [&] { put("something else altogether"); }},
-      {"a page of noise", [&] { put(std::string(8192, '\x5A')); }},
+      {"no database", [&] { putAt(file, "something else altogether"); }},
+      {"a page of noise", [&] { putAt(file, std::string(8192, '\x5A')); }},
       {"another version", [&] { withTables("PRAGMA user_version = 2"); }},
       {"another version in the log",
        [&] {
@@ -121,7 +127,7 @@ TEST_F(AnalyticsStoreTest, LeavesAStoreThatItCannotUseAsItIs) {
     EXPECT_EQ(store.setScalar("k", 1, 2).fault, StoreFault::Unusable);
     EXPECT_EQ(store.prune(9, pruned).fault, StoreFault::Unusable);
     EXPECT_EQ(store.checkpoint().fault, StoreFault::Unusable);
-    EXPECT_EQ(testing::scalarLines(*history()), Lines{});
+    EXPECT_EQ(scalars(), Lines{});
     EXPECT_EQ(folderContents(), before);
     EXPECT_EQ(modeOf(file), mode);
   }
@@ -131,9 +137,9 @@ TEST_F(AnalyticsStoreTest, TakesAnEmptyFileOrDatabaseForANewStore) {
   for (const char* contents : {"", "PRAGMA journal_mode = WAL"}) {
     fs::remove_all(file.parent_path());
     sql(contents);
-    EXPECT_EQ(testing::scalarLines(*history()), Lines{});
+    EXPECT_EQ(scalars(), Lines{});
     EXPECT_TRUE(store.setScalar("k", 1, 2).ok());
-    EXPECT_EQ(testing::scalarLines(*history()), Lines{"k 1 2"});
+    EXPECT_EQ(scalars(), Lines{"k 1 2"});
   }
 }
 
@@ -141,7 +147,7 @@ TEST_F(AnalyticsStoreTest, WritesToTheFileThatIsThereNow) {
   EXPECT_TRUE(store.setScalar("old", 1, 1).ok());
   fs::remove_all(file.parent_path());
   EXPECT_TRUE(store.setScalar("new", 1, 1).ok());
-  EXPECT_EQ(testing::scalarLines(*history()), Lines{"new 1 1"});
+  EXPECT_EQ(scalars(), Lines{"new 1 1"});
 }
 
 TEST_F(AnalyticsStoreTest, LosesNoAdditionOfSeveralWritersAtOnce) {
@@ -164,8 +170,8 @@ TEST_F(AnalyticsStoreTest, LosesNoAdditionOfSeveralWritersAtOnce) {
   ::waitpid(child, &status, 0);
   EXPECT_EQ(status, 0);
   EXPECT_TRUE(inThread);
-  EXPECT_EQ(testing::scalarLines(*history()), Lines{"k 1 600"});
-  EXPECT_EQ(testing::distributionLines(*history()).at(0).size(), std::string("d 1:").size() + 600 * 2);
+  EXPECT_EQ(scalars(), Lines{"k 1 600"});
+  EXPECT_EQ(distributions().at(0).size(), std::string("d 1:").size() + 600 * 2);
 }
 
 TEST_F(AnalyticsStoreTest, GivesUpOnALockedStoreAndGoesOnWhenItIsFree) {
@@ -175,10 +181,10 @@ TEST_F(AnalyticsStoreTest, GivesUpOnALockedStoreAndGoesOnWhenItIsFree) {
     ASSERT_EQ(other.open(file, SqliteMode::ReadWrite, 50ms), 0);
     ASSERT_EQ(other.execute("BEGIN IMMEDIATE"), 0);
     EXPECT_EQ(store.addScalar("k", 1, 1).fault, StoreFault::Locked);
-    EXPECT_EQ(testing::scalarLines(*history()), Lines{"k 1 1"});
+    EXPECT_EQ(scalars(), Lines{"k 1 1"});
   }
   EXPECT_TRUE(store.addScalar("k", 1, 1).ok());
-  EXPECT_EQ(testing::scalarLines(*history()), Lines{"k 1 2"});
+  EXPECT_EQ(scalars(), Lines{"k 1 2"});
 }
 
 TEST_F(AnalyticsStoreTest, KeepsWhatWasCommittedWhenAWriterIsKilled) {
@@ -195,10 +201,10 @@ TEST_F(AnalyticsStoreTest, KeepsWhatWasCommittedWhenAWriterIsKilled) {
   int status = 0;
   ::waitpid(child, &status, 0);
   ASSERT_TRUE(WIFSIGNALED(status));
-  EXPECT_EQ(testing::scalarLines(*history()), Lines{"k 1 1"});
-  EXPECT_EQ(testing::distributionLines(*history()), Lines{});
+  EXPECT_EQ(scalars(), Lines{"k 1 1"});
+  EXPECT_EQ(distributions(), Lines{});
   EXPECT_TRUE(store.addScalar("k", 1, 1).ok());
-  EXPECT_EQ(testing::scalarLines(*history()), Lines{"k 1 2"});
+  EXPECT_EQ(scalars(), Lines{"k 1 2"});
 }
 
 TEST_F(AnalyticsStoreTest, RefusesKeysThatNoReportCanCarry) {
@@ -225,31 +231,102 @@ TEST_F(AnalyticsStoreTest, PrunesOlderRowsAndKeysWithoutRows) {
   EXPECT_EQ(pruned.scalars, 3);
   EXPECT_EQ(pruned.distributionValues, 4);
   EXPECT_EQ(pruned.keys, 1);
-  EXPECT_EQ(testing::scalarLines(*history()), Lines{"both 5 1"});
-  EXPECT_EQ(testing::distributionLines(*history()), Lines{"both 5: 1 2"});
+  EXPECT_EQ(scalars(), Lines{"both 5 1"});
+  EXPECT_EQ(distributions(), Lines{"both 5: 1 2"});
 }
 
 TEST_F(AnalyticsStoreTest, TruncatesTheLogAtACheckpointUnlessSomebodyReadsIt) {
-  EXPECT_TRUE(store.setScalar("k", 1, 1).ok());
+  addScalar("k", 1, 1);
+  EXPECT_TRUE(store.checkpoint().ok());
+  EXPECT_EQ(fs::file_size(file.native() + "-wal"), 0U);
   const auto reader = history();
-  EXPECT_TRUE(store.setScalar("k", 1, 2).ok());
+  addScalar("k", 1, 2);
   EXPECT_TRUE(store.checkpoint().ok());
   EXPECT_EQ(testing::scalarLines(*reader), Lines{"k 1 1"});
   EXPECT_GT(fs::file_size(file.native() + "-wal"), 0U);
-}
-
-TEST_F(AnalyticsStoreTest, LeavesAnEmptyLogAfterACheckpoint) {
-  EXPECT_TRUE(store.setScalar("k", 1, 1).ok());
-  EXPECT_TRUE(store.checkpoint().ok());
-  EXPECT_EQ(fs::file_size(file.native() + "-wal"), 0U);
 }
 
 TEST_F(AnalyticsStoreTest, AppendsNothingBehindTheLargestSequenceNumber) {
   EXPECT_TRUE(store.appendDistributionValues("k", 1, 0, {{1.0}}).ok());
   sql("UPDATE distribution_values SET seq = 9223372036854775806");
   EXPECT_EQ(store.appendDistributionValues("k", 1, 0, {{2.0}}).fault, StoreFault::Failed);
-  EXPECT_EQ(testing::distributionLines(*history()), Lines{"k 1: 1"});
+  EXPECT_EQ(distributions(), Lines{"k 1: 1"});
+}
+
+TEST_F(AnalyticsStoreTest, PassesOverWhatAForeignProgramLeft) {
+  addScalar("good", 1, 1);
+  addDistribution("good", 1, {1, 2, 3, 4});
+  sql("INSERT INTO keys VALUES (10, CAST(x'61ff' AS TEXT)), (11, 'a' || char(27)), (12, x'62'), (13, 'days');"
+      "INSERT INTO scalars SELECT id, 1, 7 FROM keys WHERE id BETWEEN 10 AND 12;"
+      "INSERT INTO distribution_values SELECT id, 1, 0, 0, 7 FROM keys WHERE id BETWEEN 10 AND 12;"
+      "INSERT INTO scalars VALUES (13, 1.5, 1), (13, 'day', 1), (13, x'00', 1), (13, 99999999999, 1), (13, "
+      "2, 'v'),"
+      " (13, 3, 1.5), (13, 4, 44);"
+      "INSERT INTO distribution_values VALUES (13, -99999999999, 0, 0, 1), (13, 1.5, 0, 0, 1), (13, 'day', "
+      "0, 0, 1),"
+      " (13, 2, 'seq', 0, 1), (13, 3, 0, 0, 'v'), (13, 3, 1, 0, 33);"
+      "UPDATE distribution_values SET seconds = 'noon' WHERE seq = 0 AND key_id = 1;"
+      "UPDATE distribution_values SET seconds = 99999999999 WHERE seq = 2 AND key_id = 1;");
+  const auto opened = history();
+  EXPECT_EQ(testing::scalarLines(*opened), (Lines{"days 4 44", "good 1 1"}));
+  EXPECT_EQ(testing::distributionLines(*opened), (Lines{"days 2:", "days 3: nan 33", "good 1: 2 4"}));
+}
+
+TEST_F(AnalyticsStoreTest, EndsAtADamagedPageOfALargeStore) {
+  const std::vector<double> values(500000, 1.25);
+  addDistribution("k", 1, values);
+  addScalar("k", 1, 1);
+  sql("PRAGMA wal_checkpoint(TRUNCATE)");
+  const auto middle = static_cast<std::streamoff>(fs::file_size(file) / 2 / 4096 * 4096);
+  ASSERT_GT(middle, 4 << 20);
+  std::fstream(file, std::ios::in | std::ios::out | std::ios::binary).seekp(middle)
+      << std::string(4096, '\xA5');
+
+  const auto opened = history();
+  EXPECT_EQ(testing::scalarLines(*opened), Lines{"k 1 1"});
+  std::size_t delivered = 0;
+  int rows = 0;
+  const auto count = [&](std::string_view, DayNumber, DistributionEnumerator& enumerator, bool&) {
+    double value = 0;
+    std::int32_t seconds = 0;
+    for (++rows; enumerator.nextValue(value, seconds);) ++delivered;
+    EXPECT_FALSE(enumerator.nextValue(value, seconds));
+  };
+  opened->enumerateDistributions("", 0, 9, count);
+  EXPECT_EQ(rows, 1);
+  EXPECT_GT(delivered, 100000U);
+  EXPECT_LT(delivered, values.size());
+}
+
+TEST(AnalyticsHome, IsTheContainerInMultiUserModeAndIsAskedForUntilItIsFound) {
+  testing::FakeDeviceAnswers device;
+  testing::FakeFileSystem files;
+  const testing::TemporaryFolder root;
+  const Host host(root.path(), false);
+  const auto place = [&] { return analyticsStoreLocator(host, device, files)().value_or("none"); };
+  const fs::path single = root.path() / "var/mobile/Library/Tallybook/TBDataStore.sqlitedb";
+  EXPECT_EQ(place(), single);
+  files.files["/var/db/forceMultiUserMode"] = {};
+  EXPECT_EQ(place(), single);
+  device.answers.set("InternalBuild", PlistValue::boolean(true));
+  EXPECT_EQ(place(), "none");
+  device.answers.set("InternalBuild", PlistValue());
+  device.multiUser = true;
+  const AnalyticsStoreLocator locate = analyticsStoreLocator(host, device, files);
+  EXPECT_EQ(locate(), std::nullopt);
+  EXPECT_EQ(testing::scalarLines(*LinuxAnalyticsHistory(locate).open()), Lines{});
+  device.containers["systemgroup.com.velmora.sysmetrics"] = "/group";
+  EXPECT_EQ(locate(), root.path() / "group/Library/Tallybook/TBDataStore.sqlitedb");
+
+  const Host absent(root.path() / "absent", false);
+  EXPECT_EQ(analyticsStoreLocator(absent, device, files)(), std::nullopt);
+  EXPECT_FALSE(fs::exists(absent.root()));
 }
 
 }  // namespace
+
+namespace testing {
+INSTANTIATE_TYPED_TEST_SUITE_P(Stored, AnalyticsContract, StoredAnalytics);
+INSTANTIATE_TYPED_TEST_SUITE_P(Stored, AnalyticsClientContract, StoredAnalytics);
+}  // namespace testing
 }  // namespace tbdaily

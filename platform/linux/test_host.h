@@ -21,7 +21,8 @@
 namespace tbdaily::testing {
 
 struct TestHost {
-  explicit TestHost(bool live = false) : host(folder.path() / "root", live, folder.path() / "live") {
+  // The name of the root is an odd one, so that whoever quotes paths is put to the test.
+  explicit TestHost(bool live = false) : host(folder.path() / "root #1?%20", live, folder.path() / "live") {
     std::filesystem::create_directories(host.root());
   }
 
