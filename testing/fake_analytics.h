@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <map>
 #include <memory>
+#include <span>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -52,59 +53,48 @@ class FakeAnalyticsHistory : public AnalyticsHistory {
 
  private:
   using Row = std::pair<std::string, DayNumber>;  // its order is that of the enumerations
-
   struct Rows {
     std::map<Row, std::int64_t> scalars;
     std::map<Row, std::vector<double>> distributions;
   };
 
-  class Values : public DistributionEnumerator {
-   public:
-    Values(const std::vector<double>& values, int& askedFor) : values_(values), askedFor_(askedFor) {}
+  struct Values : DistributionEnumerator {
+    Values(std::span<const double> row, int& calls) : values(row), askedFor(calls) {}
     bool nextValue(double& value, std::int32_t& secondsInDay) override {
-      ++askedFor_;
-      if (next_ == values_.size()) return false;
-      value = values_[next_++];
+      ++askedFor;
+      if (values.empty()) return false;
+      value = values.front();
       secondsInDay = 0;
+      values = values.subspan(1);
       return true;
     }
-
-   private:
-    const std::vector<double>& values_;
-    int& askedFor_;
-    std::size_t next_ = 0;
+    std::span<const double> values;
+    int& askedFor;
   };
 
-  class Opened : public OpenAnalyticsHistory {
-   public:
-    Opened(Rows rows, int& valuesAskedFor) : rows_(std::move(rows)), valuesAskedFor_(valuesAskedFor) {}
-
+  struct Opened : OpenAnalyticsHistory {
+    Opened(Rows current, int& calls) : rows(std::move(current)), askedFor(calls) {}
     void enumerateScalars(std::string_view keyPrefix, DayNumber minimumDay, DayNumber maximumDay,
                           const ScalarRowCallback& row) override {
       bool stop = false;
-      for (const auto& [place, value] : rows_.scalars) {
-        if (isWanted(place, keyPrefix, minimumDay, maximumDay)) row(place.first, place.second, value, stop);
-        if (stop) return;
+      for (const auto& [place, value] : rows.scalars) {
+        const auto& [key, day] = place;
+        if (!stop && key.starts_with(keyPrefix) && day >= minimumDay && day <= maximumDay)
+          row(key, day, value, stop);
       }
     }
     void enumerateDistributions(std::string_view keyPrefix, DayNumber minimumDay, DayNumber maximumDay,
                                 const DistributionRowCallback& row) override {
       bool stop = false;
-      for (const auto& [place, values] : rows_.distributions) {
-        Values enumerator(values, valuesAskedFor_);
-        if (isWanted(place, keyPrefix, minimumDay, maximumDay))
-          row(place.first, place.second, enumerator, stop);
-        if (stop) return;
+      for (const auto& [place, values] : rows.distributions) {
+        const auto& [key, day] = place;
+        Values enumerator(values, askedFor);
+        if (!stop && key.starts_with(keyPrefix) && day >= minimumDay && day <= maximumDay)
+          row(key, day, enumerator, stop);
       }
     }
-
-   private:
-    static bool isWanted(const Row& row, std::string_view prefix, DayNumber minimumDay,
-                         DayNumber maximumDay) {
-      return row.first.starts_with(prefix) && row.second >= minimumDay && row.second <= maximumDay;
-    }
-    Rows rows_;
-    int& valuesAskedFor_;
+    Rows rows;
+    int& askedFor;
   };
 
   Rows rows_;

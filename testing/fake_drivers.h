@@ -68,9 +68,9 @@ class FakeDriverRegistry : public DriverRegistry {
   KdHandle KdIteratorNext(KdHandle iterator) override {
     Handle* handle = find(iterator, Kind::Iterator);
     if (handle == nullptr || !iteratorsAreValid || handle->rest.empty()) return 0;
-    const std::size_t driver = handle->rest.front();
+    const KdHandle object = add({Kind::Object, handle->rest.front(), {}});
     handle->rest.erase(handle->rest.begin());
-    return add({Kind::Object, driver, {}});
+    return object;
   }
   bool KdIteratorIsValid(KdHandle) override { return iteratorsAreValid; }
   KdStatus KdObjectRelease(KdHandle object) override {
@@ -170,21 +170,20 @@ class FakeDriverRegistry : public DriverRegistry {
     return handle != nullptr ? &drivers[handle->driver] : nullptr;
   }
   std::vector<std::size_t> matchingDrivers(const PlistValue& matching) const {
+    const PlistDictionary description =
+        matching.asDictionary() != nullptr ? *matching.asDictionary() : PlistDictionary();
+    const PlistValue properties = description.get("KdPropertyMatch");
     std::vector<std::size_t> found;
     for (std::size_t i = 0; i < drivers.size(); ++i) {
-      if (matches(drivers[i], matching)) found.push_back(i);
+      const auto has = [&](const auto& entry) {
+        return drivers[i].properties.get(entry.first) == entry.second;
+      };
+      if (properties.asDictionary() != nullptr
+              ? std::ranges::all_of(*properties.asDictionary(), has)
+              : description.get(kClassKey).asString() == drivers[i].serviceClass)
+        found.push_back(i);
     }
     return found;
-  }
-  static bool matches(const FakeDriver& driver, const PlistValue& matching) {
-    const PlistDictionary* description = matching.asDictionary();
-    if (description == nullptr) return false;
-    const PlistValue wanted = description->get("KdPropertyMatch");
-    if (wanted.asDictionary() == nullptr)
-      return description->get(kClassKey).asString() == driver.serviceClass;
-    return std::ranges::all_of(*wanted.asDictionary(), [&driver](const PlistDictionary::Entry& entry) {
-      return driver.properties.get(entry.first) == entry.second;
-    });
   }
   template <typename Script, typename... Arguments>
   KdStatus answer(KdHandle connection, const Script& script, Arguments&&... arguments) {
@@ -210,27 +209,25 @@ class FakeStackSnapshot : public StackSnapshot {
   }
 
  private:
-  class Configuration : public StackSnapshotConfiguration {
-   public:
-    explicit Configuration(FakeStackSnapshot& fake) : fake_(fake) { ++fake_.configurations; }
-    ~Configuration() override { --fake_.configurations; }
+  struct Configuration : StackSnapshotConfiguration {
+    explicit Configuration(FakeStackSnapshot& snapshot) : fake(snapshot) { ++fake.configurations; }
+    ~Configuration() override { --fake.configurations; }
     KdStatus setFlags(std::uint64_t word) override {
-      fake_.flags.push_back(word);
-      return fake_.flagsStatus;
+      fake.flags.push_back(word);
+      return fake.flagsStatus;
     }
     KdStatus capture() override {
-      captured_ = fake_.captureStatus == kKdSuccess;
-      return fake_.captureStatus;
+      isCaptured = fake.captureStatus == kKdSuccess;
+      return fake.captureStatus;
     }
     std::optional<std::span<const std::byte>> buffer() override {
-      if (!captured_ || !fake_.givesBuffer) return std::nullopt;
-      return std::span<const std::byte>(*fake_.bytes);
+      if (!isCaptured || !fake.givesBuffer) return std::nullopt;
+      return std::span<const std::byte>(*fake.bytes);
     }
-    std::uint32_t size() override { return captured_ ? static_cast<std::uint32_t>(fake_.bytes->size()) : 0; }
+    std::uint32_t size() override { return isCaptured ? static_cast<std::uint32_t>(fake.bytes->size()) : 0; }
 
-   private:
-    FakeStackSnapshot& fake_;
-    bool captured_ = false;
+    FakeStackSnapshot& fake;
+    bool isCaptured = false;
   };
 };
 
