@@ -34,20 +34,26 @@ class SampleBuffer {
 
   explicit SampleBuffer(std::span<const std::byte> buffer)
       : buffer_(buffer.first(std::min(buffer.size() / kElementSize, kMostElements) * kElementSize)) {
+    isFirst_.resize(buffer_.size() / kElementSize);
     slots_.resize(std::bit_ceil(2 * (buffer_.size() / kElementSize) + 1), kFree);
     end_ = walkChain([this](std::size_t element) {
       std::uint32_t& slot = slotOf(identifiersAt(element));
-      if (slot == kFree) slot = static_cast<std::uint32_t>(element);
+      if (slot != kFree) return;
+      slot = static_cast<std::uint32_t>(element);
+      isFirst_[element] = true;
     });
   }
 
-  // None when the chain ends before such a channel.
+  // None when the chain ends before such a channel. Quickest for channels in the order of the buffer.
   std::optional<Channel> find(const ChannelRecord& channel) {
-    const std::uint32_t element = slotOf({static_cast<std::uint64_t>(KdReportChannelGetDriverID(&channel)),
-                                          static_cast<std::uint64_t>(KdReportChannelGetChannelID(&channel))});
+    const Identifiers wanted{static_cast<std::uint64_t>(KdReportChannelGetDriverID(&channel)),
+                             static_cast<std::uint64_t>(KdReportChannelGetChannelID(&channel))};
+    const bool isNext = next_ < isFirst_.size() && isFirst_[next_] && identifiersAt(next_) == wanted;
+    const std::size_t element = isNext ? next_ : slotOf(wanted);
     if (element == kFree) return std::nullopt;
     // Read once, then checked: the buffer may change meanwhile.
     const ChannelType type = typeAt(element);
+    next_ = element + type.elementCount();
     const std::size_t offset = element * kElementSize, size = type.elementCount() * kElementSize;
     return Channel{
         type, size <= buffer_.size() - offset ? buffer_.subspan(offset, size) : std::span<const std::byte>()};
@@ -96,6 +102,8 @@ class SampleBuffer {
 
   std::span<const std::byte> buffer_;
   End end_;
+  std::vector<bool> isFirst_;         // elements that begin the first channel with its identifiers
+  std::size_t next_ = 0;              // behind the channel that was found last
   std::vector<std::uint32_t> slots_;  // open addressing, a power of two long, at most half full
 };
 
