@@ -88,18 +88,6 @@ TEST(SnapshotFixedLayout, RendersWholeRecordsInEveryCapacity) {
   }
 }
 
-TEST(SnapshotFixedLayout, WidensForLargeValuesAndSplitsThousands) {
-  for (const auto& [time, shown] : std::vector<std::pair<std::uint32_t, std::string>>{
-           {999, "       0.99"}, {1000, "       1.00"}, {0xFFFFFFFF, " 4294967.29"}}) {
-    std::vector<std::uint32_t> record(63, 0xFFFFFFFF);
-    record[39] = time;
-    EXPECT_THAT(
-        Rendering(Bytes().words(record), 4000).text,
-        ::testing::HasSubstr("E=4294967295 HR=4294967295 HW=4294967295 NR=4294967295 NW=4294967295 TH=" +
-                             shown + " GC=4294967295 W="));
-  }
-}
-
 const std::vector<Field> kFields = {{0, 0, 0, "T=%04u"},    {1, 4, 0, " A=%3d%%"}, {2, 8, 0, " H=%4u.%02u"},
                                     {3, 12, 24, " R%s="},   {3, 12, 11, " N%s"},   {0, 4, 0, ""},
                                     {7, 0, 0, "unknown %u"}};
@@ -134,17 +122,12 @@ TEST(SnapshotDescribedLayout, RendersWhatLiesInsideOfAnUntrustedHeader) {
     std::string text;
   } cases[] = {
       {header(5, 36, 4, kFields), 0, 3, kLegend + kLine + kThirdLine},
-      {header(5, 36, 4, kFields), 1, 3, kThirdLine},
       {header(6, 36, 4, kFields), 3, 3, ""},
-      {header(6, 36, 4, kFields), huge, huge, ""},
       {header(6, 36, 0, {one}), 0, 0, ""},
-      {header(6, 36, 1, {one}), 0, 0, ""},
       {header(6, 0, huge, {one}), 0, huge - 1, ""},
-      {header(6, huge, huge, {one}), 0, huge - 1, ""},
       {header(6, 36, huge, {}), 0, huge - 1, ""},
       {header(6, 36, huge, {one}), 0, huge - 1, kTitle + "T=1\nT=12345\nT=3\n"},
       {header(6, 36, 2, {one}, huge - 1), 0, 1, kTitle + "T=1\n"},
-      {header(6, 36, 2, {{0, huge, 0, "%u"}, one}), 0, 1, ""},
       {header(6, 36, 2, {one, {0, 140, 0, ",%u"}, {2, 141, 0, ",%u"}, {1, huge, 0, "x"}}), 0, 1,
        kTitle + "T=1,3\n"},
       {header(6, 36, 2, {one, {3, 120, huge, ",%s"}}), 0, 1,
@@ -203,7 +186,6 @@ TEST(SnapshotFormat, PrintsAsItStandsWhatItMayNotConvert) {
   for (std::string text; std::getline(texts, text, ',');) EXPECT_EQ(print(text, Arguments::kText, "O"), text);
   EXPECT_EQ(print("%u%u", Arguments::kValue, kNumbers), "%u%u");
   EXPECT_EQ(print("%+#03s|%%", Arguments::kText, "O"), "  O|%");
-  EXPECT_EQ(print("%-3.9s<%%>", Arguments::kText, "O") + print("<%.s>", Arguments::kText, "O"), "O  <%><>");
   EXPECT_EQ(print("123456789abcd%u", Arguments::kTwoValues, kNumbers), "123456789abcd1");
 }
 

@@ -45,15 +45,5 @@ TEST(NandCounters, ChooseTheLayoutFromTheTextsOfTheController) {
   EXPECT_EQ(said.outputs, "unrecognized hex character: xunrecognized hex character: y");
 }
 
-TEST(HexText, IsReadInPairsFromTheLeft) {
-  testing::CapturedDiagnostics said;
-  const std::vector<std::pair<const char*, std::uint32_t>> numbers = {
-      {"", 0}, {"A", 0x0A}, {"603a57fF", 0x603A57FF}, {"abcde", 0xABCD0E}, {"1234567890AB", 0x12345678}};
-  for (const auto& [text, number] : numbers) EXPECT_EQ(hexStringToInt32(text, said), number) << text;
-  EXPECT_EQ(nandVendorKey("458", said), 0x4508'00000000);
-  EXPECT_EQ(hexStringToByte("G12", said), 0x01);
-  EXPECT_EQ(said.outputs, "unrecognized hex character: g");
-}
-
 }  // namespace
 }  // namespace tbdaily

@@ -3,7 +3,7 @@
 import plistlib
 import unittest
 
-from harness import NO_CONTROLLER, TODAY, YESTERDAY, DeviceTest
+from harness import NO_CONTROLLER, YESTERDAY, DeviceTest
 
 
 class BadInput(DeviceTest):
@@ -66,14 +66,6 @@ class BadInput(DeviceTest):
         self.assertIn("Unknown arg: %s%n%d", device.log())
         self.assertIn("Unknown arg: -d\n\t\n", device.log())
         self.assertNotIn("daily tasks", device.log())
-
-    def test_days_far_away(self):
-        device = self.device(value=True)
-        for day in (-2 ** 31, 2 ** 31 - 1):
-            device.record_scalar("k", 9, day)
-            report = device.tally_json("report", "--preview", "--day", str(day))
-            self.assertEqual(report["TBScalars"], {"k": 9})
-        self.assertNotIn(str(TODAY), device.tally("report", "--preview", "--day", str(2 ** 31 - 1)))
 
 
 if __name__ == "__main__":

@@ -40,15 +40,13 @@ class Companion(DeviceTest):
         device.tally("record", "scalar", "k", "5")
         device.tally("record", "scalar", "k", str(-2 ** 63), "--add")
         device.tally("record", "distribution", "d", "1.5", "-2", "nan", "--day", str(YESTERDAY))
-        lines = f"s\told\t-5\t1\r\n\nd\td\t{YESTERDAY}\t86399\t7"
-        imported = json.loads(device.tally("--json", "record", "import", stdin=lines))
+        imported = json.loads(device.tally("--json", "record", "import", stdin="s\told\t-5\t1\nd\td\t5\t86399\t7"))
         self.assertEqual(imported, {"scalars": 1, "distributionValues": 1})
-        failure = device.tally("record", "import", "-", stdin="s\tgood\t1\t1\ns\tk\tx\t1\n", status=1)
-        self.assertIn("line 2", failure)
+        self.assertIn("line 2", device.tally("record", "import", "-", stdin="s\tgood\t1\t1\ns\tk\n", status=1))
         rows = device.store().execute("SELECT name, day, value FROM scalars JOIN keys ON id = key_id ORDER BY name")
         self.assertEqual(list(rows), [("k", TODAY, 5 - 2 ** 63), ("old", -5, 1)])
-        rows = device.store().execute("SELECT seq, value FROM distribution_values ORDER BY seq")
-        self.assertEqual(list(rows), [(0, 1.5), (1, -2.0), (2, None), (3, 7.0)])
+        rows = device.store().execute("SELECT day, seq, value FROM distribution_values")
+        self.assertEqual(list(rows), [(5, 0, 7.0), (YESTERDAY, 0, 1.5), (YESTERDAY, 1, -2.0), (YESTERDAY, 2, None)])
         self.assertEqual(device.tally_json("record", "prune", "--before", str(TODAY)),
                          {"scalars": 1, "distributionValues": 4, "keys": 2})
 
@@ -108,6 +106,7 @@ class Companion(DeviceTest):
         short = '[{"bundle": "b", "version": "1", "kestrelID": 1, "arch": 2, "uuid": "short"}]'
         for records, reason in (("{}", "no array"), ("[1]", "app record 1 is no dictionary"), (short, '"uuid"')):
             self.assertIn(reason, device.tally("send", "app-info", "-", stdin=records, status=1))
+        self.assertIn("no job is listening", device.tally("send", "logging-status", status=1))
         self.assertIn("in time", device.tally("wait", "some.name", "--timeout", "0.2", status=1))
 
 

@@ -70,16 +70,6 @@ class DailyRun(DeviceTest):
         self.assertEqual(preview["TBScalars"]["net.new"], 12300)
         self.assertIn("day 5", device.tally("report", "--preview", "--day", "5", status=1))
 
-    def test_multi_user_device(self):
-        device = self.device()
-        device.record("answers", {"MultiUser": True,
-                                  "GroupContainers": {"systemgroup.com.velmora.sysmetrics": "/group"}})
-        device.allow(ScalarKeys={"k": {}})
-        device.record_scalar("k", 3)
-        self.assertTrue(device.path("group/Library/Tallybook/TBDataStore.sqlitedb").exists())
-        device.run("-f")
-        self.assertEqual(device.reports()[0]["TBScalars"], {"k": 3})
-
     def test_live_sources_answer_where_no_recording_does(self):
         device = self.device(live=True)
         device.path("System/Device/clock.plist").unlink()
