@@ -236,12 +236,13 @@ class FakeUsageService : public UsageService {
   PlistValue records;  // none: the reply never comes
   std::chrono::milliseconds delay{0};
 
-  std::unique_ptr<UsageWorkspace> createWorkspace() override { return std::make_unique<Workspace>(*this); }
+  std::unique_ptr<UsageWorkspace> createWorkspace() override { return std::make_unique<Source>(*this); }
   void waitForReplies() { replies_.clear(); }
 
  private:
-  struct Feed : UsageFeed {
-    explicit Feed(FakeUsageService& service) : fake(service) {}
+  struct Source : UsageWorkspace, UsageFeed {
+    explicit Source(FakeUsageService& service) : fake(service) {}
+    std::unique_ptr<UsageFeed> createFeed() override { return std::make_unique<Source>(fake); }
     void requestUsageToDate(std::span<const std::string>, UsageNameKind, UsageReplyHandler handler) override {
       if (fake.records.isNone()) return;
       fake.replies_.emplace_back([handler = std::move(handler), records = fake.records, delay = fake.delay] {
@@ -249,11 +250,6 @@ class FakeUsageService : public UsageService {
         handler(records);
       });
     }
-    FakeUsageService& fake;
-  };
-  struct Workspace : UsageWorkspace {
-    explicit Workspace(FakeUsageService& service) : fake(service) {}
-    std::unique_ptr<UsageFeed> createFeed() override { return std::make_unique<Feed>(fake); }
     FakeUsageService& fake;
   };
 

@@ -131,8 +131,8 @@ class FakeMessageDigest : public MessageDigest {
  public:
   Md5Digest md5(std::span<const std::byte> bytes) override {
     Md5Digest digest{};
-    std::uint64_t hash = 14695981039346656037U;
-    for (const std::byte byte : bytes) hash = (hash ^ std::to_integer<std::uint64_t>(byte)) * 1099511628211U;
+    const std::size_t hash =
+        std::hash<std::string_view>()({reinterpret_cast<const char*>(bytes.data()), bytes.size()});
     std::memcpy(digest.data(), &hash, sizeof hash);
     return digest;
   }

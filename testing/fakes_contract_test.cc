@@ -18,8 +18,6 @@ struct FakeSubject : FakePlatform {
 
   PreferencesStore& anotherStore() { return preferences; }
   void answer(const char* key, const PlistValue& value) { deviceAnswers.answers.set(key, value); }
-  void setBuild(const char* build) { deviceAnswers.build = build; }
-  void setMultiUser(bool multiUser) { deviceAnswers.multiUser = multiUser; }
   void addContainer(const char* id, const char* path) { deviceAnswers.containers[id] = path; }
   void setSysctl(const char* name, const PlistData& data) { kernel.sysctls[name] = data; }
   void setTime(PlistDate now, std::uint64_t ticks, Timebase ratio) {
@@ -38,12 +36,6 @@ struct FakeSubject : FakePlatform {
     return all;
   }
   void addBundle(const std::string& type) { appRegistry.bundleTypes.push_back(type); }
-  void setLanguages(const std::vector<std::string>& preferred, const std::vector<std::string>& system,
-                    const char* country) {
-    localeSettings.preferred = preferred;
-    localeSettings.system = system;
-    localeSettings.country = country;
-  }
   std::size_t posts(const char* name) {
     return static_cast<std::size_t>(std::ranges::count(notifications.posts, name));
   }

@@ -24,7 +24,7 @@ TYPED_TEST_P(PropertyListCodecContract, TheExactFormKeepsValueAndKindAndOrder) {
   for (const double v :
        {0.1, -0.0, 3.0, 1e300, Double::denorm_min(), Double::infinity(), Double::quiet_NaN()})
     all.push_back(PlistValue::float64(v));
-  for (const double v : {0.0, 817376824.123456, -0.1, -Double::denorm_min(), -1e12 - 0.5, 1e15})
+  for (const double v : {0.0, 1e-20, 817376824.123456, -0.1, -Double::denorm_min(), -1e12 - 0.5, 1e15})
     all.push_back(PlistValue(PlistDate{v}));
   for (const char* text : {"", " <a> & 'b' \"c\" ]]> \t\r\n\r ", "gr\u00fc\u00df \u6f22 \U0001F600"})
     all.push_back(PlistValue::string(text));

@@ -14,12 +14,6 @@
 namespace tbdaily::testing {
 namespace {
 
-PlistArray textsOf(const std::vector<std::string>& list) {
-  PlistArray array;
-  for (const std::string& text : list) array.push_back(PlistValue::string(text));
-  return array;
-}
-
 class LinuxSubject : public TestPlatform {
  public:
   LinuxSubject() {
@@ -29,8 +23,6 @@ class LinuxSubject : public TestPlatform {
 
   PreferencesStore& anotherStore() { return other_; }
   void answer(const char* key, const PlistValue& value) { record(recording::kAnswers, key, value); }
-  void setBuild(const char* build) { answer("ProductBuildVersion", PlistValue::string(build)); }
-  void setMultiUser(bool multiUser) { answer("MultiUser", PlistValue::boolean(multiUser)); }
   void addContainer(const char* identifier, const char* path) {
     answer("GroupContainers", PlistValue::dictionary({{identifier, PlistValue::string(path)}}));
   }
@@ -62,12 +54,6 @@ class LinuxSubject : public TestPlatform {
   void addBundle(const std::string& type) {
     bundles_.push_back(PlistValue::dictionary({{"type", PlistValue::string(type)}}));
     record(recording::kApps, "bundles", PlistValue::array(bundles_));
-  }
-  void setLanguages(const std::vector<std::string>& preferred, const std::vector<std::string>& system,
-                    const char* country) {
-    record(recording::kLocale, "preferredLanguages", PlistValue::array(textsOf(preferred)));
-    record(recording::kLocale, "systemLanguages", PlistValue::array(textsOf(system)));
-    record(recording::kLocale, "countryCode", PlistValue::string(country));
   }
   std::uint64_t posts(const char* name) { return LinuxNotifications(host).postCount(name); }
   void connectPeer() { peer_ = connectUnixSocket(endpointPath(host, "com.example.endpoint")).socket; }
@@ -115,9 +101,7 @@ TEST(MissingRootTest, TakesNoWritesAndIsNotMade) {
   MissingRoot subject;
   Platform& host = subject.services;
   host.preferences.setValue("k", PlistValue::int64(1), "d");
-  host.preferences.synchronize("d");
   host.analyticsClient.setValueForScalarKey("k", 1);
-  host.analyticsClient.checkpoint();
   EXPECT_FALSE(host.logSubmission.writeLogForSubmission("1", "n", {}, {}, [](LogOutput&) { return true; }));
   host.logSubmission.logStructuredData(172, {});
   host.logSubmission.dumpAllOldStructuredDataLogs();
