@@ -18,6 +18,7 @@ namespace tbdaily {
 namespace {
 
 namespace fs = std::filesystem;
+using namespace std::string_literals;
 using testing::TestPlatform;
 using Texts = std::vector<std::string>;
 
@@ -99,17 +100,17 @@ TEST(RecordingsTest, AnswerBeforeTheLiveHostEachForItself) {
 TEST(RecordingsTest, AreReadAgainWhenTheyChangeOrCouldNotBeRead) {
   TestPlatform device;
   const auto build = [&] { return device.services.deviceAnswers.currentOSBuildVersion().value_or("-"); };
-  for (const char* same :
-       {"1", "2", "3", "4", "5", "6", "7", "8", "9"}) {  // in the same file, of the same length
-    device.record("answers.plist", "ProductBuildVersion", text(same));
-    EXPECT_EQ(build(), same);
+  for (const char* sameLength : {"1", "2", "3", "4"}) {
+    device.record("answers.plist", "ProductBuildVersion", text(sameLength));
+    EXPECT_EQ(build(), sameLength);
   }
   device.put("/System/Device/answers.plist", "<plist><dict>");
   EXPECT_EQ(build(), "-");
-  fs::remove(device.host.devicePath("/System/Device/answers.plist"));
-  fs::create_directory(device.host.devicePath("/System/Device/answers.plist"));
+  const fs::path place = device.host.devicePath("/System/Device/answers.plist");
+  fs::remove(place);
+  fs::create_directory(place);
   EXPECT_EQ(build(), "-");
-  fs::remove(device.host.devicePath("/System/Device/answers.plist"));
+  fs::remove(place);
   device.record("answers.plist", "ProductBuildVersion", text("x"));
   device.services.preferences.setValue("k", text("v"), "d");
 
@@ -134,18 +135,15 @@ TEST(LinuxKernelTest, FillsSysctlsFromIntegersErrorsAndEvents) {
     buffer.resize(length);
     return plistText(PlistValue::data(buffer));
   };
-  device.record(
-      "kernel.plist", "sysctl",
-      PlistValue::dictionary({{"int", PlistValue::int64(-2)}, {"text", text("x")}, {"bad", text("x")}}));
+  device.record("kernel.plist", "sysctl", device.json(R"({"int": -2, "text": "x", "bad": "x"})"));
   device.record(
       "kernel.plist", "eccEvents",
-      PlistValue::array({PlistValue::data(PlistData(3, std::byte{1})), PlistValue::data({std::byte{2}})}));
-  const auto setErrors = [&](std::int64_t number) {
+      PlistValue::array({PlistValue::data(PlistData(3, std::byte{1})), PlistValue::data(PlistData(1))}));
+  const auto setErrors = [&](const std::string& number) {
     device.record("kernel.plist", "errno",
-                  PlistValue::dictionary({{"bad", PlistValue::int64(number)},
-                                          {"kern.next_ecc_event", PlistValue::int64(number)}}));
+                  device.json(R"({"bad": )" + number + R"(, "kern.next_ecc_event": )" + number + "}"));
   };
-  setErrors(5);
+  setErrors("5");
   EXPECT_EQ(read("int", 4), "<feffffff>");
   EXPECT_EQ(read("int", 8), "<feffffffffffffff>");
   EXPECT_EQ(read("int", 5), "errno 22");
@@ -153,9 +151,9 @@ TEST(LinuxKernelTest, FillsSysctlsFromIntegersErrorsAndEvents) {
   EXPECT_EQ(read("bad", 8), "errno 5");
   EXPECT_EQ(read("vm.swapusage", 32), "errno 2");
   EXPECT_EQ(read("kern.next_ecc_event", 8), "<010101>");
-  EXPECT_EQ(read("kern.next_ecc_event", 8), "<02>");
+  EXPECT_EQ(read("kern.next_ecc_event", 8), "<00>");
   EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 5");
-  setErrors(std::int64_t{1} << 40);  // no error number
+  setErrors("1099511627776");  // no error number
   EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 2");
 
   TestPlatform live(true);
@@ -206,21 +204,17 @@ TEST(HostIdentityTest, ReadsTextsAsTheirWritersMeantThem) {
 TEST(LinuxAppRegistryTest, CountsTheApplicationsAmongTheDesktopEntries) {
   TestPlatform device(true);
   const std::string application = "[Desktop Entry]\nName=a\nType = Application \r\n[Other]\nHidden=true\n";
-  const std::string shared = "/usr/share/applications/";
-  device.putLive(shared + "a.desktop", application);
+  const std::string shared = "/usr/share/applications/", own = "/home/me/.local/share/applications/";
+  for (const std::string& place :
+       {shared + "a.desktop", shared + "a.desktop.bak", "/usr/local/share/applications/c.desktop"s,
+        "/var/lib/flatpak/exports/share/applications/d.desktop"s, own + "e.desktop", own + "huge.desktop"})
+    device.putLive(place, application);
   device.putLive(shared + "kde/b.desktop", "# c\n\n" + application);
   device.putLive(shared + "link.desktop", "[Desktop Entry]\nType=Link\n");
   device.putLive(shared + "hidden.desktop", "[Desktop Entry]\nType=Application\nHidden=true");
   device.putLive(shared + "late.desktop", "[Other]\nType=Application\n");
-  device.putLive(shared + "a.desktop.bak", application);
-  device.putLive("/usr/local/share/applications/c.desktop", application);
-  device.putLive("/var/lib/flatpak/exports/share/applications/d.desktop", application);
-  device.putLive("/home/me/.local/share/applications/e.desktop", application);
-  device.putLive("/home/me/.local/share/applications/huge.desktop", application);
-  fs::resize_file(device.host.livePath("/home/me/.local/share/applications/huge.desktop"),
-                  std::uintmax_t{1} << 40);
-  ASSERT_EQ(::mkfifo(device.host.livePath("/home/me/.local/share/applications/pipe.desktop").c_str(), 0600),
-            0);
+  fs::resize_file(device.host.livePath(own + "huge.desktop"), std::uintmax_t{1} << 40);
+  ASSERT_EQ(::mkfifo(device.host.livePath(own + "pipe.desktop").c_str(), 0600), 0);
   EXPECT_EQ(bundleTypes(device.services), "System System User User User ");
 }
 

@@ -48,14 +48,10 @@ std::string binaryOf(const std::string& rootObject) {
 
 PlistValue everything() {
   return PlistValue::dictionary(
-      {{"b<", PlistValue::array({PlistValue::int8(-5), PlistValue::int32(70000), PlistValue::int64(3),
-                                 PlistValue::array({})})},
-       {"a",
-        PlistValue::dictionary({{"single", PlistValue::float32(0.1F)},
-                                {"double", PlistValue::float64(0.1)},
-                                {"no", PlistValue::float64(std::nan(""))},
-                                {"up", PlistValue::float64(std::numeric_limits<double>::infinity())},
-                                {"down", PlistValue::float64(-std::numeric_limits<double>::infinity())}})},
+      {{"b<", PlistValue::array({PlistValue::int8(-5), PlistValue::int64(3), PlistValue::array({})})},
+       {"a", PlistValue::dictionary({{"single", PlistValue::float32(0.1F)},
+                                     {"no", PlistValue::float64(std::nan(""))},
+                                     {"up", PlistValue::float64(std::numeric_limits<double>::infinity())}})},
        {"when", PlistValue(PlistDate{817376824.25})},
        {"bytes", PlistValue::data({std::byte{1}, std::byte{2}, std::byte{3}, std::byte{4}})},
        {"text", PlistValue::string("a\r&b")},
@@ -66,20 +62,18 @@ PlistValue everything() {
 TEST(PropertyListCodec, WritesOneElementALineInTheFormAskedFor) {
   const std::string plain =
       std::string(kHeader) +
-      "<dict>\n\t<key>b&lt;</key>\n\t<array>\n\t\t<integer>-5</integer>\n\t\t<integer>70000</integer>\n"
-      "\t\t<integer>3</integer>\n\t\t<array/>\n\t</array>\n\t<key>a</key>\n\t<dict>\n\t\t<key>single</key>\n"
-      "\t\t<real>0.10000000149011612</real>\n\t\t<key>double</key>\n\t\t<real>0.1</real>\n\t\t<key>no</key>\n"
-      "\t\t<real>nan</real>\n\t\t<key>up</key>\n\t\t<real>+infinity</real>\n\t\t<key>down</key>\n"
-      "\t\t<real>-infinity</real>\n\t</dict>\n\t<key>when</key>\n\t<date>2026-11-26T09:07:04Z</date>\n"
-      "\t<key>bytes</key>\n\t<data>AQIDBA==</data>\n\t<key>text</key>\n\t<string>a&#13;&amp;b</string>\n"
-      "\t<key>yes</key>\n\t<true/>\n\t<key>empty</key>\n\t<dict/>\n</dict>\n</plist>\n";
+      "<dict>\n\t<key>b&lt;</key>\n\t<array>\n\t\t<integer>-5</integer>\n\t\t<integer>3</"
+      "integer>\n\t\t<array/>\n"
+      "\t</array>\n\t<key>a</key>\n\t<dict>\n\t\t<key>single</key>\n\t\t<real>0.10000000149011612</real>\n"
+      "\t\t<key>no</key>\n\t\t<real>nan</real>\n\t\t<key>up</key>\n\t\t<real>+infinity</real>\n\t</dict>\n"
+      "\t<key>when</key>\n\t<date>2026-11-26T09:07:04Z</date>\n\t<key>bytes</key>\n\t<data>AQIDBA==</data>\n"
+      "\t<key>text</key>\n\t<string>a&#13;&amp;b</string>\n\t<key>yes</key>\n\t<true/>\n\t<key>empty</key>\n"
+      "\t<dict/>\n</dict>\n</plist>\n";
   EXPECT_EQ(LinuxPropertyListCodec().write(everything(), PlistForm::Plain).bytes, plain);
 
   const std::string exact = LinuxPropertyListCodec().write(everything()).bytes;
-  for (const char* element : {"<integer bits=\"8\">-5<", "<integer bits=\"32\">70000<", "<integer>3<",
-                              "<real bits=\"32\">0.1<", "<real>0.1<", "<date>2026-11-26T09:07:04.25Z<"}) {
+  for (const char* element : {"<integer bits=\"8\">-5<", "<integer>3<", "<real bits=\"32\">0.1<", "04.25Z<"})
     EXPECT_THAT(exact, HasSubstr(element));
-  }
 }
 
 TEST(PropertyListCodec, ReplacesWhatXmlCannotCarryOrRefusesItInTheExactForm) {
@@ -127,7 +121,8 @@ TEST(PropertyListCodec, FaultsOfXmlAreErrorsWithTheirPlace) {
       {"no such width", "<integer bits='16'>1</integer>|<real bits='8'>1</real>"},
       {"no real number of that width",
        "<real></real>|<real>1,5</real>|<real>1e400</real>|<real>nan(1)</real>"},
-      {"no real number of that width", "<real bits='32'>1e39</real>|<real>0x1p3</real>"},
+      {"no real number of that width",
+       "<real bits='32'>1e39</real>|<real>1e99999999999999999999</real>|<real>0x1p3</real>"},
       {"no date", "<date>2026-02-29T00:00:00Z</date>|<date>2026-01-01T24:00:00Z</date>"},
       {"no date", "<date>2026-01-01T00:00:00</date>|<date>2026-01-01T00:00:00.Z</date>"},
       {"no date", "<date>12026-01-01T00:00:00Z</date>|<date>+99999999-01-01T00:00:00Z</date>"},
@@ -325,12 +320,11 @@ TEST(PropertyListCodec, CyclesAndExplosionsOfSharedObjectsAreErrors) {
 TEST(PropertyListCodec, DamagedListsNeverBringItDown) {
   LinuxPropertyListCodec codec;
   Builder builder;
-  builder.add(Builder::dictionary({1, 2, 3}, {4, 5, 6}));
-  for (const char* key : {"first", "second", "a key of some length"}) builder.add(Builder::ascii(key));
-  builder.add(Builder::array({5, 6, 7, 5}));
-  builder.add(Builder::integer(-3));
-  builder.add(Builder::real(2.5));
-  builder.add("\x33"s + Builder::real(8e8).substr(1));
+  for (const std::string& object :
+       {Builder::dictionary({1, 2}, {3, 4}), Builder::ascii("key"), Builder::ascii("a key of some length"),
+        Builder::array({4, 5, 6, 4}), Builder::integer(-3), Builder::real(2.5),
+        "\x33"s + Builder::real(8e8).substr(1)})
+    builder.add(object);
   const std::string originals[] = {codec.write(everything()).bytes, builder.build()};
   ASSERT_EQ(parse(originals[1]).error, "");
   std::mt19937 random(20260101);
