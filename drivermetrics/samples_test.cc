@@ -157,18 +157,5 @@ TEST(Samples, ReadBuffersAsASearchFromTheirStartWould) {
   }
 }
 
-TEST(Samples, FindOutUnknownTypesForTheSubscribedRecordToo) {
-  PlistData buffer;
-  testing::appendElement(buffer, 1, 2, channelType(4, 2), {.words = {1, 2, 3, 4}});
-  testing::appendElement(buffer, 1, 2, channelType(4, 2), {.words = {5}});
-  const KdReportCollection subscribed = collectionOf({channelOf(1, 2, channelType(0))});
-  const KdReportCollection samples = KdReportCreateSamplesRaw(subscribed.get(), buffer);
-  buffer.assign(buffer.size(), std::byte{0xFF});
-  EXPECT_EQ(KdReportChannelGetFormat(channelsIn(subscribed.get())[0]), 4);
-  EXPECT_EQ(KdReportArrayGetValueAtIndex(channelsIn(samples.get())[0], 4), 5);
-  EXPECT_FALSE(channelsIn(subscribed.get())[0]->rawElements);
-  EXPECT_EQ(KdReportCreateSamplesRaw(subscribed.get(), std::nullopt), nullptr);
-}
-
 }  // namespace
 }  // namespace tbdaily

@@ -89,12 +89,11 @@ TEST(HubAdvance, MovesEveryChannelOfTheSample) {
 }
 
 PlistValue hubOf(PlistValue type, PlistArray elements) {
-  return PlistValue::dictionary(
-      {{"channels",
-        PlistValue::array({PlistValue::dictionary({{"driver", PlistValue::int64(1)},
-                                                   {"channel", PlistValue::int64(2)},
-                                                   {"type", std::move(type)},
-                                                   {"elements", PlistValue::array(elements)}})})}});
+  const PlistValue channel = PlistValue::dictionary({{"driver", PlistValue::int64(1)},
+                                                     {"channel", PlistValue::int64(2)},
+                                                     {"type", std::move(type)},
+                                                     {"elements", PlistValue::array(std::move(elements))}});
+  return PlistValue::dictionary({{"channels", PlistValue::array({channel})}});
 }
 PlistValue element(std::int64_t stamp, const Words& words) {
   PlistArray array;
