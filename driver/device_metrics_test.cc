@@ -44,12 +44,9 @@ TEST(DeviceMetrics, AtMostTenECCEventsAreReadAndLogged) {
   const auto& logs = fake.logSubmission.structured;
   ASSERT_EQ(logs.size(), 10U);
   EXPECT_EQ(logs[0].first, 172);
-  EXPECT_EQ(PlistValue::dictionary(logs[0].second),
-            PlistValue::dictionary({{"id", PlistValue::int64(0)},
-                                    {"count", PlistValue::int64(3)},
-                                    {"reg0", PlistValue::int64(0x0F0E0D0C0B0A0908)},
-                                    {"reg1", PlistValue::int64(0x1716151413121110)},
-                                    {"reg2", PlistValue::int64(0x1F1E1D1C1B1A1918)}}));
+  EXPECT_EQ(plistText(PlistValue::dictionary(logs[0].second)),
+            R"({"id": 0, "count": 3, "reg0": 1084818905618843912, "reg1": 1663540288323457296, )"
+            R"("reg2": 2242261671028070680})");
   event[1] = std::byte{200};
   CollectECCEvents(fake.platform);
   EXPECT_EQ(logs.back().second.get("count").asInteger(), 200);

@@ -53,10 +53,8 @@ TEST_F(TaskingTest, AppliesWithdrawsAndAppliesAgainInOrder) {
                                  "synchronize a", "synchronize b", "synchronize " + kJob));
   EXPECT_THAT(fake_.notifications.posts, ElementsAre("com.velmora.da.tasking_changed"));
   EXPECT_THAT(fake_.systemLog.lines, ElementsAre("default: OS change since last run ((null) -> A1)"));
-  EXPECT_EQ(job("LastOSUpdate"),
-            PlistValue::dictionary({{"version", text("A1")}, {"day", PlistValue::int32(kToday)}}));
+  EXPECT_EQ(plistText(job("LastOSUpdate")), R"({"version": "A1", "day": 20781})");
   EXPECT_EQ(job("TaskingDigest").asInteger(), 7);
-
   EXPECT_THAT(run(), IsEmpty());
   EXPECT_THAT(fake_.notifications.posts, IsEmpty());
 

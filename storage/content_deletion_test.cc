@@ -8,22 +8,19 @@ namespace tbdaily {
 namespace {
 
 TEST(NandRecommendsContentDeletion, NeedsAWholeAnswerThatIsNotZero) {
+  constexpr const char *kOpening = "Could not get connection to service\n",
+                       *kClosing = "method 5\nCould not close connection to service\n",
+                       *kNoService =
+                           "_load_nand_infoCould not get matching KdKit service for exporting classes\n";
   // Class, last of the four bytes of the answer, its size, statuses of opening, asking and closing.
   const std::vector<std::tuple<const char*, int, std::size_t, std::array<KdStatus, 3>, bool, const char*>>
-      cases = {
-          {"STXStorage", 1, 4, {}, true, "method 5\n"},
-          {"STXStorage", 0, 4, {}, false, "method 5\n"},
-          {"STXStorage", 1, 3, {}, false, "method 5\n"},
-          {"STXStorage", 1, 4, {-1}, false, "Could not get connection to service\n"},
-          {"STXStorage", 1, 4, {0, -1, -1}, false, "method 5\nCould not close connection to service\n"},
-          {"VelmoraEmbeddedNVMeController", 1, 4, {}, false, ""},
-          {"Other",
-           1,
-           4,
-           {},
-           false,
-           "_load_nand_infoCould not get matching KdKit service for exporting classes\n"},
-      };
+      cases = {{"STXStorage", 1, 4, {}, true, "method 5\n"},
+               {"STXStorage", 0, 4, {}, false, "method 5\n"},
+               {"STXStorage", 1, 3, {}, false, "method 5\n"},
+               {"STXStorage", 1, 4, {-1}, false, kOpening},
+               {"STXStorage", 1, 4, {0, -1, -1}, false, kClosing},
+               {"VelmoraEmbeddedNVMeController", 1, 4, {}, false, ""},
+               {"Other", 1, 4, {}, false, kNoService}};
   for (const auto& [serviceClass, last, filled, statuses, recommended, events] : cases) {
     testing::FakeDriverRegistry registry;
     testing::CapturedDiagnostics said;

@@ -100,22 +100,15 @@ TEST(FetchStatsContext, TellsEachTroubleAndReleasesEverything) {
 }
 
 TEST(FetchStatsContext, FollowsTheSelectorsOfTheDescriptor) {
-  static constexpr STXSelectorPair kUnequal = {1, 2}, kUnserved = {kNoSelector, 13};
-  const std::pair<SelectorGetter, std::vector<std::uint64_t>> cases[] = {
-      {[]() -> const STXSelectorPair* { return nullptr; }, {}},
-      {[] { return &kUnserved; }, {}},
-      {[] { return &kUnequal; }, {0x1'00000001, 2}},
-      {nullptr, {0, 0}}};  // requests without a body
-  for (const auto& [getter, starts] : cases) {
+  static constexpr STXSelectorPair kUnserved = {kNoSelector, 13};
+  const SelectorGetter getters[] = {[]() -> const STXSelectorPair* { return nullptr; },
+                                    [] { return &kUnserved; }};
+  for (const SelectorGetter getter : getters) {
     std::array<NandExporter, 2> table = {nand_exporters[0], {}};
     table[0].statsSelectors = getter;
     Fetch fetch;
-    EXPECT_EQ(fetch.run(table), !starts.empty());
-    std::vector<std::uint64_t> seen;
-    for (const auto& request : fetch.controller.requests)
-      seen.push_back(ByteReader(request).at<std::uint64_t>(0).value_or(0));
-    EXPECT_EQ(seen, starts);
-    EXPECT_EQ(fetch.said.errors, "");
+    EXPECT_FALSE(fetch.run(table));
+    EXPECT_TRUE(fetch.controller.requests.empty());
   }
 }
 
@@ -130,13 +123,10 @@ TEST(StxConnection, OpensAndClosesByHand) {
   EXPECT_EQ(none.said.errors, "Can't get STX Connection, no matching service!\nNo class found");
 
   FlashDisconnect(fetch.registry, 99, fetch.said);
-  std::array<NandExporter, 2> stranger = {nand_exporters[0], {}};
-  stranger[0].statsSelectors = STXGetBandStatsSelectors;
-  EXPECT_FALSE(openSTXConnection(fetch.registry, connection, fetch.said, stranger));
   fetch.registry.openStatus = kKdBadArgument;
   EXPECT_FALSE(openSTXConnection(fetch.registry, connection, fetch.said));
   EXPECT_EQ(fetch.said.errors,
-            "closing connection to service failed\nCan't get STX Connection!\n"
+            "closing connection to service failed\n"
             "KdServiceOpen failed for class 'STXStorage', result 0xe00002c2\nCan't get STX Connection!\n");
 }
 
