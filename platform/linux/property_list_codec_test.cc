@@ -293,8 +293,8 @@ TEST(PropertyListCodec, CyclesAndExplosionsOfSharedObjectsAreErrors) {
   explosion.add(Builder::array({}));
   EXPECT_THAT(parse(explosion.build()).error, HasSubstr("too much"));
 
-  // A quarter of a million references to an array of three are allowed, one more or 300 to a text of a
-  // mebibyte are not.
+  // A quarter of a million references to an array of three are allowed; one more, or 300 to a mebibyte, are
+  // not.
   wide.add(Builder::array(std::vector<std::size_t>(250000, 1)));
   wide.add(Builder::array({2, 2, 2}));
   wide.add(Builder::ascii("x"));
