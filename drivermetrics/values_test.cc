@@ -7,8 +7,7 @@
 namespace tbdaily {
 namespace {
 
-using testing::channelType, testing::collectionOf, testing::Element, testing::sampled;
-using ::testing::ElementsAre;
+using testing::channelType, testing::Element, testing::sampled;
 
 constexpr std::int64_t kNone = kKdReportInvalid;
 constexpr std::int64_t kOn = 0x4F4E, kOff = 0x4F4646;
@@ -188,21 +187,6 @@ TEST(Deltas, FollowTheRulesOfEachFormat) {
     EXPECT_EQ(wordsOf(c.later.get()), after);
   }
   EXPECT_EQ(KdReportSampleCreateDelta(nullptr, simple(1).get()), nullptr);
-}
-
-TEST(Deltas, CollectionsCarryChannelsWithoutAPartner) {
-  const auto a = sampled(channelType(1), {{1, {5}}}), b = sampled(channelType(1), {{1, {7}}});
-  const auto added = sampled(channelType(4, 1), {{1, {1, 2, 3, 4}}});
-  const auto before = collectionOf({a}), after = collectionOf({b, added});
-  const KdReportCollection delta = KdReportCreateSamplesDelta(before.get(), after.get());
-  const auto channels = testing::channelsIn(delta.get());
-  ASSERT_EQ(channels.size(), 2U);
-  EXPECT_THAT(wordsOf(channels[0]), ElementsAre(2, kNone, kNone, kNone));
-  EXPECT_THAT(wordsOf(channels[1]), ElementsAre(1, 2, 3, 4));
-  EXPECT_EQ(KdReportSimpleGetIntegerValue(a.get()), 5);
-
-  a->rawElements = {};
-  EXPECT_EQ(KdReportCreateSamplesDelta(before.get(), after.get()), nullptr);
 }
 
 }  // namespace
