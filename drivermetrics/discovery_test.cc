@@ -67,7 +67,6 @@ TEST_F(Discovery, ReadsALegendUntilItIsMalformed) {
       {PlistValue::array({good, last}), goodNames + "L "},
       {PlistValue::array({good, PlistValue::int64(1), last}), goodNames},
       {PlistValue::array({good, group(nullptr, "S", {entry(1, 1)}), last}), goodNames},
-      {PlistValue::array({good, PlistValue::dictionary({}), last}), goodNames},
       {PlistValue::array({good, group("G", nullptr, {PlistValue::int64(1), entry(1, 1)}), last}),
        goodNames + "L "},
       {PlistValue::array({good, group("G", nullptr, {PlistValue::array({PlistValue::int64(1)})}), last}),

@@ -1,7 +1,6 @@
 // The fakes keep the contracts of the families that they stand in for.
 #include "testing/absent_services_contract.h"
 #include "testing/analytics_contract.h"
-#include "testing/fake_platform.h"
 #include "testing/property_list_codec_contract.h"
 #include "testing/service_contracts.h"
 

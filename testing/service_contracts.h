@@ -14,7 +14,6 @@
 #pragma once
 
 #include "testing/contract_test.h"
-#include "testing/fake_drivers.h"
 
 namespace tbdaily::testing {
 

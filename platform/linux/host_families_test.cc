@@ -2,17 +2,10 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include "platform/app_registry.h"
-#include "platform/device_answers.h"
-#include "platform/dynamic_loader.h"
-#include "platform/kernel.h"
 #include "platform/linux/host_identity.h"
 #include "platform/linux/os_release.h"
 #include "platform/linux/test_host.h"
-#include "platform/locale_settings.h"
-#include "platform/log_submission.h"
-#include "platform/preferences_store.h"
-#include "platform/system_log.h"
+#include "testing/fake_platform.h"  // for the interfaces of all families
 
 namespace tbdaily {
 namespace {
