@@ -69,13 +69,10 @@ TEST_F(TBReportTest, CarriesTheWhitelistedRowsOfTwoDaysTheLaterOneWinning) {
   fake_.analyticsHistory.addDistribution("d", kDay, {10, 11});
   fake_.analyticsHistory.addDistribution("secret", kDay, {1, 2, 3});
   const PlistDictionary root = write();
-  EXPECT_EQ(root.get("TBScalars"), dict({{"k", number(1)}, {"old", number(3)}}));
-  EXPECT_EQ(root.get("TBDistributions"),
-            dict({{"d", PlistValue::array({PlistValue::float64(10), PlistValue::float64(11),
-                                           PlistValue::float64(10.5), PlistValue::float64(0.5),
-                                           PlistValue::int32(2)})}}));
-  EXPECT_EQ(root.get("TBDistributionsHistogram"),
-            dict({{"d", dict({{"(-inf, 10]", number(1)}, {"(10, inf)", number(1)}})}}));
+  EXPECT_EQ(plistText(root.get("TBScalars")), R"({"k": 1, "old": 3})");
+  EXPECT_EQ(plistText(root.get("TBDistributions")), R"({"d": [10, 11, 10.5, 0.5, 2]})");
+  EXPECT_EQ(plistText(root.get("TBDistributionsHistogram")),
+            "{\"d\": {\"(-inf, 10]\": 1, \"(10, inf)\": 1}}");
   EXPECT_LE(fake_.analyticsHistory.valuesAskedFor, 4);  // the dropped row's values were never asked for
   EXPECT_TRUE(fake_.systemLog.has("info: writing tallyd log. yesterday=20780"));
   EXPECT_TRUE(fake_.systemLog.has("debug: Treating key d as a histogram"));
@@ -138,14 +135,14 @@ TEST_F(TBReportTest, MeasuresOnlyWhatIsAllowedAndCarriesTaskingAndAppInfoAsTheyS
                                                              {"TaskingDigest", number(9)},
                                                              {"TaskingPayload", PlistValue::array({dict()})}};
   const PlistDictionary root = write(PlistValue::array({}));
-  EXPECT_EQ(root.get("TBMetadata"), dict({{"TBUserInterfaceLanguage", PlistValue::string("<unknown>")},
-                                          {"TBPreferredUserInterfaceLanguage", PlistValue::string("de-AT")},
-                                          {"TBUserSetRegionFormat", PlistValue::string("AT")}}));
+  EXPECT_EQ(plistText(root.get("TBMetadata")),
+            R"({"TBUserInterfaceLanguage": "<unknown>", "TBPreferredUserInterfaceLanguage": "de-AT", )"
+            R"("TBUserSetRegionFormat": "AT"})");
   EXPECT_EQ(root.get("TBTaskID").asString(), "t1");
   EXPECT_EQ(root.get("TBTaskDigest").asInteger(), 9);
   EXPECT_EQ(root.get("TBTasking"), PlistValue::array({dict()}));
   EXPECT_EQ(root.get("TBActivatedAppInfo"), PlistValue::array({}));
-  EXPECT_EQ(root.get("TBScalars"), dict({{"k", number(1)}}));
+  EXPECT_EQ(plistText(root.get("TBScalars")), R"({"k": 1})");
   EXPECT_THAT(fake_.kernel.asked, IsEmpty());
   EXPECT_EQ(fake_.appRegistry.enumerations + fake_.dynamicLoader.opens, 0);
 }

@@ -53,11 +53,9 @@ class BadInput(DeviceTest):
 
     def test_roots_that_cannot_be_used(self):
         device = self.device(value=True)
-        for root in (device.base / "missing", device.store_path):
-            result = device.run("-d", TBDAILY_ROOT=str(root), TBDAILY_LIVE="1")
-            (line,) = [line for line in result.stderr.splitlines() if line != NO_CONTROLLER]
-            self.assertIn(str(root), line)
-        self.assertFalse((device.base / "missing").exists())
+        result = device.run("-d", TBDAILY_ROOT=str(device.store_path), TBDAILY_LIVE="1")
+        (line,) = [line for line in result.stderr.splitlines() if line != NO_CONTROLLER]
+        self.assertIn(str(device.store_path), line)
 
     def test_arguments_of_every_kind(self):
         device = self.device(value=True)

@@ -5,7 +5,7 @@ import plistlib
 import unittest
 
 import model
-from harness import EPOCH, NOW, TODAY, YESTERDAY, DeviceTest
+from harness import EPOCH, NOW, YESTERDAY, DeviceTest
 
 
 class DailyRun(DeviceTest):
@@ -69,21 +69,6 @@ class DailyRun(DeviceTest):
         self.assertEqual(preview, newest)
         self.assertEqual(preview["TBScalars"]["net.new"], 12300)
         self.assertIn("day 5", device.tally("report", "--preview", "--day", "5", status=1))
-
-    def test_live_sources_answer_where_no_recording_does(self):
-        device = self.device(live=True)
-        device.path("System/Device/clock.plist").unlink()
-        uptime, swap, absent = ("com.velmora.usage.cur_boot_session_cpu_uptime", "com.velmora.kernel.swapusage",
-                                "com.velmora.kernel.memorystatus_thaw_count")
-        device.allow(ScalarKeys={"k": {}, uptime: {}, swap: {}, absent: {}})
-        device.tally("record", "scalar", "k", "3")
-        device.run("-t")
-        scalars = device.reports()[0]["TBScalars"]
-        with open("/proc/uptime") as file:
-            self.assertLessEqual(scalars[uptime], float(file.read().split()[0]) / 60 + 2)
-        with open("/proc/meminfo") as file:
-            total = next(int(line.split()[1]) for line in file if line.startswith("SwapTotal"))
-        self.assertEqual((scalars[swap], scalars[absent]), (total * 1024, -1))
 
 
 if __name__ == "__main__":

@@ -53,10 +53,6 @@ class Case:
         return errors
 
 
-def check(condition, case):
-    assert condition, case.device.log()
-
-
 def app_info_on_request(case):
     waiter = subprocess.Popen([BIN / "tallyctl", "wait", LOGGING, "--timeout", "20"], env=case.device.env,
                               stdout=subprocess.PIPE)
@@ -70,12 +66,12 @@ def app_info_on_request(case):
     case.device.wait_for(lambda: case.device.reports())
     case.device.tally("send", "logging-status")  # the guard is used up
     case.end()
-    check(case.device.posts(LOGGING) == 1 and len(case.device.reports()) == 1, case)
+    assert case.device.posts(LOGGING) == 1 and len(case.device.reports()) == 1, case.device.log()
     assert case.device.reports()[0]["TBActivatedAppInfo"] == [
         {"bundle": "org.example.chess", "version": "1.2", "kestrelID": -7, "arch": 2,
          "uuid": "00112233-4455-6677-8899-AABBCCDDEEFF"}]
-    check("tbdaily got (unsolicited -- so ignoring) AAI:" in case.device.texts(), case)
-    check("tbdaily got requestedAAI:" in case.device.texts(), case)
+    assert "tbdaily got (unsolicited -- so ignoring) AAI:" in case.device.texts(), case.device.log()
+    assert "tbdaily got requestedAAI:" in case.device.texts(), case.device.log()
 
 
 def hostile_frames(case):
@@ -93,7 +89,7 @@ def hostile_frames(case):
     errors = case.end()
     assert "longer than 16 MiB" in errors and "no dictionary" in errors and "left in the middle" in errors, errors
     assert len(case.device.reports()[0]["TBActivatedAppInfo"]) == 1
-    check("daily tasks for day 5" not in case.device.texts(), case)
+    assert "daily tasks for day 5" not in case.device.texts(), case.device.log()
 
 
 def a_second_job(case):
@@ -102,7 +98,7 @@ def a_second_job(case):
     assert "another job is listening" in second.stderr, second.stderr
     # The second one waited its ten seconds beside the first, whose own were over by then.
     case.end()
-    check(case.device.texts().count("tbdaily ended") == 2, case)
+    assert case.device.texts().count("tbdaily ended") == 2, case.device.log()
     assert case.device.reports()[0]["TBScalars"] == {"k": 3}
     assert case.device.last_day() is None
 
@@ -149,10 +145,9 @@ class Endpoint(DeviceTest):
         job = subprocess.Popen(["sh", "-c", f'exec 3<&{listener.fileno()}; LISTEN_PID=$$ exec "{BIN}/tbdaily"'],
                                env=dict(device.env, LISTEN_FDS="1"), pass_fds=(listener.fileno(),),
                                stderr=subprocess.PIPE)
-        peer = socket.socket(socket.AF_UNIX)
-        self.addCleanup(peer.close)
-        peer.connect(str(device.base / "passed.sock"))
-        peer.sendall(frame({"operation": 1, "value": TODAY}))
+        with socket.socket(socket.AF_UNIX) as peer:
+            peer.connect(str(device.base / "passed.sock"))
+            peer.sendall(frame({"operation": 1, "value": TODAY}))
         device.wait_for(lambda: f"daily tasks for day {TODAY}" in device.log())
         job.kill()
         job.communicate()

@@ -23,15 +23,15 @@ LOGGING = JOB + ".logging"
 
 
 class Device:
-    """Dependent on its recordings alone, unless `live`; the clock stands at NOW."""
+    """Dependent on its recordings alone; the clock stands at NOW."""
 
-    def __init__(self, sample=False, live=False, name="root", profile=None, value=False):
+    def __init__(self, sample=False, name="root", profile=None, value=False):
         """`sample` or a `profile`: as `tallyctl init` makes it; `value`: the scalar k, allowed, was 3 yesterday."""
         self.base = pathlib.Path(tempfile.mkdtemp(prefix="tbdaily-e2e-"))
         self.root = self.base / name
         self.root.mkdir(parents=True)
-        self.env = dict(os.environ, TBDAILY_ROOT=str(self.root), TBDAILY_LIVE="1" if live else "0",
-                        TBDAILY_LOG_PRIVATE="show", ASAN_OPTIONS="detect_leaks=1:exitcode=99",
+        self.env = dict(os.environ, TBDAILY_ROOT=str(self.root), TBDAILY_LIVE="0", TBDAILY_LOG_PRIVATE="show",
+                        ASAN_OPTIONS="detect_leaks=1:exitcode=99",
                         UBSAN_OPTIONS="print_stacktrace=1")
         self.record("clock", {"now": NOW, "ticks": 3600000000000, "numerator": 125, "denominator": 3})
         self.record("usage", {"records": []})  # without one every run waits for a reply that never comes
