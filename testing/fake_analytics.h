@@ -34,7 +34,6 @@ class FakeAnalyticsClient : public AnalyticsClient {
 
 class FakeAnalyticsHistory : public AnalyticsHistory {
  public:
-  int opens = 0;
   int valuesAskedFor = 0;  // calls of nextValue, over all rows
 
   void addScalar(std::string_view key, DayNumber day, std::int64_t value) {
@@ -47,7 +46,6 @@ class FakeAnalyticsHistory : public AnalyticsHistory {
   }
 
   std::unique_ptr<OpenAnalyticsHistory> open() override {
-    ++opens;
     return std::make_unique<Opened>(rows_, valuesAskedFor);
   }
 

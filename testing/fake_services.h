@@ -38,7 +38,6 @@ std::optional<Value> found(const ByName<Value>& map, std::string_view name) {
 class FakePreferences : public PreferencesStore {
  public:
   PlistValue getValue(std::string_view key, std::string_view domain) override {
-    reads.emplace_back(std::string(domain) + "/" + std::string(key));
     return found(domains, domain).value_or(PlistDictionary()).get(key);
   }
   void setValue(std::string_view key, const PlistValue& value, std::string_view domain) override {
@@ -50,7 +49,7 @@ class FakePreferences : public PreferencesStore {
   }
 
   ByName<PlistDictionary> domains;
-  std::vector<std::string> reads, writes;
+  std::vector<std::string> writes;
 };
 
 class FakeDeviceAnswers : public DeviceAnswers {
