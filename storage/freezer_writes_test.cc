@@ -39,7 +39,7 @@ TEST(FreezerWrites, AreThoseOfTheThreadOfThatName) {
       {Kcdata().item(0x11, "x").begin(1).ioStats(5).append(kThread).end(1).bufferEnd(), 77},
       {Kcdata().begin(1).begin(3).name("other").end(3).item(0x2F, "x").append(kThread), 77},
       {Kcdata().begin(1).name(name).ioStats(7, 31).end(1), 0},
-      {Kcdata().begin(1).ioStats(~0ULL - 9, 32).name(name + std::string(70, '\0')).end(1), -10},
+      {Kcdata().begin(1).ioStats(~0ULL - 9, 32).name(name + std::string(54, '\0') + "beyond 64").end(1), -10},
       {Kcdata().begin(1).name(name).begin(2).ioStats(5).end(2).end(1), 0},
       {Kcdata().begin(1).name(name).name(name + "s").end(1), -1},
       {Kcdata().begin(1).begin(2).name("other").end(2).end(1).append(kThread), -1},
