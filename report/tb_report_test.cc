@@ -13,10 +13,6 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
 constexpr DayNumber kDay = 20780;
-constexpr const char* kSupportLibrary =
-    "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
-
-std::int64_t corruptions = 0;
 
 PlistValue dict(PlistDictionary entries = {}) {
   return PlistValue::dictionary(std::move(entries));
@@ -151,7 +147,7 @@ TEST_F(TBReportTest, MeasuresTheSystem) {
   const PlistDictionary measured = {{"k", number(1)},
                                     {"com.velmora.homedeck.numThirdPartyApps", number(2)},
                                     {"com.velmora.sysmetrics.tbkd.database.size", number(1)},
-                                    {"com.velmora.sysmetrics.tbkd.database.corruptions", number(3)},
+                                    {"com.velmora.sysmetrics.tbkd.database.corruptions", number(0)},
                                     {"com.velmora.usage.cur_boot_session_cpu_uptime", number(2500)},
                                     {"com.velmora.kernel.memorystatus_freeze_count", number(4294967295)},
                                     {"com.velmora.kernel.memorystatus_freeze_pageouts", number(-1)},
@@ -159,18 +155,11 @@ TEST_F(TBReportTest, MeasuresTheSystem) {
   allow(keysOf(measured));
   fake_.appRegistry.bundleTypes = {"User", "System", "User"};
   fake_.fileSystem.sizes["/var/mobile/Library/Tallybook/TBDataStore.sqlitedb"] = 1048576;
-  fake_.dynamicLoader.library = kSupportLibrary;
-  corruptions = 3;
-  const PreferencesGetInteger get = [](const char*, const char*, bool*) { return corruptions; };
-  const PreferencesSetValue set = [](const char*, std::int64_t value, const char*) { corruptions = value; };
-  fake_.dynamicLoader.symbols = {{"SMXPreferencesGetIntegerValue", reinterpret_cast<void*>(get)},
-                                 {"SMXPreferencesSetValue", reinterpret_cast<void*>(set)}};
   fake_.kernel.ticks = 3600000000000;
   fake_.kernel.ratio = Timebase{125, 3};
   fake_.kernel.sysctls["kern.memorystatus_freeze_count"] = PlistData(4, std::byte{0xff});
   fake_.kernel.sysctls["vm.swapusage"] = PlistData(32, std::byte{0x01});
   EXPECT_EQ(write().get("TBScalars"), dict(measured));
-  EXPECT_EQ(corruptions, 0);
   fake_.kernel.ratio = Timebase{1, 0};
   writeLog();
   EXPECT_TRUE(fake_.systemLog.has("error: Couldn't retrieve mach_timebase_info"));

@@ -64,12 +64,14 @@ class StructuredLogsTest : public ::testing::Test {
 
 TEST(WriteAmplification, CountsErasedUnitsForEachUnitWritten) {
   StatsContext context;
+  const auto listed = testing::StatsBuffer().record(129, {8}).record(84, {16});
+  EXPECT_TRUE(STXParseBufferToCxt(context, listed.bytes));
   context.bytesPerPage = 0x10000;
   context.pagesPerVirtualBlock = 0x10001;  // the product wraps to 0x10000
   context.bandErases = 1000;
   context.hostWrites = 1 << 20;
   EXPECT_EQ(computeWriteAmplification(context).user, static_cast<double>(1000.0F * 16 / (1 << 20)));
-  EXPECT_EQ(computeWriteAmplification(context).system, 0);
+  EXPECT_EQ(computeWriteAmplification(context).system, 8.0 * 16 * 16 / (1 << 20));
   context.hostWrites = 0;
   EXPECT_EQ(computeWriteAmplification(context).user, std::numeric_limits<double>::infinity());
   EXPECT_TRUE(std::isnan(computeWriteAmplification({}).user));

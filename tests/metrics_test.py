@@ -119,9 +119,7 @@ class Metrics(unittest.TestCase):
                               ("--category 0x70012", ["COU", "not in the hub", "format nine", "reads"]),
                               (f"--unit {NS:#x} --category 256", ["wait"])):
             self.check_names(wanted, *words.split())
-        for words in ("list --category x", "list --format Simple", "delta", "watch --interval nan",
-                      "sample --describe --json"):
-            self.metrics(*words.split(), status=2)
+        self.metrics("list", "--category", "x", status=2)
 
     def check_names(self, wanted, *filters):
         channels = json.loads(self.metrics("list", "--json", *filters))
