@@ -1,7 +1,9 @@
 """A day's run on a device root: the report value by value, what it leaves behind."""
 
 import datetime
+import pathlib
 import plistlib
+import re
 import unittest
 
 import model
@@ -69,6 +71,20 @@ class DailyRun(DeviceTest):
         self.assertEqual(preview, newest)
         self.assertEqual(preview["TBScalars"]["net.new"], 12300)
         self.assertIn("day 5", device.tally("report", "--preview", "--day", "5", status=1))
+
+    def test_live_sources_answer_where_no_recording_does(self):
+        device = self.device(value=True)
+        device.env["TBDAILY_LIVE"] = "1"
+        device.path("System/Device/clock.plist").unlink()
+        uptime_key, swap_key = "com.velmora.usage.cur_boot_session_cpu_uptime", "com.velmora.kernel.swapusage"
+        device.allow(ScalarKeys={"k": {}, uptime_key: {}, swap_key: {}})
+        device.tally("record", "scalar", "k", "3")  # of today
+        device.run("-t")
+        scalars = device.reports()[0]["TBScalars"]
+        minutes = float(pathlib.Path("/proc/uptime").read_text().split()[0]) / 60
+        (swap,) = re.findall(r"SwapTotal: +(\d+)", pathlib.Path("/proc/meminfo").read_text())
+        self.assertLessEqual(scalars[uptime_key], minutes + 2)
+        self.assertEqual(scalars[swap_key], int(swap) * 1024)
 
 
 if __name__ == "__main__":

@@ -15,7 +15,7 @@ CHANNELS = [
     (FAN, "Queue", "Rails", "wait", 5, 3, 0x0100, 4, NS, [10, 20, 30]),
     (FAN, "Queue", "Rails", "unbounded", 6, 3, 0x0100, 2, None, None),
     (FAN, "Queue", "Rails", "format nine", 7, 9, 0x0002, 1, None, None),
-    (DISK, None, None, "reads", 1, 1, 0x0002, 1, COUNT, None),
+    (DISK, None, None, "reads", 1, 1, 0x0102, 1, COUNT, None),
     (DISK, None, None, "found out", 2, 0, 0x0000, 0, None, None)]
 # (driver, channel): stamp and words of each element, earlier and later
 HUB = {(FAN, 1): ([(1, 1, 2, NONE, 4), (1, 5)], [(1, 2, NONE, 7, 4), (1, 2 ** 62)]),

@@ -125,6 +125,13 @@ class Metrics(unittest.TestCase):
         channels = json.loads(self.metrics("list", "--json", *filters))
         self.assertEqual([c["name"] or c["channelID"] for c in channels], wanted, filters)
 
+    def test_daily_run_sets_simple_channels_of_its_category(self):
+        self.device.run("-f")
+        keys = {key: value for key, value in self.device.scalars().items() if "kdreport" in key}
+        self.assertEqual(keys, {"com.velmora.kdreport." + c["name"]: c["value"] for c in model(0)
+                                if c["format"] == 1 and c["categories"] & 0x100 and c["name"]})
+        self.assertEqual(len(keys), 1)
+
     def test_failures_and_nothing(self):
         for status, reason in (("openStatus", "Could not open KdReportHub"),
                                ("configureStatus", "ConfigureInterests failed"), ("updateStatus", "sampled")):
