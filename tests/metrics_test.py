@@ -117,7 +117,8 @@ class Metrics(unittest.TestCase):
                               ("--subgroup Rails --format histogram", ["wait", "unbounded"]),
                               ("--format unknown", ["found out"]), ("--unit ns", ["COU", 0xFF, "wait"]),
                               ("--category 0x70012", ["COU", "not in the hub", "format nine", "reads"]),
-                              (f"--unit {NS:#x} --category 256", ["wait"])):
+                              (f"--unit {NS:#x} --category 256", ["wait"]),
+                              ("--unit= --category 256", ["reads"])):
             self.check_names(wanted, *words.split())
         self.metrics("list", "--category", "x", status=2)
 

@@ -1,8 +1,11 @@
 // tallyctl: makes, feeds, drives and shows a tbdaily device.
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <cstdio>
 #include <exception>
+#include <string>
+#include <vector>
 
 #include "tools/tallyctl/tool.h"
 
@@ -49,6 +52,23 @@ std::string reasonOf(const CLI::App& app, const CLI::ParseError& error, int argc
   return error.what();
 }
 
+// The words of the command line in the reverse order that the parser takes. It would take the word behind an
+// empty value, as in "--unit=", for that value: the two are handed over apart.
+std::vector<std::string> reversedWords(int argc, char** argv) {
+  std::vector<std::string> words;
+  bool isOption = true;  // until "--"
+  for (int i = 1; i < argc; ++i) {
+    std::string word = argv[i];
+    isOption = isOption && word != "--";
+    const bool hasEmptyValue = isOption && word.starts_with("--") && word.find('=') == word.size() - 1;
+    if (hasEmptyValue) word.pop_back();
+    words.push_back(std::move(word));
+    if (hasEmptyValue) words.emplace_back();
+  }
+  std::ranges::reverse(words);
+  return words;
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -56,7 +76,8 @@ int main(int argc, char** argv) {
   CLI::App app;
   try {
     declare(app, tool);
-    app.parse(argc, argv);
+    app.name("tallyctl");
+    app.parse(reversedWords(argc, argv));
   } catch (const CLI::Success& asked) {  // --help
     return app.exit(asked);
   } catch (const CLI::ParseError& error) {
