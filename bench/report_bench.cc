@@ -11,6 +11,7 @@
 #include "platform/linux/analytics_history.h"
 #include "platform/linux/analytics_store.h"
 #include "platform/linux/property_list_codec.h"
+#include "platform/platform_with.h"
 #include "report/distribution_summary.h"
 #include "report/internal_device.h"
 #include "report/prefix_index.h"
@@ -114,24 +115,7 @@ void writeWholeReport(benchmark::State& state) {
   const PlistWriteResult whitelist = codec.write(PlistValue::dictionary({{"All", group}}));
   const auto bytes = std::as_bytes(std::span(whitelist.bytes));
   fake.fileSystem.files[std::string(kWhitelistPath)] = {bytes.begin(), bytes.end()};
-  Platform platform{fake.driverRegistry,
-                    fake.preferences,
-                    fake.deviceAnswers,
-                    fake.logSubmission,
-                    fake.analyticsClient,
-                    history,
-                    codec,
-                    fake.stackSnapshot,
-                    fake.usageService,
-                    fake.appRegistry,
-                    fake.localeSettings,
-                    fake.serviceListener,
-                    fake.notifications,
-                    fake.systemLog,
-                    fake.kernel,
-                    fake.fileSystem,
-                    fake.dynamicLoader,
-                    fake.messageDigest};
+  Platform platform = platformWith(fake.platform, history, codec);
   for (auto _ : state) {
     fake.logSubmission.logs.clear();
     fake.systemLog.lines.clear();

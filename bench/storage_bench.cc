@@ -4,6 +4,7 @@
 
 #include <vector>
 
+#include "platform/platform_with.h"
 #include "storage/nand_info.h"
 #include "storage/stats_context.h"
 #include "storage/stats_table.h"
@@ -52,24 +53,7 @@ void telemetryList(benchmark::State& state) {
   };
   testing::FakePlatform fake;
   Sink sink;
-  Platform platform{fake.driverRegistry,
-                    fake.preferences,
-                    fake.deviceAnswers,
-                    sink,
-                    fake.analyticsClient,
-                    fake.analyticsHistory,
-                    fake.propertyListCodec,
-                    fake.stackSnapshot,
-                    fake.usageService,
-                    fake.appRegistry,
-                    fake.localeSettings,
-                    fake.serviceListener,
-                    fake.notifications,
-                    fake.systemLog,
-                    fake.kernel,
-                    fake.fileSystem,
-                    fake.dynamicLoader,
-                    fake.messageDigest};
+  Platform platform = platformWith(fake.platform, sink);
   const std::int64_t channels = state.range(0);
   const std::vector<std::byte> bytes(static_cast<std::size_t>(channels) * 4128, std::byte{1});
   const PlistValue characteristics =

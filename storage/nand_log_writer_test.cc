@@ -5,6 +5,7 @@
 #include <cstdlib>
 
 #include "platform/number_text.h"
+#include "platform/platform_with.h"
 #include "testing/fake_platform.h"
 
 namespace tbdaily {
@@ -85,16 +86,11 @@ TEST_F(NandLog, EndsWithALineWhenAServiceThrows) {
   struct : testing::FakeLogSubmission {
     std::string systemVersion() override { throw std::runtime_error("NoSpool"); }
   } failing;
-  auto& f = fake;
-  Platform platform{
-      f.driverRegistry,   f.preferences,       f.deviceAnswers, failing,        f.analyticsClient,
-      f.analyticsHistory, f.propertyListCodec, f.stackSnapshot, f.usageService, f.appRegistry,
-      f.localeSettings,   f.serviceListener,   f.notifications, f.systemLog,    f.kernel,
-      f.fileSystem,       f.dynamicLoader,     f.messageDigest};
+  Platform platform = platformWith(fake.platform, failing);
   const PlistDictionary info;
   NLW_WriteLog(platform, "165", &info);
-  EXPECT_THAT(f.systemLog.lines, ElementsAre("An exception occurred: NoSpool"));
-  EXPECT_TRUE(f.preferences.writes.empty());
+  EXPECT_THAT(fake.systemLog.lines, ElementsAre("An exception occurred: NoSpool"));
+  EXPECT_TRUE(fake.preferences.writes.empty());
 }
 
 }  // namespace

@@ -8,10 +8,11 @@
 #include "platform/linux/analytics_history.h"
 #include "platform/linux/analytics_store.h"
 #include "platform/log_submission.h"
+#include "platform/platform_with.h"
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
 #include "report/tb_report.h"
-#include "tools/tallyctl/platform_overrides.h"
+#include "tools/tallyctl/captured_log.h"
 #include "tools/tallyctl/store_copy.h"
 
 namespace tbdaily {
@@ -136,24 +137,7 @@ ReportPreview previewReport(LinuxPlatform& linux, std::optional<DayNumber> day) 
   StoreCopyFileSystem fileSystem(real.fileSystem, storePath, copy.path());
   CapturedSubmission submission(real.logSubmission);
   LinuxAnalyticsHistory history([&copy] { return std::optional(copy.path()); });
-  Platform preview{real.driverRegistry,
-                   preferences,
-                   real.deviceAnswers,
-                   submission,
-                   real.analyticsClient,
-                   history,
-                   real.propertyListCodec,
-                   real.stackSnapshot,
-                   real.usageService,
-                   real.appRegistry,
-                   real.localeSettings,
-                   real.serviceListener,
-                   real.notifications,
-                   log,
-                   real.kernel,
-                   fileSystem,
-                   loader,
-                   real.messageDigest};
+  Platform preview = platformWith(real, preferences, submission, history, log, fileSystem, loader);
 
   const DayNumber wanted = day ? *day : dayBefore(real.analyticsClient.currentDayNumber());
   TBReport(preview).writeLogForYesterdayWithAppInfo(wanted, PlistValue());

@@ -3,9 +3,10 @@
 #include <CLI/CLI.hpp>
 
 #include "platform/file_system.h"
+#include "platform/platform_with.h"
 #include "platform/property_list_codec.h"
 #include "report/tb_config.h"
-#include "tools/tallyctl/platform_overrides.h"
+#include "tools/tallyctl/captured_log.h"
 #include "tools/tallyctl/tool.h"
 #include "tools/tallyctl/whitelist_lint.h"
 
@@ -63,7 +64,7 @@ void printAnswer(Terminal& out, const KeyAnswer& answer) {
 
 void check(Tool& tool, const std::vector<std::string>& keys) {
   CapturedLog log;
-  Platform platform = withSystemLog(tool.platform().services(), log);
+  Platform platform = platformWith(tool.platform().services(), log);
   const auto config = TBConfig::init(platform);
   if (!config)
     return tool.fail(log.errors().empty() ? "the whitelist cannot be loaded" : log.errors().front());

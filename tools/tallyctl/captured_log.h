@@ -1,11 +1,9 @@
-// A platform with some of its services replaced, for commands that look at the job's own code at work without
-// letting it act.
+// A system log that is looked at, for commands that watch the job's own code at work without letting it act.
 #pragma once
 
 #include <string>
 #include <vector>
 
-#include "platform/platform.h"
 #include "platform/system_log.h"
 
 namespace tbdaily {
@@ -30,8 +28,5 @@ class CapturedLog : public SystemLog {
 
   std::vector<Message> messages;
 };
-
-// The services of the platform with another log. Borrows both.
-Platform withSystemLog(const Platform& platform, SystemLog& log);
 
 }  // namespace tbdaily
