@@ -11,8 +11,8 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/linux/analytics_history.h"
-#include "platform/linux/analytics_store.h"
+#include "platform/linux/store/analytics_store.h"
+#include "platform/linux/store/sqlite_analytics_history.h"
 #include "testing/temporary_folder.h"
 
 namespace tbdaily {

@@ -7,7 +7,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/property_list_codec.h"
+#include "platform/plist/codec.h"
 #include "testing/binary_plist_builder.h"
 
 namespace tbdaily {

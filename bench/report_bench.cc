@@ -8,10 +8,10 @@
 #include <vector>
 
 #include "driver/environment_probes.h"
-#include "platform/linux/analytics_history.h"
-#include "platform/linux/analytics_store.h"
-#include "platform/linux/property_list_codec.h"
+#include "platform/linux/store/analytics_store.h"
+#include "platform/linux/store/sqlite_analytics_history.h"
 #include "platform/platform_with.h"
+#include "platform/plist/codec.h"
 #include "report/distribution_summary.h"
 #include "report/internal_device.h"
 #include "report/prefix_index.h"

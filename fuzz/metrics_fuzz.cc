@@ -12,7 +12,7 @@
 #include <cstdint>
 
 #include "drivermetrics/kd_report.h"
-#include "platform/linux/property_list_codec.h"
+#include "platform/plist/codec.h"
 #include "testing/fake_drivers.h"
 
 using namespace tbdaily;

@@ -13,8 +13,8 @@
 #include <string>
 #include <string_view>
 
-#include "platform/linux/plist_json.h"
-#include "platform/linux/property_list_codec.h"
+#include "platform/plist/codec.h"
+#include "platform/plist/json.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   using namespace tbdaily;

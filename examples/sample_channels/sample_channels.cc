@@ -1,7 +1,7 @@
 // Prints the value of every simple channel that the drivers of the device under TBDAILY_ROOT publish.
 
 #include <drivermetrics/kd_report.h>
-#include <platform/linux/host_registry.h>
+#include <platform/linux/replay/host_registry.h>
 
 #include <iostream>
 

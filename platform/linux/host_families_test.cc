@@ -3,8 +3,8 @@
 #include <sys/stat.h>
 
 #include "platform/linux/host_identity.h"
+#include "platform/linux/host_test_support.h"
 #include "platform/linux/os_release.h"
-#include "platform/linux/test_host.h"
 #include "testing/fake_platform.h"  // for the interfaces of all families
 
 namespace tbdaily {

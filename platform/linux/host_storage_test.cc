@@ -6,10 +6,10 @@
 
 #include <thread>
 
+#include "platform/linux/host_test_support.h"
 #include "platform/linux/linux_notifications.h"
 #include "platform/linux/linux_preferences.h"
 #include "platform/linux/log_spool.h"
-#include "platform/linux/test_host.h"
 #include "platform/system_log.h"
 
 namespace tbdaily {

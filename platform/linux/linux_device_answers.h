@@ -2,7 +2,7 @@
 #pragma once
 
 #include "platform/device_answers.h"
-#include "platform/linux/recordings.h"
+#include "platform/linux/replay/recordings.h"
 
 namespace tbdaily {
 

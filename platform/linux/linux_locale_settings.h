@@ -1,7 +1,7 @@
 // Languages and region: recorded, else those of the process environment and the host's message catalogues.
 #pragma once
 
-#include "platform/linux/recordings.h"
+#include "platform/linux/replay/recordings.h"
 #include "platform/locale_settings.h"
 
 namespace tbdaily {

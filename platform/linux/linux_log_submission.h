@@ -3,7 +3,7 @@
 
 #include "platform/kernel.h"
 #include "platform/linux/log_spool.h"
-#include "platform/linux/recordings.h"
+#include "platform/linux/replay/recordings.h"
 #include "platform/log_submission.h"
 #include "platform/preferences_store.h"
 

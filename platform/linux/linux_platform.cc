@@ -2,12 +2,8 @@
 
 #include <utility>
 
-#include "platform/linux/analytics_history.h"
-#include "platform/linux/analytics_home.h"
-#include "platform/linux/linux_analytics_client.h"
 #include "platform/linux/linux_app_registry.h"
 #include "platform/linux/linux_device_answers.h"
-#include "platform/linux/linux_driver_registry.h"
 #include "platform/linux/linux_file_system.h"
 #include "platform/linux/linux_kernel.h"
 #include "platform/linux/linux_locale_settings.h"
@@ -15,11 +11,15 @@
 #include "platform/linux/linux_notifications.h"
 #include "platform/linux/linux_preferences.h"
 #include "platform/linux/linux_service_listener.h"
-#include "platform/linux/linux_stack_snapshot.h"
 #include "platform/linux/linux_system_log.h"
-#include "platform/linux/linux_usage_service.h"
-#include "platform/linux/property_list_codec.h"
-#include "platform/linux/recordings.h"
+#include "platform/linux/replay/recorded_driver_registry.h"
+#include "platform/linux/replay/recorded_stack_snapshot.h"
+#include "platform/linux/replay/recorded_usage_service.h"
+#include "platform/linux/replay/recordings.h"
+#include "platform/linux/store/sqlite_analytics_client.h"
+#include "platform/linux/store/sqlite_analytics_history.h"
+#include "platform/linux/store/store_locator.h"
+#include "platform/plist/codec.h"
 
 namespace tbdaily {
 

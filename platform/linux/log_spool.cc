@@ -9,8 +9,8 @@
 #include <vector>
 
 #include "platform/linux/file_io.h"
-#include "platform/linux/plist_json.h"
 #include "platform/number_text.h"
+#include "platform/plist/json.h"
 
 namespace tbdaily {
 

@@ -5,7 +5,7 @@
 #include <cstring>
 
 #include "platform/linux/linux_preferences.h"
-#include "platform/linux/property_list_codec.h"
+#include "platform/plist/codec.h"
 
 namespace {
 

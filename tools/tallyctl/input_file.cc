@@ -6,7 +6,7 @@
 #include <string_view>
 
 #include "platform/linux/host.h"
-#include "platform/linux/plist_json.h"
+#include "platform/plist/json.h"
 
 namespace tbdaily {
 

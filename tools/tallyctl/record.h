@@ -10,7 +10,7 @@
 #include <string_view>
 
 #include "platform/analytics_client.h"
-#include "platform/linux/analytics_store.h"
+#include "platform/linux/store/analytics_store.h"
 
 namespace tbdaily {
 

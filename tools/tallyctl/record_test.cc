@@ -5,7 +5,7 @@
 #include <memory>
 #include <sstream>
 
-#include "platform/linux/analytics_history.h"
+#include "platform/linux/store/sqlite_analytics_history.h"
 #include "testing/analytics_lines.h"
 #include "testing/temporary_folder.h"
 

@@ -7,9 +7,9 @@
 #include <optional>
 #include <thread>
 
-#include "platform/linux/analytics_database.h"
 #include "platform/linux/file_io.h"
 #include "platform/linux/host.h"
+#include "platform/linux/store/store_file.h"
 
 namespace tbdaily {
 

@@ -5,7 +5,7 @@
 #include <filesystem>
 #include <limits>
 
-#include "platform/linux/plist_json.h"
+#include "platform/plist/json.h"
 
 namespace tbdaily {
 

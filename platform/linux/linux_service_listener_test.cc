@@ -1,0 +1,159 @@
+// The endpoint under peers that are slow, many, large or hostile.
+#include "platform/linux/linux_service_listener.h"
+
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <ctime>
+#include <iterator>
+#include <thread>
+
+#include "platform/linux/host_test_support.h"
+#include "platform/linux/unix_socket.h"
+
+namespace tbdaily {
+namespace {
+
+constexpr const char* kEndpoint = "com.example.e";
+constexpr std::size_t kMost = LinuxServiceListener::kMaximumMessageLength;
+
+std::string frame(std::size_t length, std::string_view list) {
+  std::string bytes;
+  for (int shift = 0; shift < 32; shift += 8) bytes += static_cast<char>(length >> shift & 0xFF);
+  return bytes.append(list);
+}
+
+// A message that says `number`, with as much white space as makes it `length` bytes long.
+std::string message(int number, std::size_t length = 0) {
+  std::string list =
+      "<plist><dict><key>n</key><integer>" + std::to_string(number) + "</integer></dict></plist>";
+  if (list.size() < length) list.append(length - list.size(), '\n');
+  return frame(list.size(), list);
+}
+
+class EndpointTest : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    std::signal(SIGPIPE, SIG_IGN);  // as the job does
+    const ServiceConnection endpoint = listener.createListener(kEndpoint, DeliveryQueue::Main);
+    ASSERT_NE(endpoint, 0U);
+    listener.setEventHandler(endpoint, [this](const ServiceEvent& event) {
+      const ServiceConnection peer = event.peer;
+      events.push_back("new " + std::to_string(peer));
+      listener.setEventHandler(peer, [this, peer](const ServiceEvent& received) {
+        const std::string who = std::to_string(peer) + " ";
+        events.push_back(received.kind == ServiceEventKind::Error
+                             ? who + "error"
+                             : who + std::to_string(messageInteger(received.message, "n")));
+      });
+      listener.resume(peer);
+    });
+    listener.resume(endpoint);
+  }
+  FileDescriptor connect() { return connectUnixSocket(endpointPath(device.host, kEndpoint)).socket; }
+  // Runs slices until that many events came and nothing comes any more, and answers the events.
+  std::vector<std::string> serve(double quiet = 0.05, std::size_t atLeast = 0) {
+    constexpr double kLongEnough = 60;  // on a slow machine, for events that are sure to come
+    events.clear();
+    while (events.size() < atLeast && listener.runSlice(kLongEnough) == SliceResult::HandledEvent) {
+    }
+    while (listener.runSlice(quiet) == SliceResult::HandledEvent) {
+    }
+    return events;
+  }
+  using Events = std::vector<std::string>;
+
+  testing::TestHost device;
+  LinuxServiceListener listener{device.host, device.codec};
+  Events events;
+};
+
+TEST_F(EndpointTest, BelongsToOneListenerAndOnlyStaleSocketsAreReplaced) {
+  LinuxServiceListener other(device.host, device.codec);
+  EXPECT_EQ(other.createListener(kEndpoint, DeliveryQueue::Main), 0U);
+  EXPECT_TRUE(connect().isOpen());  // the refused one left the socket alone
+  device.put("/var/run/taken.sock", "a file");
+  for (const char* name : {"", "../e", ".e", "taken"})
+    EXPECT_EQ(other.createListener(name, DeliveryQueue::Main), 0U) << name;
+  EXPECT_EQ(device.text("/var/run/taken.sock"), "a file");
+  // Closing a bound socket leaves its file, as a job that was killed does.
+  EXPECT_EQ(listenUnixSocket(endpointPath(device.host, "stale")).error, 0);
+  EXPECT_NE(LinuxServiceListener(device.host, device.codec).createListener("stale", DeliveryQueue::Main), 0U);
+  EXPECT_FALSE(std::filesystem::exists(endpointPath(device.host, "stale")));
+}
+
+TEST_F(EndpointTest, ReadsMessagesHoweverTheyArrive) {
+  const FileDescriptor peer = connect();
+  std::string all;
+  for (int n = 1; n <= 50; ++n) all += message(n);
+  ASSERT_EQ(writeAll(peer.get(), all), 0);
+  Events expected{"new 2"};
+  for (int n = 1; n <= 50; ++n) expected.push_back("2 " + std::to_string(n));
+  EXPECT_EQ(serve(), expected);
+  for (const char byte : message(51)) {
+    EXPECT_EQ(serve(0), Events{});
+    ASSERT_EQ(writeAll(peer.get(), std::string(1, byte)), 0);
+  }
+  EXPECT_EQ(serve(), Events{"2 51"});
+}
+
+TEST_F(EndpointTest, TakesSixteenMebibytesAndNoByteMore) {
+  for (const std::size_t length : {kMost, kMost + 1}) {
+    const FileDescriptor peer = connect();
+    std::thread sender([&] { writeAll(peer.get(), message(7, length)); });
+    const ServiceConnection id = length == kMost ? 2 : 3;
+    const std::string who = std::to_string(id);
+    EXPECT_EQ(serve(0.05, 2), (Events{"new " + who, who + (length == kMost ? " 7" : " error")}));
+    sender.join();
+  }
+}
+
+TEST_F(EndpointTest, GoesOnAfterEveryKindOfBadPeer) {
+  const FileDescriptor good = connect();
+  const std::string hostile[] = {
+      frame(0, ""), frame(0xFFFFFFFF, "x"),  frame(6, "bplist"), frame(24, "<plist><array/></plist>\n"),
+      "\1",         message(1).substr(0, 20)};
+  Events expected{"new 2"};
+  std::size_t errors = 0;
+  EXPECT_EQ(serve(), expected);
+  for (const std::string& bytes : hostile) {
+    FileDescriptor peer = connect();
+    ASSERT_EQ(writeAll(peer.get(), bytes), 0);
+    peer.reset();
+    for (const std::string& event : serve()) errors += event.ends_with(" error") ? 1U : 0U;
+  }
+  EXPECT_EQ(errors, std::size(hostile));
+  connect();  // one that leaves without a word
+  EXPECT_EQ(serve(), Events{"new 9"});
+  ASSERT_EQ(writeAll(good.get(), message(5)), 0);
+  EXPECT_EQ(serve(), Events{"2 5"});
+}
+
+TEST_F(EndpointTest, LetsPeersTakeTurns) {
+  const FileDescriptor first = connect(), second = connect();
+  EXPECT_EQ(serve().size(), 2U);
+  for (int n = 1; n <= 3; ++n) {
+    for (const FileDescriptor* peer : {&first, &second}) ASSERT_EQ(writeAll(peer->get(), message(n)), 0);
+  }
+  const FileDescriptor late = connect();
+  const Events turns = serve();
+  ASSERT_EQ(turns.size(), 7U);
+  for (const char* event : {"2 1", "3 1", "new 4"})
+    EXPECT_LT(std::ranges::find(turns, event) - turns.begin(), 3) << event;
+}
+
+TEST_F(EndpointTest, RestsWhenNoDescriptorIsLeftAndServesTheCrowdLater) {
+  std::vector<FileDescriptor> crowd;
+  for (int i = 0; i < 20; ++i) crowd.push_back(connect());
+  {
+    const testing::ResourceLimit none(RLIMIT_NOFILE, static_cast<rlim_t>(crowd.back().get()) + 1);
+    const std::clock_t start = std::clock();
+    EXPECT_EQ(listener.runSlice(0.4), SliceResult::TimedOut);
+    EXPECT_LT(std::clock() - start, CLOCKS_PER_SEC / 10);  // it did not spin
+  }
+  EXPECT_EQ(serve().size(), crowd.size());
+}
+
+}  // namespace
+}  // namespace tbdaily

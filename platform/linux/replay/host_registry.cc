@@ -1,0 +1,36 @@
+#include "platform/linux/replay/host_registry.h"
+
+#include <utility>
+
+#include "platform/linux/host.h"
+#include "platform/linux/replay/recorded_driver_registry.h"
+#include "platform/linux/replay/recordings.h"
+#include "platform/plist/codec.h"
+
+namespace tbdaily {
+
+namespace {
+
+// What a registry needs, made before it.
+struct RegistryNeeds {
+  explicit RegistryNeeds(Host h) : host(std::move(h)) {}
+
+  const Host host;
+  LinuxPropertyListCodec codec;
+  Recordings recordings{host, codec};
+};
+
+class HostRegistry : private RegistryNeeds, public LinuxDriverRegistry {
+ public:
+  explicit HostRegistry(Host h) : RegistryNeeds(std::move(h)), LinuxDriverRegistry(recordings) {}
+};
+
+}  // namespace
+
+std::unique_ptr<DriverRegistry> openHostRegistry(std::string_view deviceRoot) {
+  const Host fromEnvironment = Host::fromEnvironment();
+  if (deviceRoot.empty()) return std::make_unique<HostRegistry>(fromEnvironment);
+  return std::make_unique<HostRegistry>(Host(deviceRoot, fromEnvironment.live()));
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,223 @@
+#include "platform/linux/replay/recorded_driver_registry.h"
+
+#include <algorithm>
+#include <iterator>
+
+namespace tbdaily {
+
+namespace {
+
+constexpr std::string_view kProviderClass = "KdProviderClass";
+constexpr std::string_view kPropertyMatch = "KdPropertyMatch";
+constexpr std::size_t kLongestName = 128;
+
+// The kinds of user clients that a recording may give an entry.
+struct ClientKind {
+  std::string_view name;
+  std::unique_ptr<RecordedClient> (*make)(const PlistDictionary& client, Recordings& recordings);
+};
+constexpr ClientKind kClientKinds[] = {{"storage", makeStorageClient}, {"hub", makeHubClient}};
+
+PlistDictionary propertiesOf(const PlistDictionary& entry) {
+  const PlistValue properties = entry.get("properties");
+  return properties.asDictionary() != nullptr ? *properties.asDictionary() : PlistDictionary();
+}
+
+// Numbers of different widths are equal when they mean the same.
+bool meanTheSame(const PlistValue& a, const PlistValue& b) {
+  const auto left = a.asNumber(), right = b.asNumber();
+  if (!left || !right) return a == b;
+  if (!left->isReal() && !right->isReal()) return left->toInt64() == right->toInt64();
+  return left->toDouble() == right->toDouble();
+}
+
+bool matches(const PlistDictionary& entry, const PlistDictionary& matching) {
+  if (const PlistValue* wanted = matching.find(kPropertyMatch)) {
+    const PlistDictionary properties = propertiesOf(entry);
+    const PlistDictionary* values = wanted->asDictionary();
+    return values != nullptr && std::all_of(values->begin(), values->end(), [&properties](const auto& value) {
+             const PlistValue* property = properties.find(value.first);
+             return property != nullptr && meanTheSame(*property, value.second);
+           });
+  }
+  const PlistValue wanted = matching.get(kProviderClass);
+  return wanted.asString() && entry.get("class").asString() == wanted.asString();
+}
+
+}  // namespace
+
+PlistValue LinuxDriverRegistry::recordedEntries() {
+  return recordings_.entry(recording::kRegistry, "entries");
+}
+
+PlistValue LinuxDriverRegistry::KdServiceMatching(std::string_view serviceClass) {
+  if (recordedEntries().asArray() == nullptr) return {};
+  return PlistValue::dictionary(
+      {{std::string(kProviderClass), PlistValue::string(std::string(serviceClass))}});
+}
+
+KdHandle LinuxDriverRegistry::nextMatch(const PlistValue& entries, const PlistValue& matching,
+                                        std::size_t& from) {
+  const PlistArray* list = entries.asArray();
+  const PlistDictionary* wanted = matching.asDictionary();
+  if (list == nullptr || wanted == nullptr) return 0;
+  while (from < list->size()) {
+    const PlistValue& entry = (*list)[from++];
+    if (entry.asDictionary() == nullptr || !matches(*entry.asDictionary(), *wanted)) continue;
+    entries_.emplace(++lastHandle_, entry);
+    return lastHandle_;
+  }
+  return 0;
+}
+
+KdHandle LinuxDriverRegistry::KdServiceGetMatchingService(const PlistValue& matching) {
+  std::size_t from = 0;
+  return nextMatch(recordedEntries(), matching, from);
+}
+
+KdStatus LinuxDriverRegistry::KdServiceGetMatchingServices(const PlistValue& matching, KdHandle& iterator) {
+  iterator = 0;
+  PlistValue entries = recordedEntries();
+  if (entries.asArray() == nullptr) return kKdNotFound;
+  if (matching.asDictionary() == nullptr) return kKdBadArgument;
+  iterators_.emplace(++lastHandle_, Iterator{matching, std::move(entries), 0});
+  iterator = lastHandle_;
+  return kKdSuccess;
+}
+
+KdHandle LinuxDriverRegistry::KdIteratorNext(KdHandle iterator) {
+  const auto found = iterators_.find(iterator);
+  return found != iterators_.end()
+             ? nextMatch(found->second.entries, found->second.matching, found->second.next)
+             : 0;
+}
+
+bool LinuxDriverRegistry::KdIteratorIsValid(KdHandle iterator) {
+  const auto found = iterators_.find(iterator);
+  return found != iterators_.end() && found->second.entries == recordedEntries();
+}
+
+KdStatus LinuxDriverRegistry::KdObjectRelease(KdHandle object) {
+  return entries_.erase(object) + iterators_.erase(object) != 0 ? kKdSuccess : kKdBadArgument;
+}
+
+const PlistDictionary* LinuxDriverRegistry::entryOf(KdHandle handle) const {
+  const auto found = entries_.find(handle);
+  return found != entries_.end() ? found->second.asDictionary() : nullptr;
+}
+
+std::uint32_t LinuxDriverRegistry::KdObjectGetUserRetainCount(KdHandle object) {
+  const PlistDictionary* entry = entryOf(object);
+  if (entry == nullptr) return 0;
+  return static_cast<std::uint32_t>(entry->get("retainCount").asInteger().value_or(1));
+}
+
+PlistValue LinuxDriverRegistry::KdRegistryEntryCreateCFProperty(KdHandle handle, std::string_view key) {
+  const PlistDictionary* entry = entryOf(handle);
+  return entry != nullptr ? propertiesOf(*entry).get(key) : PlistValue();
+}
+
+PlistValue LinuxDriverRegistry::KdRegistryEntrySearchCFProperty(KdHandle handle, KdRegistryPlane,
+                                                                std::string_view key, KdSearchOptions) {
+  const PlistDictionary* entry = entryOf(handle);
+  const PlistValue all = recordedEntries();
+  const std::size_t longestWay = all.asArray() != nullptr ? all.asArray()->size() : 0;
+  for (std::size_t steps = 0; entry != nullptr; ++steps) {
+    if (PlistValue value = propertiesOf(*entry).get(key); !value.isNone()) return value;
+    const auto parent = entry->get("parent").asInteger();
+    if (!parent || steps >= longestWay) break;  // parents in a circle end too
+    const auto found =
+        std::find_if(all.asArray()->begin(), all.asArray()->end(), [&parent](const PlistValue& candidate) {
+          return candidate.asDictionary() != nullptr &&
+                 candidate.asDictionary()->get("id").asInteger() == parent;
+        });
+    entry = found != all.asArray()->end() ? found->asDictionary() : nullptr;
+  }
+  return {};
+}
+
+KdStatus LinuxDriverRegistry::KdRegistryEntryGetRegistryEntryID(KdHandle handle, std::uint64_t& identifier) {
+  const PlistDictionary* entry = entryOf(handle);
+  if (entry == nullptr) return kKdBadArgument;
+  const auto recorded = entry->get("id").asInteger();
+  if (!recorded) return kKdNotFound;
+  identifier = static_cast<std::uint64_t>(*recorded);
+  return kKdSuccess;
+}
+
+KdStatus LinuxDriverRegistry::KdRegistryEntryGetName(KdHandle handle, std::string& name) {
+  const PlistDictionary* entry = entryOf(handle);
+  if (entry == nullptr) return kKdBadArgument;
+  const PlistValue recorded = entry->get("name");
+  if (!recorded.asString()) return kKdNotFound;
+  name = recorded.asString()->substr(0, kLongestName);
+  return kKdSuccess;
+}
+
+KdStatus LinuxDriverRegistry::KdServiceOpen(KdHandle service, std::uint32_t, KdHandle& connection) {
+  connection = 0;
+  const PlistDictionary* entry = entryOf(service);
+  if (entry == nullptr) return kKdBadArgument;
+  const PlistValue recorded = entry->get("client");
+  const PlistDictionary* client = recorded.asDictionary();
+  if (client == nullptr) return kKdNotFound;
+  const PlistValue kindName = client->get("kind");
+  const auto kind = std::find_if(std::begin(kClientKinds), std::end(kClientKinds),
+                                 [&](const ClientKind& k) { return kindName.asString() == k.name; });
+  if (kind == std::end(kClientKinds)) return kKdNotFound;
+  if (const KdStatus status = recordedStatus(*client, "openStatus"); status != kKdSuccess) return status;
+  connections_.emplace(++lastHandle_,
+                       Connection{kind->make(*client, recordings_), recordedStatus(*client, "closeStatus")});
+  connection = lastHandle_;
+  return kKdSuccess;
+}
+
+KdStatus LinuxDriverRegistry::KdServiceClose(KdHandle connection) {
+  const auto found = connections_.find(connection);
+  if (found == connections_.end()) return kKdBadArgument;
+  const KdStatus status = found->second.closeStatus;
+  connections_.erase(found);
+  return status;
+}
+
+RecordedClient* LinuxDriverRegistry::clientOf(KdHandle connection) {
+  const auto found = connections_.find(connection);
+  return found != connections_.end() ? found->second.client.get() : nullptr;
+}
+
+KdStatus LinuxDriverRegistry::KdConnectCallStructMethod(KdHandle connection, std::uint32_t method,
+                                                        std::span<const std::byte> input,
+                                                        std::span<std::byte> output,
+                                                        std::size_t& outputSize) {
+  RecordedClient* client = clientOf(connection);
+  return client != nullptr ? client->callStruct(method, input, output, outputSize) : kKdBadArgument;
+}
+
+KdStatus LinuxDriverRegistry::KdConnectCallScalarMethod(KdHandle connection, std::uint32_t method,
+                                                        std::span<const std::uint64_t> inputs,
+                                                        std::span<std::uint64_t> outputs,
+                                                        std::size_t& outputCount) {
+  RecordedClient* client = clientOf(connection);
+  return client != nullptr ? client->callScalar(method, inputs, outputs, outputCount) : kKdBadArgument;
+}
+
+KdStatus LinuxDriverRegistry::KdConnectCallMethod(KdHandle connection, std::uint32_t method,
+                                                  const KdMethodInput& input, KdMethodOutput& output) {
+  RecordedClient* client = clientOf(connection);
+  return client != nullptr ? client->call(method, input, output) : kKdBadArgument;
+}
+
+KdStatus LinuxDriverRegistry::KdConnectMapMemory(KdHandle connection, std::uint32_t memoryType,
+                                                 std::span<std::byte>& memory) {
+  memory = {};
+  RecordedClient* client = clientOf(connection);
+  return client != nullptr ? client->mapMemory(memoryType, memory) : kKdBadArgument;
+}
+
+KdStatus LinuxDriverRegistry::KdConnectUnmapMemory(KdHandle connection, std::uint32_t memoryType,
+                                                   std::span<std::byte> memory) {
+  RecordedClient* client = clientOf(connection);
+  return client != nullptr ? client->unmapMemory(memoryType, memory) : kKdBadArgument;
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,18 @@
+// Stack snapshots from a recording, snapshot.kcdata; without one capture fails.
+#pragma once
+
+#include "platform/linux/replay/recordings.h"
+#include "platform/stack_snapshot.h"
+
+namespace tbdaily {
+
+class LinuxStackSnapshot : public StackSnapshot {
+ public:
+  explicit LinuxStackSnapshot(Recordings& recordings) : recordings_(recordings) {}
+  std::unique_ptr<StackSnapshotConfiguration> createConfiguration() override;
+
+ private:
+  Recordings& recordings_;
+};
+
+}  // namespace tbdaily

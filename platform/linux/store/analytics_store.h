@@ -1,0 +1,106 @@
+// The analytics store as its writers see it: scalars and distribution values by key and day.
+//
+// Opens its file at first use and makes it at the first write. Each operation is one transaction and, between
+// programs, atomic; between beginLoad and commitLoad all operations are one. A failed operation changes
+// nothing. A store that another program keeps locked is waited for, 5 seconds by default. Operations may come
+// from several threads; a load is one thread's.
+#pragma once
+
+#include <array>
+#include <chrono>
+#include <cstddef>
+#include <cstdint>
+#include <filesystem>
+#include <map>
+#include <mutex>
+#include <span>
+#include <string>
+#include <string_view>
+
+#include "platform/analytics_client.h"
+#include "platform/linux/store/store_file.h"
+
+namespace tbdaily {
+
+// How many rows a pruning removed.
+struct PrunedRows {
+  std::int64_t scalars = 0;
+  std::int64_t distributionValues = 0;
+  std::int64_t keys = 0;  // those that were left without rows
+};
+
+class AnalyticsStore {
+ public:
+  explicit AnalyticsStore(std::filesystem::path file,
+                          std::chrono::milliseconds busyTimeout = kStoreBusyTimeout);
+
+  const std::filesystem::path& file() const { return file_; }
+
+  StoreResult setScalar(std::string_view key, DayNumber day, std::int64_t value);
+  // An absent value counts as 0; wraps at 64 bits.
+  StoreResult addScalar(std::string_view key, DayNumber day, std::int64_t increment);
+  // Puts the values behind those that the key and day have. Not a number is kept as such.
+  StoreResult appendDistributionValues(std::string_view key, DayNumber day, std::int32_t secondsInDay,
+                                       std::span<const double> values);
+
+  StoreResult beginLoad();
+  StoreResult commitLoad();
+  // Forgets what was loaded: what is left to do after a failure within a load. Does nothing without one.
+  void rollbackLoad();
+
+  // Removes the rows of the days before this one. A store that is missing stays so.
+  StoreResult prune(DayNumber beforeDay, PrunedRows& pruned);
+  // Makes everything that was written so far durable and truncates the write-ahead log.
+  StoreResult checkpoint();
+
+ private:
+  enum Query : std::size_t {
+    FindKey,
+    InsertKey,
+    FindScalar,
+    SetScalar,
+    FindLastSequence,
+    InsertValue,
+    PruneScalars,
+    PruneValues,
+    PruneKeys,
+    QueryCount
+  };
+  static const std::array<std::string_view, QueryCount> kQueries;
+
+  // What a load knows of a key, so that most lines need no look-up.
+  struct LoadedKey {
+    std::int64_t id = 0;
+    bool hasSequence = false;
+    DayNumber day = 0;  // of the sequence
+    std::int64_t nextSequence = 0;
+  };
+
+  StoreResult open(MissingStore missing);
+  template <typename Write>  // int(LoadedKey&): a result code of SQLite
+  StoreResult writeRow(std::string_view key, const Write& write);
+  template <typename Body>  // int(): the same
+  StoreResult transaction(const Body& body);
+  void endLoad();
+  StoreResult commit();
+  void rollback();
+  StoreResult failure(int code);
+  StoreResult brokenOff() const;
+  void close();
+  SqliteStatement& statement(Query query);
+
+  int findOrInsertKey(std::string_view key, std::int64_t& id);
+  int loadedKey(std::string_view key, LoadedKey*& entry);
+  int putScalar(std::int64_t keyId, DayNumber day, std::int64_t value);
+  int putValues(LoadedKey& key, DayNumber day, std::int32_t secondsInDay, std::span<const double> values);
+
+  const std::filesystem::path file_;
+  const std::chrono::milliseconds busyTimeout_;
+  std::mutex mutex_;
+  SqliteDatabase database_;
+  std::array<SqliteStatement, QueryCount> statements_;  // prepared at first use; gone before the database
+  bool loading_ = false;
+  std::map<std::string, LoadedKey, std::less<>> loadedKeys_;  // of the load that is under way
+};
+
+}  // namespace tbdaily

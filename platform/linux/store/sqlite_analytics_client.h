@@ -1,0 +1,42 @@
+// The analytics client over the store's file and the kernel's clock.
+//
+// A write that fails is lost and named on standard error. Operations may come from several threads.
+#pragma once
+
+#include <chrono>
+#include <mutex>
+#include <optional>
+
+#include "platform/analytics_client.h"
+#include "platform/kernel.h"
+#include "platform/linux/store/analytics_store.h"
+#include "platform/linux/store/store_locator.h"
+
+namespace tbdaily {
+
+class LinuxAnalyticsClient : public AnalyticsClient {
+ public:
+  LinuxAnalyticsClient(AnalyticsStoreLocator locate, Kernel& kernel,
+                       std::chrono::milliseconds busyTimeout = kStoreBusyTimeout);
+
+  DayNumber currentDayNumber() override;
+  DayNumber dayNumberOfDate(PlistDate date) override;
+  PlistDate dateOfDayNumber(DayNumber day) override;
+  void checkpoint() override;
+  void setValueForScalarKey(std::string_view key, std::int64_t value) override;
+  void addValueForScalarKey(std::string_view key, std::int64_t increment) override;
+  // In one transaction; an increment that is refused does not keep the others from being written.
+  void addValuesForScalarKeys(std::span<const ScalarIncrement> increments) override;
+
+ private:
+  // Null while the store has no place.
+  AnalyticsStore* store();
+
+  AnalyticsStoreLocator locate_;
+  Kernel& kernel_;
+  std::chrono::milliseconds busyTimeout_;
+  std::mutex mutex_;  // over finding the store
+  std::optional<AnalyticsStore> store_;
+};
+
+}  // namespace tbdaily

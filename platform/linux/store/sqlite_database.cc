@@ -1,0 +1,181 @@
+#include "platform/linux/store/sqlite_database.h"
+
+#include <sqlite3.h>
+
+#include "platform/linux/host.h"
+
+namespace tbdaily {
+
+namespace {
+
+constexpr int kPrimaryCode = 0xff;
+// Longer texts and blobs end in SQLITE_TOOBIG instead of being read into memory.
+constexpr int kLongestValue = 1 << 20;
+
+std::string fileUri(const std::filesystem::path& file, SqliteMode mode) {
+  constexpr std::string_view kHexDigits = "0123456789ABCDEF";
+  constexpr std::string_view kPlain = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-._~/";
+  std::string uri = "file:";
+  for (const char c : file.native()) {
+    if (kPlain.find(c) != std::string_view::npos) {
+      uri += c;
+      continue;
+    }
+    const auto byte = static_cast<unsigned char>(c);
+    uri.append(1, '%').append(1, kHexDigits[byte >> 4U]).append(1, kHexDigits[byte & 0xFU]);
+  }
+  if (mode == SqliteMode::Immutable) uri += "?immutable=1";
+  return uri;
+}
+
+}  // namespace
+
+void SqliteStatement::Finalizer::operator()(sqlite3_stmt* statement) const {
+  sqlite3_finalize(statement);
+}
+
+void SqliteStatement::bind(int parameter, std::int64_t value) {
+  sqlite3_bind_int64(statement_.get(), parameter, value);
+}
+
+void SqliteStatement::bind(int parameter, double value) {
+  sqlite3_bind_double(statement_.get(), parameter, value);
+}
+
+void SqliteStatement::bind(int parameter, std::string_view text) {
+  // A null pointer would be bound as NULL, and a null destructor says that the text is borrowed.
+  const char* bytes = text.data() != nullptr ? text.data() : "";
+  sqlite3_bind_text64(statement_.get(), parameter, bytes, text.size(), nullptr, SQLITE_UTF8);
+}
+
+void SqliteStatement::bindAboveEveryText(int parameter) {
+  sqlite3_bind_zeroblob(statement_.get(), parameter, 0);
+}
+
+int SqliteStatement::step() {
+  return statement_ ? sqlite3_step(statement_.get()) & kPrimaryCode : SQLITE_MISUSE;
+}
+
+void SqliteStatement::reset() {
+  sqlite3_reset(statement_.get());
+  if (statement_) sqlite3_clear_bindings(statement_.get());
+}
+
+bool SqliteStatement::isInteger(int column) const {
+  return sqlite3_column_type(statement_.get(), column) == SQLITE_INTEGER;
+}
+
+bool SqliteStatement::isNumber(int column) const {
+  const int type = sqlite3_column_type(statement_.get(), column);
+  return type == SQLITE_INTEGER || type == SQLITE_FLOAT;
+}
+
+std::int64_t SqliteStatement::integer(int column) const {
+  return sqlite3_column_int64(statement_.get(), column);
+}
+
+double SqliteStatement::real(int column) const {
+  return sqlite3_column_double(statement_.get(), column);
+}
+
+std::string_view SqliteStatement::text(int column) const {
+  // A blob of the same bytes: no conversion, and no terminator that may need a copy.
+  const void* bytes = sqlite3_column_blob(statement_.get(), column);
+  const int length = sqlite3_column_bytes(statement_.get(), column);
+  if (bytes == nullptr || length <= 0) return {};
+  return {static_cast<const char*>(bytes), static_cast<std::size_t>(length)};
+}
+
+void SqliteDatabase::Closer::operator()(sqlite3* connection) const {
+  sqlite3_close_v2(connection);
+}
+
+int SqliteDatabase::open(const std::filesystem::path& file, SqliteMode mode,
+                         std::chrono::milliseconds busyTimeout) {
+  const int flags = (mode == SqliteMode::ReadWrite ? SQLITE_OPEN_READWRITE : SQLITE_OPEN_READONLY) |
+                    SQLITE_OPEN_URI | SQLITE_OPEN_NOMUTEX;
+  sqlite3* connection = nullptr;
+  const int code = sqlite3_open_v2(fileUri(file, mode).c_str(), &connection, flags, nullptr);
+  connection_.reset(connection);
+  if (code != SQLITE_OK) return code & kPrimaryCode;
+  sqlite3_busy_timeout(connection, static_cast<int>(busyTimeout.count()));
+  sqlite3_limit(connection, SQLITE_LIMIT_LENGTH, kLongestValue);
+  sqlite3_db_config(connection, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
+  sqlite3_db_config(connection, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
+  sqlite3_db_config(connection, SQLITE_DBCONFIG_ENABLE_TRIGGER, 0, nullptr);
+  sqlite3_db_config(connection, SQLITE_DBCONFIG_ENABLE_VIEW, 0, nullptr);
+  return execute("PRAGMA cell_size_check = ON");
+}
+
+void SqliteDatabase::keepLogOnClose() {
+  sqlite3_db_config(connection_.get(), SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
+}
+
+bool SqliteDatabase::isOutsideTransaction() const {
+  return sqlite3_get_autocommit(connection_.get()) != 0;
+}
+
+bool SqliteDatabase::hasMoved() const {
+  int moved = 0;
+  sqlite3_file_control(connection_.get(), "main", SQLITE_FCNTL_HAS_MOVED, &moved);
+  return moved != 0;
+}
+
+std::int64_t SqliteDatabase::changedRows() const {
+  return sqlite3_changes64(connection_.get());
+}
+
+int SqliteDatabase::execute(const char* sql) {
+  return sqlite3_exec(connection_.get(), sql, nullptr, nullptr, nullptr) & kPrimaryCode;
+}
+
+SqliteStatement SqliteDatabase::prepare(std::string_view sql) {
+  sqlite3_stmt* statement = nullptr;
+  sqlite3_prepare_v3(connection_.get(), sql.data(), static_cast<int>(sql.size()), SQLITE_PREPARE_PERSISTENT,
+                     &statement, nullptr);
+  return SqliteStatement(statement);
+}
+
+int SqliteDatabase::queryInteger(std::string_view sql, std::int64_t& value) {
+  SqliteStatement statement = prepare(sql);
+  if (!statement) return errorCode();
+  const int code = statement.step();
+  if (code == SQLITE_ROW) value = statement.integer(0);
+  return code == SQLITE_ROW || code == SQLITE_DONE ? SQLITE_OK : code;
+}
+
+int SqliteDatabase::queryText(std::string_view sql, std::string& value) {
+  SqliteStatement statement = prepare(sql);
+  if (!statement) return errorCode();
+  const int code = statement.step();
+  if (code == SQLITE_ROW) value = statement.text(0);
+  return code == SQLITE_ROW || code == SQLITE_DONE ? SQLITE_OK : code;
+}
+
+int SqliteDatabase::truncateLog(bool& complete) {
+  const int code =
+      sqlite3_wal_checkpoint_v2(connection_.get(), "main", SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr) &
+      kPrimaryCode;
+  complete = code == SQLITE_OK;
+  return code == SQLITE_BUSY ? SQLITE_OK : code;
+}
+
+std::filesystem::path SqliteDatabase::logFile() const {
+  return sqlite3_filename_wal(sqlite3_db_filename(connection_.get(), "main"));
+}
+
+int SqliteDatabase::errorCode() const {
+  return sqlite3_errcode(connection_.get()) & kPrimaryCode;
+}
+
+std::string SqliteDatabase::errorMessage() const {
+  std::string message = sqlite3_errmsg(connection_.get());
+  const int code = errorCode();
+  const int systemError = sqlite3_system_errno(connection_.get());
+  if ((code == SQLITE_CANTOPEN || code == SQLITE_IOERR) && systemError != 0) {
+    message.append(" (").append(errorText(systemError)).append(")");
+  }
+  return message;
+}
+
+}  // namespace tbdaily

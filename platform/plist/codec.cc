@@ -1,0 +1,31 @@
+#include "platform/plist/codec.h"
+
+#include <exception>
+
+#include "platform/plist/binary_reader.h"
+#include "platform/plist/xml_reader.h"
+#include "platform/plist/xml_writer.h"
+
+namespace tbdaily {
+
+namespace {
+constexpr const char* kOutOfMemory = "out of memory";
+}
+
+PlistParseResult LinuxPropertyListCodec::parse(std::span<const std::byte> bytes) {
+  try {
+    return isBinaryPlist(bytes) ? parseBinaryPlist(bytes) : parseXmlPlist(bytes);
+  } catch (const std::exception&) {
+    return {{}, kOutOfMemory};
+  }
+}
+
+PlistWriteResult LinuxPropertyListCodec::write(const PlistValue& value, PlistForm form) {
+  try {
+    return writeXmlPlist(value, form);
+  } catch (const std::exception&) {
+    return {false, {}, kOutOfMemory};
+  }
+}
+
+}  // namespace tbdaily

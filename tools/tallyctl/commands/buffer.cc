@@ -1,0 +1,206 @@
+// tallyctl buffer, stats and snapshots: the controller's raw buffers, and what they say.
+
+#include <CLI/CLI.hpp>
+#include <array>
+
+#include "platform/linux/file_io.h"
+#include "platform/plist/json.h"
+#include "storage/snapshot_renderer.h"
+#include "storage/stats_context.h"
+#include "tools/tallyctl/controller_buffer.h"
+#include "tools/tallyctl/input_file.h"
+#include "tools/tallyctl/tool.h"
+
+namespace tbdaily {
+
+namespace {
+
+// From the file when one is named, else from the controller; says why not, and answers nothing then.
+std::optional<std::vector<std::byte>> bufferOf(Tool& tool, const std::string& file, std::string_view kind) {
+  if (!file.empty()) {
+    InputFile input = readInput(file);
+    if (input.error.empty()) return std::move(input.bytes);
+    tool.fail(input.error);
+    return std::nullopt;
+  }
+  ControllerBuffer buffer = fetchControllerBuffer(tool.platform().services().driverRegistry, kind);
+  if (buffer.error.empty()) return std::move(buffer.bytes);
+  tool.fail(buffer.error);
+  return std::nullopt;
+}
+
+void saveBuffer(Tool& tool, const std::string& kind, std::uint16_t list, const std::string& file) {
+  if (!tool.hasUsableRoot()) return;
+  const ControllerBuffer buffer =
+      fetchControllerBuffer(tool.platform().services().driverRegistry, kind, list);
+  if (!buffer.error.empty()) return tool.fail(kind + ": " + buffer.error);
+  const std::filesystem::path place = std::filesystem::absolute(file);
+  const int error =
+      replaceFile(place, {reinterpret_cast<const char*>(buffer.bytes.data()), buffer.bytes.size()});
+  if (error != 0) return tool.fail(file + ": " + errorText(error));
+  if (tool.printedAsJson(PlistValue::dictionary(
+          {{"file", PlistValue::string(file)},
+           {"bytes", PlistValue::int64(static_cast<std::int64_t>(buffer.bytes.size()))}}))) {
+    return;
+  }
+  tool.out().line("wrote " + std::to_string(buffer.bytes.size()) + " bytes to " + file);
+}
+
+struct ContextField {
+  std::string_view name;
+  std::uint64_t (*value)(const StatsContext&);
+};
+
+constexpr std::array<ContextField, 18> kContextFields = {{
+    {"exportVersion", [](const StatsContext& c) { return std::uint64_t{c.exportVersion}; }},
+    {"driverVersion", [](const StatsContext& c) { return std::uint64_t{c.driverVersion}; }},
+    {"numVirtualBlocks", [](const StatsContext& c) { return std::uint64_t{c.numVirtualBlocks}; }},
+    {"blocksPerVirtualBlock", [](const StatsContext& c) { return std::uint64_t{c.blocksPerVirtualBlock}; }},
+    {"pagesPerVirtualBlock", [](const StatsContext& c) { return std::uint64_t{c.pagesPerVirtualBlock}; }},
+    {"bytesPerPage", [](const StatsContext& c) { return std::uint64_t{c.bytesPerPage}; }},
+    {"hostReads", [](const StatsContext& c) { return c.hostReads; }},
+    {"hostWrites", [](const StatsContext& c) { return c.hostWrites; }},
+    {"numFreeVirtualBlocks", [](const StatsContext& c) { return c.numFreeVirtualBlocks; }},
+    {"wearLevMoves", [](const StatsContext& c) { return c.wearLevMoves; }},
+    {"nandReads", [](const StatsContext& c) { return c.nandReads; }},
+    {"nandWrites", [](const StatsContext& c) { return c.nandWrites; }},
+    {"bandErases", [](const StatsContext& c) { return c.bandErases; }},
+    {"IND_pool_free", [](const StatsContext& c) { return c.IND_pool_free; }},
+    {"IND_pool_count", [](const StatsContext& c) { return c.IND_pool_count; }},
+    {"utilFormatTime", [](const StatsContext& c) { return c.utilFormatTime; }},
+    {"numSleepOps", [](const StatsContext& c) { return c.numSleepOps; }},
+    {"maxHighEnduranceBlockErases", [](const StatsContext& c) { return c.maxHighEnduranceBlockErases; }},
+}};
+
+// By hand: the values are unsigned 64-bit, which a structured value cannot hold in full.
+std::string statsJson(const StatsContext& context, bool complete) {
+  std::string json(complete ? "{\"complete\": true, \"fields\": {" : "{\"complete\": false, \"fields\": {");
+  for (const ContextField& field : kContextFields) {
+    json.append("\"")
+        .append(field.name)
+        .append("\": ")
+        .append(std::to_string(field.value(context)))
+        .append(", ");
+  }
+  json += "\"readCountHisto\": [";
+  for (std::size_t i = 0; i < context.readCountHisto.size(); ++i) {
+    json.append(i == 0 ? "" : ", ").append(std::to_string(context.readCountHisto[i]));
+  }
+  json += "]}, \"stats\": [";
+  for (std::size_t i = 0; i < context.nodes.size(); ++i) {
+    const StatNode& node = context.nodes[i];
+    json.append(i == 0 ? "\n" : ",\n")
+        .append("  [")
+        .append(jsonText(PlistValue::string(node.name())))
+        .append(", ");
+    json.append(node.text()).append("]");
+  }
+  return json += "]}";
+}
+
+void showStats(Tool& tool, const std::string& file) {
+  const auto bytes = bufferOf(tool, file, "stats");
+  if (!bytes) return;
+  StatsContext context;
+  const bool complete = STXParseBufferToCxt(context, *bytes);
+  Terminal& out = tool.out();
+  if (tool.options.json) return out.line(statsJson(context, complete));
+  if (!complete)
+    out.line(out.styled("The buffer is damaged; this is what was read before the damage.", Style::Bad));
+  out.line(out.styled("Fields", Style::Heading));
+  Table fields({Table::Align::Left, Table::Align::Right});
+  for (const ContextField& field : kContextFields)
+    fields.add({std::string(field.name), std::to_string(field.value(context))});
+  fields.print(out);
+  out.line(out.styled("Statistics (" + std::to_string(context.nodes.size()) + ")", Style::Heading));
+  Table stats({Table::Align::Left, Table::Align::Right});
+  for (const StatNode& node : context.nodes) stats.add({node.name(), node.text()});
+  stats.print(out);
+}
+
+constexpr std::size_t kRenderedAtOnce = std::size_t{64} << 10;
+constexpr std::size_t kTextPerByte = 8;  // a record of the fixed layout takes less, whatever its values
+
+// Nothing but the rendered text goes to standard output.
+void renderFixed(Tool& tool, const std::vector<std::byte>& records) {
+  std::vector<char> text(kRenderedAtOnce + records.size() * kTextPerByte);
+  std::size_t size = text.size();
+  if (!STXParseSnapshotBuffer(records, text.data(), size))
+    return tool.fail("the snapshots do not fit the renderer's buffer");
+  tool.out().print({text.data(), size});
+}
+
+void renderDescribed(Tool& tool, const std::vector<std::byte>& records,
+                     const std::vector<std::byte>& header) {
+  std::vector<char> text(kRenderedAtOnce);
+  std::uint32_t cursor = 0;
+  while (true) {
+    const std::uint32_t before = cursor;
+    std::size_t size = text.size();
+    const bool finished = STXParseSnapshotBufferWithInplaceParser(records, text.data(), size, header, cursor);
+    tool.out().print({text.data(), size > 0 ? size - 1 : 0});
+    if (finished) return;
+    if (cursor == before) return tool.fail("the snapshot header cannot be used");
+    // The record that did not fit was passed: it comes first in the next piece.
+    --cursor;
+    if (size <= 1) text.resize(text.size() * 2);
+    if (text.size() > kRenderedAtOnce * 1024) return tool.fail("a snapshot is too long to be rendered");
+  }
+}
+
+struct SnapshotArguments {
+  std::string records, header;
+  bool fixed = false;
+};
+
+void showSnapshots(Tool& tool, const SnapshotArguments& arguments) {
+  const auto records = bufferOf(tool, arguments.records, "snapshot");
+  if (!records) return;
+  if (arguments.fixed) return renderFixed(tool, *records);
+  if (!arguments.header.empty()) {
+    const auto header = bufferOf(tool, arguments.header, "snapshot-header");
+    if (header) renderDescribed(tool, *records, *header);
+    return;
+  }
+  // Records of a file go with the header that is named; those of the controller with its own, where it has
+  // one.
+  const ControllerBuffer own =
+      arguments.records.empty()
+          ? fetchControllerBuffer(tool.platform().services().driverRegistry, "snapshot-header")
+          : ControllerBuffer{};
+  own.bytes.empty() ? renderFixed(tool, *records) : renderDescribed(tool, *records, own.bytes);
+}
+
+}  // namespace
+
+void addBufferCommands(CLI::App& app, Tool& tool) {
+  auto kind = std::make_shared<std::string>();
+  auto list = std::make_shared<std::uint16_t>(std::uint16_t{0});
+  auto output = std::make_shared<std::string>();
+  std::vector<std::string> kinds;
+  for (const BufferKind& known : kBufferKinds) kinds.emplace_back(known.name);
+  CLI::App* buffer = app.add_subcommand("buffer", "Fetch a raw buffer of the storage controller");
+  buffer->add_option("KIND", *kind, "What to fetch")->required()->check(CLI::IsMember(kinds));
+  buffer->add_option("--list", *list, "Sub-list, for telemetry 0 to 2")
+      ->type_name("N")
+      ->check(CLI::Range(0, 255));
+  buffer->add_option("-o,--output", *output, "Where to write it")->required()->type_name("FILE");
+  buffer->callback([&tool, kind, list, output] { saveBuffer(tool, *kind, *list, *output); });
+
+  auto statsFile = std::make_shared<std::string>();
+  CLI::App* stats =
+      app.add_subcommand("stats", "Decode a statistics buffer: the controller's, or that of a file");
+  stats->add_option("FILE", *statsFile, "A statistics buffer; - is standard input");
+  stats->callback([&tool, statsFile] { showStats(tool, *statsFile); });
+
+  auto arguments = std::make_shared<SnapshotArguments>();
+  CLI::App* snapshots =
+      app.add_subcommand("snapshots", "Render snapshots as text, from the controller or from files");
+  snapshots->add_option("--records", arguments->records, "Snapshot records in place of the controller's")
+      ->type_name("FILE");
+  snapshots->add_option("--header", arguments->header, "The header that describes them")->type_name("FILE");
+  snapshots->add_flag("--fixed", arguments->fixed, "The fixed layout, whatever a header says");
+  snapshots->callback([&tool, arguments] { showSnapshots(tool, *arguments); });
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,160 @@
+// tallyctl tasking: what is scheduled and applied; schedules and clears.
+
+#include "driver/tasking.h"
+
+#include <CLI/CLI.hpp>
+
+#include "platform/device_answers.h"
+#include "platform/linux/file_io.h"
+#include "platform/log_submission.h"
+#include "platform/preferences_store.h"
+#include "platform/system_log.h"
+#include "tools/tallyctl/input_file.h"
+#include "tools/tallyctl/tasking_check.h"
+#include "tools/tallyctl/tool.h"
+
+namespace tbdaily {
+
+namespace {
+
+constexpr std::string_view kScheduled = "ScheduledTasking";
+
+PlistValue orNull(const PlistValue& value) {
+  return value.isNone() ? jsonNull() : value;
+}
+
+// Everything that the tasking step of a run looks at.
+struct TaskingState {
+  explicit TaskingState(Platform& platform) {
+    PreferencesStore& preferences = platform.preferences;
+    const auto job = [&preferences](std::string_view key) {
+      return preferences.getValue(key, preference_domain::kJob);
+    };
+    scheduled = preferences.getValue(kScheduled, preference_domain::kLogSubmission);
+    id = job("TaskingID");
+    os = job("TaskingOS");
+    digest = job("TaskingDigest");
+    payload = job("TaskingPayload");
+    update = lastOSUpdate(preferences);
+    days = aggressiveDays(platform.logSubmission.taskingValue(kAggressiveDaysKey));
+    const std::int32_t elapsed = daysBetween(platform.analyticsClient.currentDayNumber(), update.day());
+    // Without a scheduled tasking a run does not get as far as the submission.
+    if (isScheduled() && elapsed >= 0 && elapsed < days) daysLeft = days - elapsed;
+  }
+
+  bool isScheduled() const {
+    return scheduled.asDictionary() != nullptr &&
+           scheduled.asDictionary()->get("TaskingID").asString().has_value();
+  }
+
+  PlistValue scheduled, id, os, digest, payload;
+  OSUpdate update;
+  std::int32_t days = 0;
+  std::int32_t daysLeft = 0;
+};
+
+PlistValue asJson(const TaskingState& state) {
+  const PlistValue applied = state.id.isNone() ? jsonNull()
+                                               : PlistValue::dictionary({{"id", state.id},
+                                                                         {"os", orNull(state.os)},
+                                                                         {"digest", orNull(state.digest)},
+                                                                         {"payload", orNull(state.payload)}});
+  return PlistValue::dictionary(
+      {{"scheduled", state.scheduled.asDictionary() != nullptr ? state.scheduled : jsonNull()},
+       {"applied", applied},
+       {"lastOSUpdate", state.update.record.asDictionary() != nullptr ? state.update.record : jsonNull()},
+       {"aggressiveDays", PlistValue::int64(state.days)},
+       {"aggressiveDaysLeft", PlistValue::int64(state.daysLeft)}});
+}
+
+std::string shown(const PlistValue& value) {
+  if (const auto boolean = value.asBoolean()) return *boolean ? "true" : "false";
+  return value.isNone() ? "none" : printable(plistText(value));
+}
+
+void printItems(Terminal& out, const PlistValue& payload) {
+  if (payload.asArray() == nullptr) return out.line("  nothing: it has no payload");
+  const std::vector<TaskingItem> items = taskingItems(*payload.asArray());
+  Table table({Table::Align::Left, Table::Align::Left, Table::Align::Left});
+  for (const TaskingItem& item : items)
+    table.add({printable(item.domain), printable(item.key), shown(item.value)});
+  table.print(out);
+  const std::size_t malformed = payload.asArray()->size() - items.size();
+  if (malformed != 0) out.line("  " + std::to_string(malformed) + " malformed items, which are skipped");
+}
+
+void print(Terminal& out, const TaskingState& state) {
+  const auto entry = [&state](std::string_view key) { return state.scheduled.asDictionary()->get(key); };
+  if (state.scheduled.asDictionary() == nullptr) {
+    out.line("No tasking is scheduled.");
+  } else if (!state.isScheduled()) {
+    out.line("The scheduled tasking has no TaskingID and is ignored.");
+  } else {
+    out.line(out.styled("Scheduled: " + shown(entry("TaskingID")), Style::Heading) + ", digest " +
+             shown(entry("TaskingDigest")) + ". It sets:");
+    printItems(out, entry("TaskingPayload"));
+  }
+  if (state.id.isNone()) {
+    out.line("No tasking is applied.");
+  } else {
+    out.line(out.styled("Applied: " + shown(state.id), Style::Heading) + ", since OS build " +
+             shown(state.os) + ", digest " + shown(state.digest) + ". It set:");
+    printItems(out, state.payload);
+  }
+  const PlistValue version = state.update.version();
+  out.line(version.isNone() ? "No OS update was seen yet."
+                            : "The last OS update was to " + shown(version) + ", on day " +
+                                  std::to_string(state.update.day()) + ".");
+  out.line(state.days <= 0
+               ? "Logs are not submitted early after an update."
+               : "Logs are submitted at once on " + std::to_string(state.days) + " days from an update on; " +
+                     std::to_string(state.daysLeft) + " of them are left.");
+}
+
+void show(Tool& tool) {
+  const TaskingState state(tool.platform().services());
+  if (!tool.printedAsJson(asJson(state))) print(tool.out(), state);
+}
+
+void storeScheduled(Tool& tool, const PlistValue& tasking) {
+  PreferencesStore& preferences = tool.platform().services().preferences;
+  preferences.setValue(kScheduled, tasking, preference_domain::kLogSubmission);
+  preferences.synchronize(preference_domain::kLogSubmission);
+  if (!(preferences.getValue(kScheduled, preference_domain::kLogSubmission) == tasking)) {
+    return tool.fail("the tasking could not be written");
+  }
+  if (tool.printedAsJson(PlistValue::dictionary({{"scheduled", orNull(tasking)}}))) return;
+  tool.out().line(tasking.isNone() ? "no tasking is scheduled any more; what is applied stays"
+                                   : "scheduled; the next run applies it");
+}
+
+void schedule(Tool& tool, const std::string& path) {
+  if (!tool.hasUsableRoot()) return;
+  const PlistParseResult parsed = readPlistOrJsonFile(tool.platform().services().propertyListCodec, path);
+  if (!parsed.error.empty()) return tool.fail(parsed.error);
+  const std::string fault = taskingFault(parsed.value);
+  if (!fault.empty()) return tool.fail(path + ": " + fault);
+  storeScheduled(tool, parsed.value);
+}
+
+}  // namespace
+
+void addTaskingCommand(CLI::App& app, Tool& tool) {
+  CLI::App* command = app.add_subcommand("tasking", "Look at the remote tasking, schedule one, or clear it");
+  command->require_subcommand(1);
+  command->add_subcommand("show", "Show what is scheduled and applied, and the days after an update")
+      ->callback([&tool] { show(tool); });
+  auto file = std::make_shared<std::string>();
+  CLI::App* scheduling =
+      command->add_subcommand("schedule", "Check a tasking and put it in place for the next run");
+  scheduling
+      ->add_option("FILE", *file,
+                   "Property list or JSON: {TaskingID, TaskingDigest, TaskingPayload}; - is standard input")
+      ->required();
+  scheduling->callback([&tool, file] { schedule(tool, *file); });
+  command->add_subcommand("clear", "Remove the scheduled tasking; what is applied stays")->callback([&tool] {
+    if (tool.hasUsableRoot()) storeScheduled(tool, PlistValue());
+  });
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,39 @@
+#include "tools/tallyctl/metrics/advance.h"
+
+#include "platform/linux/file_io.h"
+#include "platform/linux/replay/recordings.h"
+#include "platform/property_list_codec.h"
+#include "tools/tallyctl/metrics/hub_advance.h"
+#include "tools/tallyctl/tool.h"
+
+namespace tbdaily {
+
+void advanceMetrics(Tool& tool, std::uint64_t seconds) {
+  PropertyListCodec& codec = tool.platform().services().propertyListCodec;
+  Recordings recordings(tool.platform().host(), codec);
+  const std::filesystem::path place = recordings.path(recording::kHub);
+  const auto fail = [&](const std::string& reason) { tool.fail(place.native() + ": " + reason); };
+
+  FileContents contents;
+  if (const int error = readRegularFile(place, contents); error != 0)
+    return fail(errorText(error) + "; there is no recorded hub to move on");
+  const PlistParseResult parsed = codec.parse(contents.bytes);
+  if (parsed.value.asDictionary() == nullptr)
+    return fail(parsed.error.empty() ? "its root is no dictionary" : parsed.error);
+
+  const AdvancedHub hub = advancedHub(parsed.value, recordings.load(recording::kRegistry), seconds);
+  const PlistWriteResult written = codec.write(hub.root);
+  if (!written.ok) return fail(written.error);
+  if (const int error = replaceFile(place, written.bytes); error != 0) return fail(errorText(error));
+
+  if (tool.printedAsJson(
+          PlistValue::dictionary({{"channels", PlistValue::int64(static_cast<std::int64_t>(hub.channels))},
+                                  {"seconds", PlistValue::int64(static_cast<std::int64_t>(seconds))}})))
+    return;
+  const auto counted = [](std::uint64_t count, const char* thing) {
+    return std::to_string(count) + " " + thing + (count == 1 ? "" : "s");
+  };
+  tool.out().line("moved " + counted(hub.channels, "channel") + " on by " + counted(seconds, "second"));
+}
+
+}  // namespace tbdaily

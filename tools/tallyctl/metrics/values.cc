@@ -1,0 +1,135 @@
+#include "tools/tallyctl/metrics/values.h"
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+
+#include "drivermetrics/units.h"
+#include "drivermetrics/values.h"
+
+namespace tbdaily {
+
+namespace {
+
+constexpr std::array<std::string_view, 5> kFormatNames = {"unknown", "simple", "state", "histogram", "array"};
+
+std::optional<std::string> owned(std::optional<std::string_view> text) {
+  return text ? std::optional<std::string>(*text) : std::nullopt;
+}
+
+ChannelValues readDescription(ChannelRecord& channel) {
+  ChannelValues values;
+  values.driver = owned(KdReportChannelGetDriverName(&channel));
+  values.driverID = KdReportChannelGetDriverID(&channel);
+  values.group = owned(KdReportChannelGetGroup(&channel));
+  values.subGroup = owned(KdReportChannelGetSubGroup(&channel));
+  values.name = owned(KdReportChannelGetChannelName(&channel));
+  values.channelID = KdReportChannelGetChannelID(&channel);
+  values.format = KdReportChannelGetFormat(&channel);
+  values.categories = KdReportChannelGetCategories(&channel);
+  if (ChannelType type; getChannelType(&channel, type) == kKdSuccess)
+    values.elementCount = type.elementCount();
+  values.unit = KdReportChannelGetUnit(&channel);
+  values.unitLabel = owned(KdReportChannelGetUnitLabel(&channel));
+  return values;
+}
+
+void readStates(ChannelRecord& channel, ChannelValues& values) {
+  values.states.resize(values.elementCount);
+  const double all = residencyOfAllStates(&channel);
+  bool named = true;  // all states have names, or none has
+  for (std::int32_t i = 0; i < values.elementCount; ++i) {
+    StateValues& state = values.states[static_cast<std::size_t>(i)];
+    state.id = KdReportStateGetIDForIndex(&channel, i);
+    if (named) state.name = owned(KdReportStateGetNameForIndex(&channel, i));
+    named = state.name.has_value();
+    state.entries = KdReportStateGetInTransitions(&channel, i);
+    state.residency = KdReportStateGetResidency(&channel, i);
+    state.dutyCycle = shareOfResidency(state.residency, all);
+  }
+  values.currentState = KdReportStateGetCurrent(&channel);
+}
+
+void readBuckets(ChannelRecord& channel, ChannelValues& values) {
+  values.buckets.resize(values.elementCount);
+  bool bounded = true;  // bounds are for the first buckets; behind one without there are none
+  for (std::int32_t i = 0; i < values.elementCount; ++i) {
+    BucketValues& bucket = values.buckets[static_cast<std::size_t>(i)];
+    std::int64_t lower = 0, upper = 0;
+    bounded = bounded && KdReportHistogramGetBucketBounds(&channel, i, &lower, &upper) == kKdSuccess;
+    if (bounded) {
+      bucket.lower = lower;
+      bucket.upper = upper;
+    }
+    bucket.hits = KdReportHistogramGetBucketHits(&channel, i);
+    bucket.minimum = KdReportHistogramGetBucketMinValue(&channel, i);
+    bucket.maximum = KdReportHistogramGetBucketMaxValue(&channel, i);
+    bucket.sum = KdReportHistogramGetBucketSum(&channel, i);
+  }
+  values.minimum = KdReportHistogramGetMinValue(&channel);
+  values.maximum = KdReportHistogramGetMaxValue(&channel);
+}
+
+void readArray(const ChannelRecord& channel, ChannelValues& values) {
+  const auto elements = getRawElements(&channel, kKdReportArray);
+  if (!elements) return;
+  values.array.resize(elements->count() * kElementWords);
+  for (std::size_t i = 0; i < values.array.size(); ++i)
+    values.array[i] = KdReportArrayGetValueAtIndex(&channel, static_cast<std::int32_t>(i));
+}
+
+void readValues(ChannelRecord& channel, ChannelValues& values) {
+  switch (values.format) {
+    case kKdReportSimple:
+      values.value = KdReportSimpleGetIntegerValue(&channel);
+      break;
+    case kKdReportState:
+      readStates(channel, values);
+      break;
+    case kKdReportHistogram:
+      readBuckets(channel, values);
+      break;
+    case kKdReportArray:
+      readArray(channel, values);
+      break;
+    default:
+      break;
+  }
+}
+
+}  // namespace
+
+std::string formatName(std::uint8_t format) {
+  return format < kFormatNames.size() ? std::string(kFormatNames[format])
+                                      : "format " + std::to_string(format);
+}
+
+std::optional<std::uint8_t> formatOfName(std::string_view name) {
+  const auto* found = std::find(kFormatNames.begin(), kFormatNames.end(), name);
+  if (found == kFormatNames.end()) return std::nullopt;
+  return static_cast<std::uint8_t>(found - kFormatNames.begin());
+}
+
+std::optional<std::vector<ChannelValues>> readChannels(const ChannelCollection* collection,
+                                                       ChannelContents contents) {
+  std::vector<ChannelValues> channels;
+  const std::uint32_t status = KdReportIterate(collection, [&](ChannelRecord& channel) {
+    channels.push_back(readDescription(channel));
+    if (contents == ChannelContents::Values) readValues(channel, channels.back());
+    return kKdReportKeep;
+  });
+  if (status != 0) return std::nullopt;
+  return channels;
+}
+
+std::optional<double> residencySeconds(const ChannelValues& channel, std::int64_t residency) {
+  if (channel.unit == kKdReportInvalid || residency == kKdReportInvalid) return std::nullopt;
+  // Scaling takes unsigned values; a residency that went back between two samples is negative.
+  const bool negative = residency < 0;
+  const auto magnitude = static_cast<std::uint64_t>(negative ? -residency : residency);
+  const double seconds = KdReportScaleValue(magnitude, channel.unit, kSecondsUnit);
+  if (!std::isfinite(seconds)) return std::nullopt;
+  return negative ? -seconds : seconds;
+}
+
+}  // namespace tbdaily

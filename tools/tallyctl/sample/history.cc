@@ -1,0 +1,203 @@
+#include "tools/tallyctl/sample/history.h"
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <cstdint>
+#include <vector>
+
+#include "platform/usage_service.h"
+
+namespace tbdaily {
+
+namespace {
+
+// A small generator of its own, so that a sample is the same on every machine.
+class Random {
+ public:
+  explicit Random(std::uint64_t seed) : state_(seed) {}
+  // From 0 up to but not including 1.
+  double unit() {
+    state_ += 0x9E3779B97F4A7C15U;
+    std::uint64_t z = state_;
+    z = (z ^ (z >> 30)) * 0xBF58476D1CE4E5B9U;
+    z = (z ^ (z >> 27)) * 0x94D049BB133111EBU;
+    return static_cast<double>((z ^ (z >> 31)) >> 11) * 0x1.0p-53;
+  }
+  double between(double low, double high) { return low + unit() * (high - low); }
+  // Bell-shaped around the mean, three standard deviations wide.
+  double around(double mean, double deviation) {
+    return mean + deviation * 2 * (unit() + unit() + unit() - 1.5);
+  }
+
+ private:
+  std::uint64_t state_;
+};
+
+constexpr std::array<const char*, 24> kUserApps = {
+    "maps",       "chess",   "recipes", "podcasts", "translate", "weather", "banking", "tickets",
+    "fitness",    "sketch",  "radio",   "notes",    "scanner",   "garden",  "sudoku",  "messages",
+    "camera-pro", "library", "trains",  "parcel",   "budget",    "guitar",  "stars",   "diary"};
+constexpr std::array<const char*, 16> kSystemApps = {
+    "phone",    "mail",       "calendar", "clock", "settings", "photos", "browser",   "store",
+    "contacts", "calculator", "files",    "music", "wallet",   "health", "reminders", "voice"};
+
+enum class Shape { Bell, Decay, Percent };
+
+struct SampleDistribution {
+  const char* key;
+  int count;
+  Shape shape;
+  double middle, spread;
+};
+
+constexpr SampleDistribution kDistributions[] = {
+    {"power.batteryLevel", 1440, Shape::Percent, 62, 30},
+    {"power.batteryTemperature", 1440, Shape::Bell, 29, 4},
+    {"power.drainRate", 288, Shape::Decay, 3.5, 0},
+    {"power.chargeCurrent", 288, Shape::Bell, 1450, 200},
+    {"net.latency.cell", 2600, Shape::Decay, 68, 0},
+    {"net.latency.wifi", 5200, Shape::Decay, 19, 0},
+    {"net.latency.dns", 4100, Shape::Decay, 11, 0},
+    {"net.wifi.lossShare", 960, Shape::Decay, 0.06, 0},
+    {"display.brightness", 720, Shape::Percent, 45, 25},
+    {"internal.schedulerDelay", 3000, Shape::Decay, 2, 0},
+};
+
+struct SampleScalar {
+  const char* key;
+  double low, high;
+};
+
+constexpr SampleScalar kScalars[] = {
+    {"power.screenOnMinutes", 90, 380},
+    {"power.chargeCycles", 120, 900},
+    {"power.temperatureDelta", -14, 14},
+    {"power.unplugCount", 1, 9},
+    {"net.wifi.bytesIn", 2e7, 4e9},
+    {"net.wifi.bytesOut", 1e6, 3e8},
+    {"net.wifi.associations", 2, 60},
+    {"net.cell.bytesIn", 1e6, 6e8},
+    {"net.cell.bytesOut", 1e5, 8e7},
+    {"net.cell.handovers", 3, 400},
+    {"net.dns.queries", 800, 9000},
+    {"net.vpn.sessions", 0, 4},
+    {"experiment.newKeyboard.uses", 0, 900},
+    {"experiment.newKeyboard.errors", 0, 7},
+    {"internal.assertions", 0, 30},
+    {"internal.watchdogResets", 0, 2},
+    {"location.fixes", 10, 2000},
+    {"contacts.lookups", 5, 300},
+};
+
+double draw(Random& random, const SampleDistribution& d) {
+  switch (d.shape) {
+    case Shape::Bell:
+      return random.around(d.middle, d.spread);
+    case Shape::Percent:
+      return std::clamp(random.around(d.middle, d.spread), 0.0, 100.0);
+    case Shape::Decay:
+      return -d.middle * std::log(1 - random.unit());
+  }
+  return 0;
+}
+
+// To three decimals, as a sensor would give them.
+double measured(double value) {
+  return std::round(value * 1000) / 1000;
+}
+
+class SampleWriter {
+ public:
+  SampleWriter(AnalyticsStore& store, DayNumber day)
+      : store_(store), day_(day), random_(static_cast<std::uint64_t>(day)) {}
+
+  void scalar(const std::string& key, double low, double high) {
+    keep(store_.setScalar(key, day_, static_cast<std::int64_t>(std::llround(random_.between(low, high)))));
+  }
+  void distribution(const std::string& key, const SampleDistribution& d) {
+    for (int i = 0; i < d.count && result_.ok(); ++i) {
+      const auto second = static_cast<std::int32_t>(kSecondsPerDay * i / d.count);
+      const double value = measured(draw(random_, d));
+      keep(store_.appendDistributionValues(key, day_, second, std::span(&value, 1)));
+    }
+  }
+  void everything() {
+    for (const SampleScalar& s : kScalars) scalar(s.key, s.low, s.high);
+    for (const SampleDistribution& d : kDistributions) distribution(d.key, d);
+    for (const SampleApp& app : sampleApps()) {
+      scalar("app.launches." + app.identifier, 0, 60);
+      scalar("app.foregroundSeconds." + app.identifier, 0, 5400);
+      scalar("app.notifications." + app.identifier, 0, 40);
+      scalar("app.energy." + app.identifier, 1, 900);
+      scalar("app.writes." + app.identifier, 0, 1e8);
+      if (!app.isUserApp) continue;
+      const auto launches = static_cast<int>(random_.between(1, 60));
+      distribution("app.launchTime." + app.identifier,
+                   {"", launches, Shape::Decay, random_.between(20, 180), 0});
+    }
+  }
+  const StoreResult& result() const { return result_; }
+
+ private:
+  void keep(StoreResult result) {
+    if (result_.ok()) result_ = std::move(result);
+  }
+
+  AnalyticsStore& store_;
+  DayNumber day_;
+  Random random_;
+  StoreResult result_;
+};
+
+}  // namespace
+
+std::vector<SampleApp> sampleApps() {
+  std::vector<SampleApp> apps;
+  apps.reserve(kUserApps.size() + kSystemApps.size());
+  for (const char* name : kUserApps) apps.push_back({std::string("org.example.") + name, true});
+  for (const char* name : kSystemApps) apps.push_back({std::string("com.velmora.") + name, false});
+  return apps;
+}
+
+PlistArray sampleUsageRecords(DayNumber day) {
+  constexpr std::array<const char*, 8> kDaemons = {"mailsyncd", "updated", "pushd", "timesyncd",
+                                                   "mapsd",     "cloudd",  "dnsd",  "backupd"};
+  constexpr DayNumber kDaysSinceBoot = 3;
+  Random random(static_cast<std::uint64_t>(day) + 1);
+  PlistArray records;
+  const auto add = [&](const char* nameKey, const std::string& name, double scale, DayNumber since) {
+    const auto bytes = [&](double low, double high) {
+      return PlistValue::int64(std::llround(random.between(low, high) * scale));
+    };
+    records.push_back(PlistValue::dictionary(
+        {{nameKey, PlistValue::string(name)},
+         {std::string(kUsageSinceTimeKey),
+          PlistValue(PlistDate{dateOf(since).secondsSinceReference + measured(random.between(0, 86399))})},
+         {"wifiInBytes", bytes(1e5, 4e8)},
+         {"wifiOutBytes", bytes(1e4, 3e7)},
+         {"wwanInBytes", bytes(0, 9e7)},
+         {"wwanOutBytes", bytes(0, 6e6)}}));
+  };
+  // Apps restart now and then; daemons have counted since the device was started.
+  for (const SampleApp& app : sampleApps()) {
+    if (app.isUserApp)
+      add("bundleName", app.identifier, 1, day - static_cast<DayNumber>(random.between(0, 2)));
+  }
+  for (const char* daemon : kDaemons) add("procName", daemon, 0.2, day - kDaysSinceBoot);
+  return records;
+}
+
+std::optional<std::string> addSampleHistory(AnalyticsStore& store, DayNumber day) {
+  if (const StoreResult begun = store.beginLoad(); !begun.ok()) return begun.error;
+  SampleWriter writer(store, day);
+  writer.everything();
+  if (!writer.result().ok()) {
+    store.rollbackLoad();
+    return writer.result().error;
+  }
+  const StoreResult committed = store.commitLoad();
+  return committed.ok() ? std::nullopt : std::optional(committed.error);
+}
+
+}  // namespace tbdaily

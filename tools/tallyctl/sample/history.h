@@ -1,0 +1,27 @@
+// A plausible day in the analytics store of the sample device.
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "platform/analytics_client.h"
+#include "platform/linux/store/analytics_store.h"
+
+namespace tbdaily {
+
+// Some hundred scalars and some dozen distributions of up to thousands of values; the same for the same day.
+// One line with the reason when the store cannot take them.
+std::optional<std::string> addSampleHistory(AnalyticsStore& store, DayNumber day);
+
+// Usage records of some dozen processes of the day, as the usage service delivers them: an array of
+// dictionaries.
+PlistArray sampleUsageRecords(DayNumber day);
+
+// The bundle identifiers of the sample device's applications, the user's first.
+struct SampleApp {
+  std::string identifier;
+  bool isUserApp;
+};
+std::vector<SampleApp> sampleApps();
+
+}  // namespace tbdaily
