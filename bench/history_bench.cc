@@ -51,7 +51,7 @@ std::unique_ptr<OpenAnalyticsHistory> openHistory() {
     return fill(store);
   }();
   if (!filled) std::abort();
-  return LinuxAnalyticsHistory([] { return std::optional(file); }).open();
+  return SqliteAnalyticsHistory([] { return std::optional(file); }).open();
 }
 
 void enumerateScalars(benchmark::State& state) {

@@ -70,7 +70,7 @@ void countBytes(benchmark::State& state, std::size_t size) {
 }
 
 void read(benchmark::State& state, std::string_view bytes) {
-  LinuxPropertyListCodec codec;
+  PlistCodec codec;
   for (auto _ : state) {
     const PlistParseResult result = codec.parse(std::as_bytes(std::span(bytes)));
     if (!result.error.empty()) state.SkipWithError(result.error.c_str());
@@ -79,7 +79,7 @@ void read(benchmark::State& state, std::string_view bytes) {
 }
 
 void write(benchmark::State& state, const PlistValue& value, PlistForm form) {
-  LinuxPropertyListCodec codec;
+  PlistCodec codec;
   std::size_t size = 0;
   for (auto _ : state) {
     const PlistWriteResult result = codec.write(value, form);
@@ -90,7 +90,7 @@ void write(benchmark::State& state, const PlistValue& value, PlistForm form) {
 }
 
 void readXml(benchmark::State& state, PlistValue (*make)()) {
-  read(state, LinuxPropertyListCodec().write(make()).bytes);
+  read(state, PlistCodec().write(make()).bytes);
 }
 void readBinary(benchmark::State& state, PlistValue (*make)()) {
   read(state, binaryOf(*make().asDictionary()));

@@ -103,8 +103,8 @@ void writeWholeReport(benchmark::State& state) {
     fillStore(store, state.range(0), state.range(1));
   }
   testing::FakePlatform fake;
-  LinuxPropertyListCodec codec;
-  LinuxAnalyticsHistory history([&file] { return std::optional(file); });
+  PlistCodec codec;
+  SqliteAnalyticsHistory history([&file] { return std::optional(file); });
   const PlistValue scalarOptions = PlistValue::dictionary({{"sig_fig", PlistValue::int64(2)}});
   const PlistValue distributionOptions = PlistValue::dictionary(
       {{"intervals",

@@ -42,7 +42,7 @@ void readAll(ChannelCollection* collection, ChannelCollection* earlier) {
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-  static LinuxPropertyListCodec codec;
+  static PlistCodec codec;
   if (size == 0) return 0;
   // The first byte is the length of the property list, in sixteenths of the rest; the buffer follows.
   const auto bytes = std::as_bytes(std::span(data, size)).subspan(1);

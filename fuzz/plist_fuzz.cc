@@ -19,7 +19,7 @@
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   using namespace tbdaily;
   const auto bytes = std::as_bytes(std::span(data, size));
-  LinuxPropertyListCodec codec;
+  PlistCodec codec;
   const PlistParseResult read = codec.parse(bytes);
   if (read.value.isNone() == read.error.empty()) std::abort();
   plistFromJson({reinterpret_cast<const char*>(data), size});

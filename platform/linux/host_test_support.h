@@ -28,7 +28,7 @@ struct TestHost {
 
   TemporaryFolder folder;
   Host host;
-  LinuxPropertyListCodec codec;
+  PlistCodec codec;
 
   static void putAt(const std::filesystem::path& place, std::string_view contents) {
     std::filesystem::create_directories(place.parent_path());

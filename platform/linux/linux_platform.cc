@@ -28,7 +28,7 @@ struct LinuxPlatform::Families {
   explicit Families(Host h) : host(std::move(h)) {}
 
   const Host host;
-  LinuxPropertyListCodec codec;
+  PlistCodec codec;
   Recordings recordings{host, codec};
   LinuxKernel kernel{host, recordings};
   LinuxDeviceAnswers deviceAnswers{host, recordings};
@@ -36,8 +36,8 @@ struct LinuxPlatform::Families {
   LinuxPreferences preferences{host, codec};
   LinuxLogSubmission logSubmission{host, recordings, codec, preferences, kernel};
   AnalyticsStoreLocator storeLocator = analyticsStoreLocator(host, deviceAnswers, fileSystem);
-  LinuxAnalyticsClient analyticsClient{storeLocator, kernel};
-  LinuxAnalyticsHistory analyticsHistory{storeLocator};
+  SqliteAnalyticsClient analyticsClient{storeLocator, kernel};
+  SqliteAnalyticsHistory analyticsHistory{storeLocator};
   LinuxAppRegistry appRegistry{host, recordings};
   LinuxLocaleSettings localeSettings{host, recordings};
   LinuxServiceListener serviceListener{host, codec};
@@ -45,9 +45,9 @@ struct LinuxPlatform::Families {
   LinuxSystemLog systemLog{host, kernel, deviceAnswers};
   LinuxDynamicLoader dynamicLoader{host};
   LinuxMessageDigest messageDigest;
-  LinuxDriverRegistry driverRegistry{recordings};
-  LinuxStackSnapshot stackSnapshot{recordings};
-  LinuxUsageService usageService{recordings};  // last: it ends before what its replies use
+  RecordedDriverRegistry driverRegistry{recordings};
+  RecordedStackSnapshot stackSnapshot{recordings};
+  RecordedUsageService usageService{recordings};  // last: it ends before what its replies use
 
   Platform services{driverRegistry,   preferences,     deviceAnswers, logSubmission, analyticsClient,
                     analyticsHistory, codec,           stackSnapshot, usageService,  appRegistry,

@@ -11,7 +11,7 @@ namespace {
 
 tbdaily::PreferencesStore& preferences() {
   static const tbdaily::Host host = tbdaily::Host::fromEnvironment();
-  static tbdaily::LinuxPropertyListCodec codec;
+  static tbdaily::PlistCodec codec;
   static tbdaily::LinuxPreferences store(host, codec);
   return store;
 }

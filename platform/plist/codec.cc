@@ -12,7 +12,7 @@ namespace {
 constexpr const char* kOutOfMemory = "out of memory";
 }
 
-PlistParseResult LinuxPropertyListCodec::parse(std::span<const std::byte> bytes) {
+PlistParseResult PlistCodec::parse(std::span<const std::byte> bytes) {
   try {
     return isBinaryPlist(bytes) ? parseBinaryPlist(bytes) : parseXmlPlist(bytes);
   } catch (const std::exception&) {
@@ -20,7 +20,7 @@ PlistParseResult LinuxPropertyListCodec::parse(std::span<const std::byte> bytes)
   }
 }
 
-PlistWriteResult LinuxPropertyListCodec::write(const PlistValue& value, PlistForm form) {
+PlistWriteResult PlistCodec::write(const PlistValue& value, PlistForm form) {
   try {
     return writeXmlPlist(value, form);
   } catch (const std::exception&) {

@@ -6,7 +6,7 @@
 namespace tbdaily {
 
 // No state: may be used from any thread. Running out of memory is a failure like the others.
-class LinuxPropertyListCodec : public PropertyListCodec {
+class PlistCodec : public PropertyListCodec {
  public:
   // The encoding is told by the first bytes. Errors begin with "line L, column C: " (XML) or "byte OFFSET: "
   // (binary).

@@ -26,7 +26,7 @@ using Builder = testing::BinaryPlistBuilder;
 constexpr std::string_view kHeader = "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<plist version=\"1.0\">\n";
 
 PlistParseResult parse(std::string_view text) {
-  return LinuxPropertyListCodec().parse(std::as_bytes(std::span(text)));
+  return PlistCodec().parse(std::as_bytes(std::span(text)));
 }
 
 // The document around one value, all in the first line.
@@ -69,9 +69,9 @@ TEST(PropertyListCodec, WritesOneElementALineInTheFormAskedFor) {
       "\t<key>when</key>\n\t<date>2026-11-26T09:07:04Z</date>\n\t<key>bytes</key>\n\t<data>AQIDBA==</data>\n"
       "\t<key>text</key>\n\t<string>a&#13;&amp;b</string>\n\t<key>yes</key>\n\t<true/>\n\t<key>empty</key>\n"
       "\t<dict/>\n</dict>\n</plist>\n";
-  EXPECT_EQ(LinuxPropertyListCodec().write(everything(), PlistForm::Plain).bytes, plain);
+  EXPECT_EQ(PlistCodec().write(everything(), PlistForm::Plain).bytes, plain);
 
-  const std::string exact = LinuxPropertyListCodec().write(everything()).bytes;
+  const std::string exact = PlistCodec().write(everything()).bytes;
   for (const char* element : {"<integer bits=\"8\">-5<", "<integer>3<", "<real bits=\"32\">0.1<", "04.25Z<"})
     EXPECT_THAT(exact, HasSubstr(element));
 }
@@ -83,9 +83,9 @@ TEST(PropertyListCodec, ReplacesWhatXmlCannotCarryOrRefusesItInTheExactForm) {
       {"\xED\xA0\x80", "\uFFFD\uFFFD\uFFFD"}, {"x\xF0\x9F\x98", "x\uFFFD\uFFFD\uFFFD"},
       {"\xC0\x80", "\uFFFD\uFFFD"},           {"\xF4\x90\x80\x80", "\uFFFD\uFFFD\uFFFD\uFFFD"}};
   for (const auto& [text, written] : cases) {
-    const auto plain = LinuxPropertyListCodec().write(PlistValue::string(text), PlistForm::Plain);
+    const auto plain = PlistCodec().write(PlistValue::string(text), PlistForm::Plain);
     EXPECT_EQ(plain.bytes, std::string(kHeader) + "<string>" + written + "</string>\n</plist>\n");
-    EXPECT_FALSE(LinuxPropertyListCodec().write(PlistValue::dictionary({{text, PlistValue::int64(1)}})).ok);
+    EXPECT_FALSE(PlistCodec().write(PlistValue::dictionary({{text, PlistValue::int64(1)}})).ok);
   }
 }
 
@@ -205,7 +205,7 @@ TEST(PropertyListCodec, NestingEndsAt512LevelsInEveryDirection) {
     shared.add(Builder::array({}));
     EXPECT_EQ(parse(builder.build()).error.empty(), allowed);
     EXPECT_EQ(parse(shared.build()).error.empty(), allowed);
-    EXPECT_EQ(LinuxPropertyListCodec().write(value).ok, allowed);
+    EXPECT_EQ(PlistCodec().write(value).ok, allowed);
   }
 }
 
@@ -318,7 +318,7 @@ TEST(PropertyListCodec, CyclesAndExplosionsOfSharedObjectsAreErrors) {
 }
 
 TEST(PropertyListCodec, DamagedListsNeverBringItDown) {
-  LinuxPropertyListCodec codec;
+  PlistCodec codec;
   Builder builder;
   for (const std::string& object :
        {Builder::dictionary({1, 2}, {3, 4}), Builder::ascii("key"), Builder::ascii("a key of some length"),

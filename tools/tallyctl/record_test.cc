@@ -24,7 +24,7 @@ class RecordTest : public ::testing::Test {
         store, input.get(), [this](std::uint64_t bytes) { bytesRead = bytes; }, imported);
   }
   std::unique_ptr<OpenAnalyticsHistory> history() {
-    return LinuxAnalyticsHistory([this] { return std::optional(store.file()); }).open();
+    return SqliteAnalyticsHistory([this] { return std::optional(store.file()); }).open();
   }
 
   testing::TemporaryFolder folder;

@@ -136,7 +136,7 @@ ReportPreview previewReport(LinuxPlatform& linux, std::optional<DayNumber> day) 
   ReadOnlyLoader loader(real.dynamicLoader);
   StoreCopyFileSystem fileSystem(real.fileSystem, storePath, copy.path());
   CapturedSubmission submission(real.logSubmission);
-  LinuxAnalyticsHistory history([&copy] { return std::optional(copy.path()); });
+  SqliteAnalyticsHistory history([&copy] { return std::optional(copy.path()); });
   Platform preview = platformWith(real, preferences, submission, history, log, fileSystem, loader);
 
   const DayNumber wanted = day ? *day : dayBefore(real.analyticsClient.currentDayNumber());

@@ -16,13 +16,13 @@ struct RegistryNeeds {
   explicit RegistryNeeds(Host h) : host(std::move(h)) {}
 
   const Host host;
-  LinuxPropertyListCodec codec;
+  PlistCodec codec;
   Recordings recordings{host, codec};
 };
 
-class HostRegistry : private RegistryNeeds, public LinuxDriverRegistry {
+class HostRegistry : private RegistryNeeds, public RecordedDriverRegistry {
  public:
-  explicit HostRegistry(Host h) : RegistryNeeds(std::move(h)), LinuxDriverRegistry(recordings) {}
+  explicit HostRegistry(Host h) : RegistryNeeds(std::move(h)), RecordedDriverRegistry(recordings) {}
 };
 
 }  // namespace

@@ -46,18 +46,18 @@ bool matches(const PlistDictionary& entry, const PlistDictionary& matching) {
 
 }  // namespace
 
-PlistValue LinuxDriverRegistry::recordedEntries() {
+PlistValue RecordedDriverRegistry::recordedEntries() {
   return recordings_.entry(recording::kRegistry, "entries");
 }
 
-PlistValue LinuxDriverRegistry::KdServiceMatching(std::string_view serviceClass) {
+PlistValue RecordedDriverRegistry::KdServiceMatching(std::string_view serviceClass) {
   if (recordedEntries().asArray() == nullptr) return {};
   return PlistValue::dictionary(
       {{std::string(kProviderClass), PlistValue::string(std::string(serviceClass))}});
 }
 
-KdHandle LinuxDriverRegistry::nextMatch(const PlistValue& entries, const PlistValue& matching,
-                                        std::size_t& from) {
+KdHandle RecordedDriverRegistry::nextMatch(const PlistValue& entries, const PlistValue& matching,
+                                           std::size_t& from) {
   const PlistArray* list = entries.asArray();
   const PlistDictionary* wanted = matching.asDictionary();
   if (list == nullptr || wanted == nullptr) return 0;
@@ -70,12 +70,13 @@ KdHandle LinuxDriverRegistry::nextMatch(const PlistValue& entries, const PlistVa
   return 0;
 }
 
-KdHandle LinuxDriverRegistry::KdServiceGetMatchingService(const PlistValue& matching) {
+KdHandle RecordedDriverRegistry::KdServiceGetMatchingService(const PlistValue& matching) {
   std::size_t from = 0;
   return nextMatch(recordedEntries(), matching, from);
 }
 
-KdStatus LinuxDriverRegistry::KdServiceGetMatchingServices(const PlistValue& matching, KdHandle& iterator) {
+KdStatus RecordedDriverRegistry::KdServiceGetMatchingServices(const PlistValue& matching,
+                                                              KdHandle& iterator) {
   iterator = 0;
   PlistValue entries = recordedEntries();
   if (entries.asArray() == nullptr) return kKdNotFound;
@@ -85,40 +86,40 @@ KdStatus LinuxDriverRegistry::KdServiceGetMatchingServices(const PlistValue& mat
   return kKdSuccess;
 }
 
-KdHandle LinuxDriverRegistry::KdIteratorNext(KdHandle iterator) {
+KdHandle RecordedDriverRegistry::KdIteratorNext(KdHandle iterator) {
   const auto found = iterators_.find(iterator);
   return found != iterators_.end()
              ? nextMatch(found->second.entries, found->second.matching, found->second.next)
              : 0;
 }
 
-bool LinuxDriverRegistry::KdIteratorIsValid(KdHandle iterator) {
+bool RecordedDriverRegistry::KdIteratorIsValid(KdHandle iterator) {
   const auto found = iterators_.find(iterator);
   return found != iterators_.end() && found->second.entries == recordedEntries();
 }
 
-KdStatus LinuxDriverRegistry::KdObjectRelease(KdHandle object) {
+KdStatus RecordedDriverRegistry::KdObjectRelease(KdHandle object) {
   return entries_.erase(object) + iterators_.erase(object) != 0 ? kKdSuccess : kKdBadArgument;
 }
 
-const PlistDictionary* LinuxDriverRegistry::entryOf(KdHandle handle) const {
+const PlistDictionary* RecordedDriverRegistry::entryOf(KdHandle handle) const {
   const auto found = entries_.find(handle);
   return found != entries_.end() ? found->second.asDictionary() : nullptr;
 }
 
-std::uint32_t LinuxDriverRegistry::KdObjectGetUserRetainCount(KdHandle object) {
+std::uint32_t RecordedDriverRegistry::KdObjectGetUserRetainCount(KdHandle object) {
   const PlistDictionary* entry = entryOf(object);
   if (entry == nullptr) return 0;
   return static_cast<std::uint32_t>(entry->get("retainCount").asInteger().value_or(1));
 }
 
-PlistValue LinuxDriverRegistry::KdRegistryEntryCreateCFProperty(KdHandle handle, std::string_view key) {
+PlistValue RecordedDriverRegistry::KdRegistryEntryCreateCFProperty(KdHandle handle, std::string_view key) {
   const PlistDictionary* entry = entryOf(handle);
   return entry != nullptr ? propertiesOf(*entry).get(key) : PlistValue();
 }
 
-PlistValue LinuxDriverRegistry::KdRegistryEntrySearchCFProperty(KdHandle handle, KdRegistryPlane,
-                                                                std::string_view key, KdSearchOptions) {
+PlistValue RecordedDriverRegistry::KdRegistryEntrySearchCFProperty(KdHandle handle, KdRegistryPlane,
+                                                                   std::string_view key, KdSearchOptions) {
   const PlistDictionary* entry = entryOf(handle);
   const PlistValue all = recordedEntries();
   const std::size_t longestWay = all.asArray() != nullptr ? all.asArray()->size() : 0;
@@ -136,7 +137,8 @@ PlistValue LinuxDriverRegistry::KdRegistryEntrySearchCFProperty(KdHandle handle,
   return {};
 }
 
-KdStatus LinuxDriverRegistry::KdRegistryEntryGetRegistryEntryID(KdHandle handle, std::uint64_t& identifier) {
+KdStatus RecordedDriverRegistry::KdRegistryEntryGetRegistryEntryID(KdHandle handle,
+                                                                   std::uint64_t& identifier) {
   const PlistDictionary* entry = entryOf(handle);
   if (entry == nullptr) return kKdBadArgument;
   const auto recorded = entry->get("id").asInteger();
@@ -145,7 +147,7 @@ KdStatus LinuxDriverRegistry::KdRegistryEntryGetRegistryEntryID(KdHandle handle,
   return kKdSuccess;
 }
 
-KdStatus LinuxDriverRegistry::KdRegistryEntryGetName(KdHandle handle, std::string& name) {
+KdStatus RecordedDriverRegistry::KdRegistryEntryGetName(KdHandle handle, std::string& name) {
   const PlistDictionary* entry = entryOf(handle);
   if (entry == nullptr) return kKdBadArgument;
   const PlistValue recorded = entry->get("name");
@@ -154,7 +156,7 @@ KdStatus LinuxDriverRegistry::KdRegistryEntryGetName(KdHandle handle, std::strin
   return kKdSuccess;
 }
 
-KdStatus LinuxDriverRegistry::KdServiceOpen(KdHandle service, std::uint32_t, KdHandle& connection) {
+KdStatus RecordedDriverRegistry::KdServiceOpen(KdHandle service, std::uint32_t, KdHandle& connection) {
   connection = 0;
   const PlistDictionary* entry = entryOf(service);
   if (entry == nullptr) return kKdBadArgument;
@@ -172,7 +174,7 @@ KdStatus LinuxDriverRegistry::KdServiceOpen(KdHandle service, std::uint32_t, KdH
   return kKdSuccess;
 }
 
-KdStatus LinuxDriverRegistry::KdServiceClose(KdHandle connection) {
+KdStatus RecordedDriverRegistry::KdServiceClose(KdHandle connection) {
   const auto found = connections_.find(connection);
   if (found == connections_.end()) return kKdBadArgument;
   const KdStatus status = found->second.closeStatus;
@@ -180,42 +182,42 @@ KdStatus LinuxDriverRegistry::KdServiceClose(KdHandle connection) {
   return status;
 }
 
-RecordedClient* LinuxDriverRegistry::clientOf(KdHandle connection) {
+RecordedClient* RecordedDriverRegistry::clientOf(KdHandle connection) {
   const auto found = connections_.find(connection);
   return found != connections_.end() ? found->second.client.get() : nullptr;
 }
 
-KdStatus LinuxDriverRegistry::KdConnectCallStructMethod(KdHandle connection, std::uint32_t method,
-                                                        std::span<const std::byte> input,
-                                                        std::span<std::byte> output,
-                                                        std::size_t& outputSize) {
+KdStatus RecordedDriverRegistry::KdConnectCallStructMethod(KdHandle connection, std::uint32_t method,
+                                                           std::span<const std::byte> input,
+                                                           std::span<std::byte> output,
+                                                           std::size_t& outputSize) {
   RecordedClient* client = clientOf(connection);
   return client != nullptr ? client->callStruct(method, input, output, outputSize) : kKdBadArgument;
 }
 
-KdStatus LinuxDriverRegistry::KdConnectCallScalarMethod(KdHandle connection, std::uint32_t method,
-                                                        std::span<const std::uint64_t> inputs,
-                                                        std::span<std::uint64_t> outputs,
-                                                        std::size_t& outputCount) {
+KdStatus RecordedDriverRegistry::KdConnectCallScalarMethod(KdHandle connection, std::uint32_t method,
+                                                           std::span<const std::uint64_t> inputs,
+                                                           std::span<std::uint64_t> outputs,
+                                                           std::size_t& outputCount) {
   RecordedClient* client = clientOf(connection);
   return client != nullptr ? client->callScalar(method, inputs, outputs, outputCount) : kKdBadArgument;
 }
 
-KdStatus LinuxDriverRegistry::KdConnectCallMethod(KdHandle connection, std::uint32_t method,
-                                                  const KdMethodInput& input, KdMethodOutput& output) {
+KdStatus RecordedDriverRegistry::KdConnectCallMethod(KdHandle connection, std::uint32_t method,
+                                                     const KdMethodInput& input, KdMethodOutput& output) {
   RecordedClient* client = clientOf(connection);
   return client != nullptr ? client->call(method, input, output) : kKdBadArgument;
 }
 
-KdStatus LinuxDriverRegistry::KdConnectMapMemory(KdHandle connection, std::uint32_t memoryType,
-                                                 std::span<std::byte>& memory) {
+KdStatus RecordedDriverRegistry::KdConnectMapMemory(KdHandle connection, std::uint32_t memoryType,
+                                                    std::span<std::byte>& memory) {
   memory = {};
   RecordedClient* client = clientOf(connection);
   return client != nullptr ? client->mapMemory(memoryType, memory) : kKdBadArgument;
 }
 
-KdStatus LinuxDriverRegistry::KdConnectUnmapMemory(KdHandle connection, std::uint32_t memoryType,
-                                                   std::span<std::byte> memory) {
+KdStatus RecordedDriverRegistry::KdConnectUnmapMemory(KdHandle connection, std::uint32_t memoryType,
+                                                      std::span<std::byte> memory) {
   RecordedClient* client = clientOf(connection);
   return client != nullptr ? client->unmapMemory(memoryType, memory) : kKdBadArgument;
 }

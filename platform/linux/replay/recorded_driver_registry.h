@@ -12,9 +12,9 @@
 
 namespace tbdaily {
 
-class LinuxDriverRegistry : public DriverRegistry {
+class RecordedDriverRegistry : public DriverRegistry {
  public:
-  explicit LinuxDriverRegistry(Recordings& recordings) : recordings_(recordings) {}
+  explicit RecordedDriverRegistry(Recordings& recordings) : recordings_(recordings) {}
 
   PlistValue KdServiceMatching(std::string_view serviceClass) override;
   KdHandle KdServiceGetMatchingService(const PlistValue& matching) override;

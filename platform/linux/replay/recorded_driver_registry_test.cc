@@ -51,7 +51,7 @@ class DriversTest : public ::testing::Test {
 
   testing::TestHost device;
   Recordings recordings{device.host, device.codec};
-  LinuxDriverRegistry registry{recordings};
+  RecordedDriverRegistry registry{recordings};
   KdHandle connection = 0;
   KdStatus openStatus = 0;
 };

@@ -28,7 +28,7 @@ class RecordedConfiguration : public StackSnapshotConfiguration {
 
 }  // namespace
 
-std::unique_ptr<StackSnapshotConfiguration> LinuxStackSnapshot::createConfiguration() {
+std::unique_ptr<StackSnapshotConfiguration> RecordedStackSnapshot::createConfiguration() {
   return std::make_unique<RecordedConfiguration>(recordings_);
 }
 

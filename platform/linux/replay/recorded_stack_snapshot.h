@@ -6,9 +6,9 @@
 
 namespace tbdaily {
 
-class LinuxStackSnapshot : public StackSnapshot {
+class RecordedStackSnapshot : public StackSnapshot {
  public:
-  explicit LinuxStackSnapshot(Recordings& recordings) : recordings_(recordings) {}
+  explicit RecordedStackSnapshot(Recordings& recordings) : recordings_(recordings) {}
   std::unique_ptr<StackSnapshotConfiguration> createConfiguration() override;
 
  private:

@@ -8,27 +8,27 @@
 
 namespace tbdaily {
 
-class LinuxUsageService::Feed : public UsageFeed {
+class RecordedUsageService::Feed : public UsageFeed {
  public:
-  explicit Feed(LinuxUsageService& service) : service_(service) {}
+  explicit Feed(RecordedUsageService& service) : service_(service) {}
   void requestUsageToDate(std::span<const std::string>, UsageNameKind, UsageReplyHandler handler) override {
     service_.request(std::move(handler));
   }
 
  private:
-  LinuxUsageService& service_;
+  RecordedUsageService& service_;
 };
 
-class LinuxUsageService::Workspace : public UsageWorkspace {
+class RecordedUsageService::Workspace : public UsageWorkspace {
  public:
-  explicit Workspace(LinuxUsageService& service) : service_(service) {}
+  explicit Workspace(RecordedUsageService& service) : service_(service) {}
   std::unique_ptr<UsageFeed> createFeed() override { return std::make_unique<Feed>(service_); }
 
  private:
-  LinuxUsageService& service_;
+  RecordedUsageService& service_;
 };
 
-LinuxUsageService::~LinuxUsageService() {
+RecordedUsageService::~RecordedUsageService() {
   {
     const std::lock_guard lock(mutex_);
     ending_ = true;
@@ -37,16 +37,16 @@ LinuxUsageService::~LinuxUsageService() {
   for (std::thread& delivery : deliveries_) delivery.join();
 }
 
-std::unique_ptr<UsageWorkspace> LinuxUsageService::createWorkspace() {
+std::unique_ptr<UsageWorkspace> RecordedUsageService::createWorkspace() {
   return std::make_unique<Workspace>(*this);
 }
 
-bool LinuxUsageService::waitFor(double seconds) {
+bool RecordedUsageService::waitFor(double seconds) {
   std::unique_lock lock(mutex_);
   return !ends_.wait_for(lock, std::chrono::duration<double>(seconds), [this] { return ending_; });
 }
 
-void LinuxUsageService::request(UsageReplyHandler handler) {
+void RecordedUsageService::request(UsageReplyHandler handler) {
   constexpr double kLongestDelay = 1e6;  // seconds; no job lives that long
   PlistValue records = recordings_.entry(recording::kUsage, "records");
   if (records.asArray() == nullptr) return;  // nobody answers

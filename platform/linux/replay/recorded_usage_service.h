@@ -15,10 +15,10 @@ namespace tbdaily {
 // Each reply is delivered on a thread of its own. The destructor gives up replies that are still to come and
 // waits for one that is being processed, so that nothing is left half done and nothing runs afterwards. Feeds
 // do not outlive the service.
-class LinuxUsageService : public UsageService {
+class RecordedUsageService : public UsageService {
  public:
-  explicit LinuxUsageService(Recordings& recordings) : recordings_(recordings) {}
-  ~LinuxUsageService() override;
+  explicit RecordedUsageService(Recordings& recordings) : recordings_(recordings) {}
+  ~RecordedUsageService() override;
 
   std::unique_ptr<UsageWorkspace> createWorkspace() override;
 

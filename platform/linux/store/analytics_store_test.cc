@@ -270,7 +270,7 @@ TEST(AnalyticsHome, IsTheContainerInMultiUserModeAndIsAskedForUntilItIsFound) {
   device.multiUser = true;
   const AnalyticsStoreLocator locate = analyticsStoreLocator(host, device, files);
   EXPECT_EQ(locate(), std::nullopt);
-  EXPECT_EQ(testing::scalarLines(*LinuxAnalyticsHistory(locate).open()), Lines{});
+  EXPECT_EQ(testing::scalarLines(*SqliteAnalyticsHistory(locate).open()), Lines{});
   device.containers["systemgroup.com.velmora.sysmetrics"] = "/group";
   EXPECT_EQ(locate(), root.path() / "group/Library/Tallybook/TBDataStore.sqlitedb");
 

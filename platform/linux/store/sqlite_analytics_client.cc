@@ -21,41 +21,41 @@ void noteLostWrite(const AnalyticsStore& store, std::string_view key, const Stor
 
 }  // namespace
 
-LinuxAnalyticsClient::LinuxAnalyticsClient(AnalyticsStoreLocator locate, Kernel& kernel,
-                                           std::chrono::milliseconds busyTimeout)
+SqliteAnalyticsClient::SqliteAnalyticsClient(AnalyticsStoreLocator locate, Kernel& kernel,
+                                             std::chrono::milliseconds busyTimeout)
     : locate_(std::move(locate)), kernel_(kernel), busyTimeout_(busyTimeout) {}
 
-DayNumber LinuxAnalyticsClient::currentDayNumber() {
+DayNumber SqliteAnalyticsClient::currentDayNumber() {
   return dayNumberOf(kernel_.currentTime());
 }
-DayNumber LinuxAnalyticsClient::dayNumberOfDate(PlistDate date) {
+DayNumber SqliteAnalyticsClient::dayNumberOfDate(PlistDate date) {
   return dayNumberOf(date);
 }
-PlistDate LinuxAnalyticsClient::dateOfDayNumber(DayNumber day) {
+PlistDate SqliteAnalyticsClient::dateOfDayNumber(DayNumber day) {
   return dateOf(day);
 }
 
-void LinuxAnalyticsClient::checkpoint() {
+void SqliteAnalyticsClient::checkpoint() {
   AnalyticsStore* target = store();
   if (target == nullptr) return;
   if (const StoreResult result = target->checkpoint(); !result.ok()) Host::noteOnce(result.error);
 }
 
-void LinuxAnalyticsClient::setValueForScalarKey(std::string_view key, std::int64_t value) {
+void SqliteAnalyticsClient::setValueForScalarKey(std::string_view key, std::int64_t value) {
   AnalyticsStore* target = store();
   if (target == nullptr) return;
   const StoreResult result = target->setScalar(key, currentDayNumber(), value);
   if (!result.ok()) noteLostWrite(*target, key, result);
 }
 
-void LinuxAnalyticsClient::addValueForScalarKey(std::string_view key, std::int64_t increment) {
+void SqliteAnalyticsClient::addValueForScalarKey(std::string_view key, std::int64_t increment) {
   AnalyticsStore* target = store();
   if (target == nullptr) return;
   const StoreResult result = target->addScalar(key, currentDayNumber(), increment);
   if (!result.ok()) noteLostWrite(*target, key, result);
 }
 
-void LinuxAnalyticsClient::addValuesForScalarKeys(std::span<const ScalarIncrement> increments) {
+void SqliteAnalyticsClient::addValuesForScalarKeys(std::span<const ScalarIncrement> increments) {
   AnalyticsStore* target = store();
   if (target == nullptr || increments.empty()) return;
   const DayNumber today = currentDayNumber();
@@ -70,7 +70,7 @@ void LinuxAnalyticsClient::addValuesForScalarKeys(std::span<const ScalarIncremen
   if (!committed.ok()) noteLostWrite(*target, increments.front().key, committed);
 }
 
-AnalyticsStore* LinuxAnalyticsClient::store() {
+AnalyticsStore* SqliteAnalyticsClient::store() {
   const std::lock_guard lock(mutex_);
   if (!store_) {
     const std::optional<std::filesystem::path> file = locate_();

@@ -14,10 +14,10 @@
 
 namespace tbdaily {
 
-class LinuxAnalyticsClient : public AnalyticsClient {
+class SqliteAnalyticsClient : public AnalyticsClient {
  public:
-  LinuxAnalyticsClient(AnalyticsStoreLocator locate, Kernel& kernel,
-                       std::chrono::milliseconds busyTimeout = kStoreBusyTimeout);
+  SqliteAnalyticsClient(AnalyticsStoreLocator locate, Kernel& kernel,
+                        std::chrono::milliseconds busyTimeout = kStoreBusyTimeout);
 
   DayNumber currentDayNumber() override;
   DayNumber dayNumberOfDate(PlistDate date) override;

@@ -286,11 +286,11 @@ class EmptyHistory : public OpenAnalyticsHistory {
 
 }  // namespace
 
-LinuxAnalyticsHistory::LinuxAnalyticsHistory(AnalyticsStoreLocator locate,
-                                             std::chrono::milliseconds busyTimeout)
+SqliteAnalyticsHistory::SqliteAnalyticsHistory(AnalyticsStoreLocator locate,
+                                               std::chrono::milliseconds busyTimeout)
     : locate_(std::move(locate)), busyTimeout_(busyTimeout) {}
 
-std::unique_ptr<OpenAnalyticsHistory> LinuxAnalyticsHistory::open() {
+std::unique_ptr<OpenAnalyticsHistory> SqliteAnalyticsHistory::open() {
   const std::optional<std::filesystem::path> file = locate_();
   if (!file) return std::make_unique<EmptyHistory>();
   OpenedStore store = openStoreForReading(*file, busyTimeout_);

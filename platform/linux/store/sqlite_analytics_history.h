@@ -13,10 +13,10 @@
 
 namespace tbdaily {
 
-class LinuxAnalyticsHistory : public AnalyticsHistory {
+class SqliteAnalyticsHistory : public AnalyticsHistory {
  public:
-  explicit LinuxAnalyticsHistory(AnalyticsStoreLocator locate,
-                                 std::chrono::milliseconds busyTimeout = kStoreBusyTimeout);
+  explicit SqliteAnalyticsHistory(AnalyticsStoreLocator locate,
+                                  std::chrono::milliseconds busyTimeout = kStoreBusyTimeout);
 
   std::unique_ptr<OpenAnalyticsHistory> open() override;
 
