@@ -7,7 +7,6 @@
 #include <string>
 #include <vector>
 
-#include "driver/environment_probes.h"
 #include "platform/linux/store/analytics_store.h"
 #include "platform/linux/store/sqlite_analytics_history.h"
 #include "platform/platform_with.h"
@@ -119,7 +118,8 @@ void writeWholeReport(benchmark::State& state) {
   for (auto _ : state) {
     fake.logSubmission.logs.clear();
     fake.systemLog.lines.clear();
-    TBReport(platform).writeLogForYesterdayWithAppInfo(kDay, PlistValue());
+    TBReport(platform, {[] { return 0; }, [] { return 0; }})
+        .writeLogForYesterdayWithAppInfo(kDay, PlistValue());
   }
   if (fake.logSubmission.logs.empty()) state.SkipWithError("no report was written");
   state.SetItemsProcessed((state.range(0) + state.range(1)) * state.iterations());

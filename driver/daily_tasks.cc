@@ -1,6 +1,7 @@
 #include "driver/daily_tasks.h"
 
 #include "driver/device_metrics.h"
+#include "driver/environment_probes.h"
 #include "driver/tasking.h"
 #include "platform/log_submission.h"
 #include "platform/preferences_store.h"
@@ -21,7 +22,7 @@ void RunDailyTasks(Platform& platform, DayNumber day, const PlistValue& appInfo)
   platform.systemLog.message(LogLevel::Default, "daily tasks for day %d", day);
   platform.analyticsClient.checkpoint();
   if (platform.logSubmission.isDiagnosticLogSubmissionEnabled()) {
-    TBReport report(platform);
+    TBReport report(platform, storeProbes(platform));
     report.writeLogForYesterdayWithAppInfo(day, appInfo);
   }
   CollectDailyDeviceMetrics(platform);

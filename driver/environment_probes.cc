@@ -1,6 +1,6 @@
 #include "driver/environment_probes.h"
 
-#include "platform/device_answers.h"
+#include "platform/analytics_home.h"
 #include "platform/dynamic_loader.h"
 #include "platform/file_system.h"
 #include "platform/system_log.h"
@@ -11,45 +11,27 @@ EnvironmentProbeCache gEnvironmentProbeCache;
 
 namespace {
 
-constexpr std::string_view kSingleUserHome = "/var/mobile";
-constexpr std::string_view kMultiUserContainer = "systemgroup.com.velmora.sysmetrics";
-constexpr std::string_view kForceMultiUserMarker = "/var/db/forceMultiUserMode";
 constexpr std::string_view kSupportLibrary =
     "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
 constexpr const char* kCorruptionCountKey = "DatabaseCorruptionCount";
 constexpr const char* kCorruptionCountDomain = "com.velmora.tallyd";
 constexpr std::int64_t kBytesPerMiB = 1048576;
 
-bool decideMultiUser(Platform& platform) {
-  if (platform.deviceAnswers.booleanAnswer("InternalBuild") &&
-      platform.fileSystem.status(kForceMultiUserMarker)) {
-    platform.systemLog.message(
-        LogLevel::Default,
-        "Forcing Multi User Mode behavior due to the presence of /var/db/forceMultiUserMode");
-    return true;
-  }
-  return platform.deviceAnswers.multiUserMode().value_or(false);
-}
-
 }  // namespace
 
 const std::string* GetAnalyticsHomePath(Platform& platform) {
-  EnvironmentProbeCache& cache = gEnvironmentProbeCache;
-  if (cache.homePath) return &*cache.homePath;
-  if (!cache.multiUser) cache.multiUser = decideMultiUser(platform);
-  if (!*cache.multiUser) return &cache.homePath.emplace(kSingleUserHome);
-
-  SystemGroupContainer container = platform.deviceAnswers.systemGroupContainerPath(kMultiUserContainer);
-  if (!container.path) {
-    platform.systemLog.message(LogLevel::Default, "Error getting system group container: %llu",
-                               container.error);
-    return nullptr;
+  const AnalyticsHome::Answer home = platform.analyticsHome.find();
+  bool& isForcedModeLogged = gEnvironmentProbeCache.isForcedModeLogged;
+  if (home.mode == UserMode::ForcedMultiUser && !isForcedModeLogged) {
+    platform.systemLog.message(
+        LogLevel::Default,
+        "Forcing Multi User Mode behavior due to the presence of /var/db/forceMultiUserMode");
+    isForcedModeLogged = true;
   }
-  return &cache.homePath.emplace(std::move(*container.path));
-}
-
-std::string analyticsDatabasePath(const std::string& homePath) {
-  return homePath + "/Library/Tallybook/TBDataStore.sqlitedb";
+  if (home.path == nullptr) {
+    platform.systemLog.message(LogLevel::Default, "Error getting system group container: %llu", home.error);
+  }
+  return home.path;
 }
 
 std::int64_t GetDatabaseSizeMB(Platform& platform) {
@@ -85,6 +67,11 @@ std::int64_t TakeDatabaseCorruptionCount(Platform& platform) {
   const std::int64_t count = cache.getInteger(kCorruptionCountKey, kCorruptionCountDomain, nullptr);
   cache.setValue(kCorruptionCountKey, 0, kCorruptionCountDomain);
   return count;
+}
+
+StoreProbes storeProbes(Platform& platform) {
+  return {[&platform] { return GetDatabaseSizeMB(platform); },
+          [&platform] { return TakeDatabaseCorruptionCount(platform); }};
 }
 
 }  // namespace tbdaily

@@ -1,14 +1,14 @@
 // Small probes of the analytics store's surroundings: where it lives, how large it is, how often it was found
 // damaged.
 //
-// Answers are cached for the life of the process. For the main thread only.
+// For the main thread only.
 #pragma once
 
 #include <cstdint>
-#include <optional>
 #include <string>
 
 #include "platform/platform.h"
+#include "report/store_probes.h"
 
 namespace tbdaily {
 
@@ -19,19 +19,15 @@ using PreferencesSetValue = void (*)(const char* key, std::int64_t value, const 
 
 // What the probes keep for the life of the process; tests put a fresh one in its place.
 struct EnvironmentProbeCache {
-  std::optional<bool> multiUser;
-  std::optional<std::string> homePath;
+  bool isForcedModeLogged = false;
   PreferencesGetInteger getInteger = nullptr;
   PreferencesSetValue setValue = nullptr;
 };
 extern EnvironmentProbeCache gEnvironmentProbeCache;
 
 // The folder that holds the analytics data, or null when a multi-user device's container cannot be found
-// (which is tried again at the next call). Owned by the cache.
+// (which is tried again at the next call). Owned by the platform's AnalyticsHome.
 const std::string* GetAnalyticsHomePath(Platform& platform);
-
-// The analytics database file's path under a home path.
-std::string analyticsDatabasePath(const std::string& homePath);
 
 // Size of the analytics database file in whole MiB, or -1 when it cannot be examined.
 std::int64_t GetDatabaseSizeMB(Platform& platform);
@@ -39,6 +35,9 @@ std::int64_t GetDatabaseSizeMB(Platform& platform);
 // The corruption counter, which is then reset to 0. When the preference functions cannot be bound: 0, and no
 // reset.
 std::int64_t TakeDatabaseCorruptionCount(Platform& platform);
+
+// The size and the corruption count for a report. Borrows the platform.
+StoreProbes storeProbes(Platform& platform);
 
 // Binds the two preference functions, as far as they can be.
 void LinkPreferenceFunctions(Platform& platform);

@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include "platform/platform_with.h"
 #include "testing/fake_platform.h"
 
 namespace tbdaily {
@@ -30,10 +31,11 @@ TEST_F(EnvironmentProbesTest, TheMarkerForcesMultiUserModeOnInternalBuildsOnly) 
   fake_.deviceAnswers.containers[kContainer] = "/group";
   EXPECT_EQ(*GetAnalyticsHomePath(fake_.platform), "/var/mobile");
 
-  gEnvironmentProbeCache = {};
+  AnalyticsHome internalDevice(fake_.deviceAnswers, fake_.fileSystem);
+  Platform platform = platformWith(fake_.platform, internalDevice);
   fake_.deviceAnswers.answers.set("InternalBuild", PlistValue::boolean(true));
   fake_.deviceAnswers.multiUser = false;
-  for (int i = 0; i < 2; ++i) EXPECT_EQ(*GetAnalyticsHomePath(fake_.platform), "/group");
+  for (int i = 0; i < 2; ++i) EXPECT_EQ(*GetAnalyticsHomePath(platform), "/group");
   EXPECT_THAT(fake_.systemLog.lines,
               ElementsAre("default: Forcing Multi User Mode behavior due to the presence of "
                           "/var/db/forceMultiUserMode"));

@@ -7,6 +7,7 @@ namespace tbdaily {
 
 class AnalyticsClient;
 class AnalyticsHistory;
+class AnalyticsHome;
 class AppRegistry;
 class DeviceAnswers;
 class DriverRegistry;
@@ -43,6 +44,7 @@ struct Platform {
   FileSystem& fileSystem;
   DynamicLoader& dynamicLoader;
   MessageDigest& messageDigest;
+  AnalyticsHome& analyticsHome;  // no family of its own: a rule over two of them
 };
 
 }  // namespace tbdaily

@@ -2,6 +2,7 @@
 
 #include <limits>
 #include <new>
+#include <utility>
 
 #include "platform/system_log.h"
 #include "report/distribution_summary.h"
@@ -47,7 +48,8 @@ class Histogram {
 
 }  // namespace
 
-TBReport::TBReport(Platform& platform) : platform_(platform), _config(TBConfig::init(platform)) {}
+TBReport::TBReport(Platform& platform, StoreProbes storeProbes)
+    : platform_(platform), storeProbes_(std::move(storeProbes)), _config(TBConfig::init(platform)) {}
 
 void TBReport::writeLogForYesterdayWithAppInfo(DayNumber day, const PlistValue& appInfo) {
   platform_.systemLog.message(LogLevel::Info, "writing tallyd log. yesterday=%d", day);

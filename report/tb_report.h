@@ -10,6 +10,7 @@
 #include "platform/analytics_history.h"
 #include "platform/platform.h"
 #include "platform/plist_value.h"
+#include "report/store_probes.h"
 #include "report/tb_config.h"
 
 namespace tbdaily {
@@ -18,7 +19,7 @@ namespace tbdaily {
 class TBReport {
  public:
   // Loads the whitelist. Without one the report stays empty and is not written.
-  explicit TBReport(Platform& platform);
+  TBReport(Platform& platform, StoreProbes storeProbes);
 
   // Reads the rows of the day (and of the day before it), keeps what the whitelist allows, and writes the
   // report. `appInfo` is an array of AppInfoRecord, or none.
@@ -58,6 +59,7 @@ class TBReport {
   PlistValue noteOSVersion();
 
   Platform& platform_;
+  const StoreProbes storeProbes_;
   std::unique_ptr<TBConfig> _config;
   PlistDictionary _scalarsOutput;
   PlistDictionary _distributionsOutput;

@@ -3,7 +3,6 @@
 #include <array>
 #include <vector>
 
-#include "driver/environment_probes.h"
 #include "platform/app_registry.h"
 #include "platform/byte_reader.h"
 #include "platform/kernel.h"
@@ -85,9 +84,8 @@ void TBReport::addMetadataKeys() {
 }
 
 void TBReport::reportDatabaseSize() {
-  addScalarForKeyByExecutingBlock(kDatabaseSizeKey, [this] { return GetDatabaseSizeMB(platform_); });
-  addScalarForKeyByExecutingBlock(kDatabaseCorruptionsKey,
-                                  [this] { return TakeDatabaseCorruptionCount(platform_); });
+  addScalarForKeyByExecutingBlock(kDatabaseSizeKey, storeProbes_.databaseSizeMB);
+  addScalarForKeyByExecutingBlock(kDatabaseCorruptionsKey, storeProbes_.takeCorruptionCount);
 }
 
 void TBReport::reportCPUUptime() {

@@ -2,7 +2,6 @@
 
 #include <gmock/gmock.h>
 
-#include "driver/environment_probes.h"
 #include "report/internal_device.h"
 #include "testing/fake_platform.h"
 
@@ -31,7 +30,6 @@ class TBReportTest : public ::testing::Test {
  protected:
   TBReportTest() {
     gInternalDeviceAnswer.once.reset();
-    gEnvironmentProbeCache = {};
     fake_.logSubmission.osVersion = "17.4";
     fake_.analyticsHistory.addScalar("k", kDay, 1);
     allow({"k"});
@@ -45,7 +43,8 @@ class TBReportTest : public ::testing::Test {
         {{"G", dict({{"ScalarKeys", dict(keys)}, {"DistributionKeys", dict(std::move(distributions))}})}});
   }
   void writeLog(const PlistValue& appInfo = {}) {
-    TBReport(fake_.platform).writeLogForYesterdayWithAppInfo(kDay, appInfo);
+    TBReport(fake_.platform, {[] { return 1; }, [] { return 7; }})
+        .writeLogForYesterdayWithAppInfo(kDay, appInfo);
   }
   // The root of the report that this writes.
   PlistDictionary write(const PlistValue& appInfo = {}) {
@@ -147,7 +146,7 @@ TEST_F(TBReportTest, MeasuresTheSystem) {
   const PlistDictionary measured = {{"k", number(1)},
                                     {"com.velmora.homedeck.numThirdPartyApps", number(2)},
                                     {"com.velmora.sysmetrics.tbkd.database.size", number(1)},
-                                    {"com.velmora.sysmetrics.tbkd.database.corruptions", number(0)},
+                                    {"com.velmora.sysmetrics.tbkd.database.corruptions", number(7)},
                                     {"com.velmora.usage.cur_boot_session_cpu_uptime", number(2500)},
                                     {"com.velmora.kernel.memorystatus_freeze_count", number(4294967295)},
                                     {"com.velmora.kernel.memorystatus_freeze_pageouts", number(-1)},

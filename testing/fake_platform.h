@@ -1,6 +1,7 @@
 // A platform of fakes: `FakePlatform fake; RunDailyTasks(fake.platform, ...)`.
 #pragma once
 
+#include "platform/analytics_home.h"
 #include "platform/platform.h"
 #include "testing/fake_analytics.h"
 #include "testing/fake_drivers.h"
@@ -33,11 +34,12 @@ struct FakePlatform {
   FakeFileSystem fileSystem;
   FakeDynamicLoader dynamicLoader;
   FakeMessageDigest messageDigest;
+  AnalyticsHome analyticsHome{deviceAnswers, fileSystem};
 
   Platform platform{driverRegistry,   preferences,       deviceAnswers, logSubmission, analyticsClient,
                     analyticsHistory, propertyListCodec, stackSnapshot, usageService,  appRegistry,
                     localeSettings,   serviceListener,   notifications, systemLog,     kernel,
-                    fileSystem,       dynamicLoader,     messageDigest};
+                    fileSystem,       dynamicLoader,     messageDigest, analyticsHome};
 
   // Puts a property list into a file, through the fake codec.
   void putPlist(std::string_view path, const PlistDictionary& root) {

@@ -35,7 +35,8 @@ struct LinuxPlatform::Families {
   LinuxFileSystem fileSystem{host};
   LinuxPreferences preferences{host, codec};
   LinuxLogSubmission logSubmission{host, recordings, codec, preferences, kernel};
-  AnalyticsStoreLocator storeLocator = analyticsStoreLocator(host, deviceAnswers, fileSystem);
+  AnalyticsHome analyticsHome{deviceAnswers, fileSystem};
+  AnalyticsStoreLocator storeLocator = analyticsStoreLocator(host, analyticsHome);
   SqliteAnalyticsClient analyticsClient{storeLocator, kernel};
   SqliteAnalyticsHistory analyticsHistory{storeLocator};
   LinuxAppRegistry appRegistry{host, recordings};
@@ -52,7 +53,7 @@ struct LinuxPlatform::Families {
   Platform services{driverRegistry,   preferences,     deviceAnswers, logSubmission, analyticsClient,
                     analyticsHistory, codec,           stackSnapshot, usageService,  appRegistry,
                     localeSettings,   serviceListener, notifications, systemLog,     kernel,
-                    fileSystem,       dynamicLoader,   messageDigest};
+                    fileSystem,       dynamicLoader,   messageDigest, analyticsHome};
 };
 
 LinuxPlatform::LinuxPlatform(Host host) : families_(std::make_unique<Families>(std::move(host))) {}

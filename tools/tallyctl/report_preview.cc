@@ -2,6 +2,7 @@
 
 #include "driver/daily_tasks.h"
 #include "driver/environment_probes.h"
+#include "platform/analytics_home.h"
 #include "platform/dynamic_loader.h"
 #include "platform/file_system.h"
 #include "platform/kernel.h"
@@ -124,7 +125,7 @@ std::string whyNothing(const CapturedLog& log, DayNumber day) {
 
 ReportPreview previewReport(LinuxPlatform& linux, std::optional<DayNumber> day) {
   Platform& real = linux.services();
-  const std::string* home = GetAnalyticsHomePath(real);
+  const std::string* home = real.analyticsHome.find().path;
   const std::string storePath = home != nullptr ? analyticsDatabasePath(*home) : "";
   const StoreCopy copy(home != nullptr ? linux.host().devicePath(storePath) : std::filesystem::path());
   if (!copy.error().empty()) return {{}, copy.error()};
@@ -140,7 +141,7 @@ ReportPreview previewReport(LinuxPlatform& linux, std::optional<DayNumber> day) 
   Platform preview = platformWith(real, preferences, submission, history, log, fileSystem, loader);
 
   const DayNumber wanted = day ? *day : dayBefore(real.analyticsClient.currentDayNumber());
-  TBReport(preview).writeLogForYesterdayWithAppInfo(wanted, PlistValue());
+  TBReport(preview, storeProbes(preview)).writeLogForYesterdayWithAppInfo(wanted, PlistValue());
   if (submission.output.bytes.empty()) return {{}, whyNothing(log, wanted)};
   PlistParseResult parsed = real.propertyListCodec.parse(submission.output.bytes);
   return {std::move(parsed.value), std::move(parsed.error)};

@@ -254,28 +254,19 @@ TEST_F(AnalyticsStoreTest, EndsAtADamagedPageOfALargeStore) {
   EXPECT_TRUE(delivered > 100000 && delivered < values.size()) << delivered;
 }
 
-TEST(AnalyticsHome, IsTheContainerInMultiUserModeAndIsAskedForUntilItIsFound) {
+TEST(AnalyticsStoreLocator, FollowsTheAnalyticsHomeAndMakesNoRoot) {
   testing::FakeDeviceAnswers device;
   testing::FakeFileSystem files;
-  const testing::TemporaryFolder root;
-  const Host host(root.path(), false);
-  const auto place = [&] { return analyticsStoreLocator(host, device, files)().value_or("none"); };
-  const fs::path single = root.path() / "var/mobile/Library/Tallybook/TBDataStore.sqlitedb";
-  EXPECT_EQ(place(), single);
-  files.files["/var/db/forceMultiUserMode"] = {};
-  EXPECT_EQ(place(), single);
-  device.answers.set("InternalBuild", PlistValue::boolean(true));
-  EXPECT_EQ(place(), "none");
-  device.answers.set("InternalBuild", PlistValue());
+  AnalyticsHome home(device, files);
   device.multiUser = true;
-  const AnalyticsStoreLocator locate = analyticsStoreLocator(host, device, files);
+  const testing::TemporaryFolder root;
+  const Host host(root.path(), false), absent(root.path() / "absent", false);
+  const AnalyticsStoreLocator locate = analyticsStoreLocator(host, home);
   EXPECT_EQ(locate(), std::nullopt);
   EXPECT_EQ(testing::scalarLines(*SqliteAnalyticsHistory(locate).open()), Lines{});
   device.containers["systemgroup.com.velmora.sysmetrics"] = "/group";
   EXPECT_EQ(locate(), root.path() / "group/Library/Tallybook/TBDataStore.sqlitedb");
-
-  const Host absent(root.path() / "absent", false);
-  EXPECT_EQ(analyticsStoreLocator(absent, device, files)(), std::nullopt);
+  EXPECT_EQ(analyticsStoreLocator(absent, home)(), std::nullopt);
   EXPECT_FALSE(fs::exists(absent.root()));
 }
 

@@ -7,7 +7,7 @@
 #include <cerrno>
 
 #include "driver/daily_tasks.h"
-#include "driver/environment_probes.h"
+#include "platform/analytics_home.h"
 #include "platform/linux/file_io.h"
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"

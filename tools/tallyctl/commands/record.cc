@@ -8,7 +8,7 @@
 #include <cerrno>
 #include <cstdio>
 
-#include "driver/environment_probes.h"
+#include "platform/analytics_home.h"
 #include "platform/kernel.h"
 #include "tools/tallyctl/tool.h"
 
@@ -19,7 +19,7 @@ namespace {
 // The store of the device, or nothing, with the reason said.
 std::unique_ptr<AnalyticsStore> deviceStore(Tool& tool) {
   const Host& host = tool.platform().host();
-  const std::string* home = GetAnalyticsHomePath(tool.platform().services());
+  const std::string* home = tool.platform().services().analyticsHome.find().path;
   if (home == nullptr) {
     tool.fail("the device is in multi-user mode and its analytics container cannot be found");
     return nullptr;
