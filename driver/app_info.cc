@@ -1,6 +1,6 @@
 #include "driver/app_info.h"
 
-#include "platform/service_listener.h"
+#include "platform/uuid.h"
 
 namespace tbdaily {
 
@@ -8,16 +8,15 @@ namespace {
 
 // None when the element does not hold all five fields.
 PlistValue appInfoRecord(const PlistValue& element) {
-  const PlistDictionary* app = element.asDictionary();
-  if (app == nullptr) return {};
-  const auto bundle = messageText(*app, "bundle_id");
-  const auto version = messageText(*app, "version");
-  const auto kestrelID = messageValue(*app, "kestrel_id").asInteger();
-  const auto arch = messageValue(*app, "arch").asInteger();
-  const auto uuid = messageUuid(*app, "uuid");
-  if (!bundle || !version || !kestrelID || !arch || !uuid) return {};
-  return PlistValue::dictionary({{"bundle", PlistValue::string(std::string(*bundle))},
-                                 {"version", PlistValue::string(std::string(*version))},
+  const PlistValue bundle = element.get("bundle_id");
+  const PlistValue version = element.get("version");
+  const auto kestrelID = element.get("kestrel_id").asInteger();
+  const auto arch = element.get("arch").asInteger();
+  const PlistValue uuidData = element.get("uuid");
+  const auto uuid = uuidData.asData() ? uuidOf(*uuidData.asData()) : std::nullopt;
+  if (!bundle.asString() || !version.asString() || !kestrelID || !arch || !uuid) return {};
+  return PlistValue::dictionary({{"bundle", bundle},
+                                 {"version", version},
                                  {"kestrelID", PlistValue::int64(*kestrelID)},
                                  {"arch", PlistValue::int64(*arch)},
                                  {"uuid", PlistValue::string(uuidText(*uuid))}});
@@ -25,12 +24,15 @@ PlistValue appInfoRecord(const PlistValue& element) {
 
 }  // namespace
 
-PlistValue appInfoFromMessage(const PlistDictionary& message) {
+PlistValue appInfoFromMessage(const PlistValue& message) {
   PlistArray records;
-  forEachElement(messageValue(message, "app_data"), [&records](const PlistValue& element) {
-    PlistValue record = appInfoRecord(element);
-    if (!record.isNone()) records.push_back(std::move(record));
-  });
+  const PlistValue elements = message.get("app_data");
+  if (const PlistArray* list = elements.asArray()) {
+    for (const PlistValue& element : *list) {
+      PlistValue record = appInfoRecord(element);
+      if (!record.isNone()) records.push_back(std::move(record));
+    }
+  }
   return PlistValue::array(std::move(records));
 }
 

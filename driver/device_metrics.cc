@@ -57,8 +57,7 @@ PlistDictionary eccEventLog(std::span<const std::byte> record) {
 void CollectDiskUsage(Platform& platform) {
   const PlistValue answer = platform.deviceAnswers.copyAnswer("DiskUsage");
   for (const DiskFigure& figure : kDiskFigures) {
-    const PlistDictionary* usage = answer.asDictionary();
-    const auto bytes = usage != nullptr ? usage->get(figure.answerKey).asNumber() : std::nullopt;
+    const auto bytes = answer.get(figure.answerKey).asNumber();
     const std::int64_t mebibytes = bytes ? bytes->toInt64() >> kMiBShift : kNotAvailable;
     platform.analyticsClient.setValueForScalarKey(figure.scalarKey, mebibytes);
   }

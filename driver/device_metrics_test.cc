@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include "platform/plist_text.h"
 #include "testing/fake_platform.h"
 
 namespace tbdaily {

@@ -5,6 +5,7 @@
 #include "driver/daily_tasks.h"
 #include "driver/environment_probes.h"
 #include "driver/service_endpoint.h"
+#include "platform/plist_text.h"
 #include "report/internal_device.h"
 #include "report/tb_config.h"
 #include "testing/fake_platform.h"

@@ -3,6 +3,7 @@
 #include <string>
 
 #include "driver/entry.h"
+#include "platform/linux/host_notes.h"
 #include "platform/linux/linux_platform.h"
 
 int main(int argc, char** argv) {
@@ -14,7 +15,7 @@ int main(int argc, char** argv) {
     tbdaily::LinuxPlatform platform(tbdaily::Host::fromEnvironment());
     return tbdaily::runEntry(platform.services(), argc, argv);
   } catch (const std::exception& failure) {
-    tbdaily::Host::noteOnce(std::string("the run ended early: ") + failure.what());
+    tbdaily::noteOnce(std::string("the run ended early: ") + failure.what());
   }
   return 0;
 }

@@ -9,6 +9,13 @@ namespace tbdaily {
 
 CommandState gCommandState;
 
+namespace {
+// A field that is absent or of another kind reads as 0.
+std::int64_t integerField(const PlistValue& message, std::string_view field) {
+  return message.get(field).asInteger().value_or(0);
+}
+}  // namespace
+
 void HandleNewConnection(Platform& platform, const ServiceEvent& event) {
   if (event.kind != ServiceEventKind::NewPeer) return;
   ServiceListener& listener = platform.serviceListener;
@@ -20,7 +27,7 @@ void HandleNewConnection(Platform& platform, const ServiceEvent& event) {
 
 void HandlePeerMessage(Platform& platform, const ServiceEvent& event) {
   if (event.kind != ServiceEventKind::Message) return;
-  const auto operation = static_cast<Operation>(messageInteger(event.message, "operation") & 0xFFFFFFFF);
+  const auto operation = static_cast<Operation>(integerField(event.message, "operation") & 0xFFFFFFFF);
   if (operation != Operation::ActivatedAppInfo) {
     gCommandState.commandOnce.run([&] { HandleCommandOnce(platform, event.message, operation); });
     return;
@@ -34,9 +41,9 @@ void HandlePeerMessage(Platform& platform, const ServiceEvent& event) {
   gCommandState.gAppInfoRequested = false;
 }
 
-void HandleCommandOnce(Platform& platform, const PlistDictionary& message, Operation operation) {
+void HandleCommandOnce(Platform& platform, const PlistValue& message, Operation operation) {
   if (operation == Operation::RunForDay) {
-    RunDailyTasks(platform, static_cast<DayNumber>(messageInteger(message, "value") & 0xFFFFFFFF),
+    RunDailyTasks(platform, static_cast<DayNumber>(integerField(message, "value") & 0xFFFFFFFF),
                   PlistValue());
   } else if (operation == Operation::LoggingStatus) {
     gCommandState.gAppInfoRequested = true;

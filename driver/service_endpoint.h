@@ -34,6 +34,6 @@ void HandlePeerMessage(Platform& platform, const ServiceEvent& event);
 
 // Runs the day's work for a given day, or asks the system for the activated-app info. At most once in a
 // process.
-void HandleCommandOnce(Platform& platform, const PlistDictionary& message, Operation operation);
+void HandleCommandOnce(Platform& platform, const PlistValue& message, Operation operation);
 
 }  // namespace tbdaily

@@ -18,10 +18,6 @@ namespace {
 
 constexpr std::string_view kJob = preference_domain::kJob;
 
-PlistValue entryOf(const PlistValue& dictionary, std::string_view key) {
-  return dictionary.asDictionary() != nullptr ? dictionary.asDictionary()->get(key) : PlistValue();
-}
-
 std::int32_t saturatingInt32(std::int64_t value) {
   using Limits = std::numeric_limits<std::int32_t>;
   return static_cast<std::int32_t>(std::clamp<std::int64_t>(value, Limits::min(), Limits::max()));
@@ -120,10 +116,10 @@ void submitOnAggressiveDays(Platform& platform, DayNumber today, const OSUpdate&
 }  // namespace
 
 PlistValue OSUpdate::version() const {
-  return entryOf(record, "version");
+  return record.get("version");
 }
 DayNumber OSUpdate::day() const {
-  return integer32(entryOf(record, "day"));
+  return integer32(record.get("day"));
 }
 
 OSUpdate lastOSUpdate(PreferencesStore& preferences) {
@@ -134,11 +130,10 @@ std::vector<TaskingItem> taskingItems(const PlistArray& payload) {
   std::vector<TaskingItem> items;
   items.reserve(payload.size());
   for (const PlistValue& element : payload) {
-    const PlistDictionary* item = element.asDictionary();
-    const PlistValue* domain = item != nullptr ? item->find("Domain") : nullptr;
-    const PlistValue* key = item != nullptr ? item->find("Key") : nullptr;
-    if (domain == nullptr || key == nullptr || !domain->asString() || !key->asString()) continue;
-    items.push_back({*domain->asString(), *key->asString(), item->get("Value")});
+    // Both texts are shared with the payload, and live as long as it does.
+    const PlistValue domain = element.get("Domain"), key = element.get("Key");
+    if (domain.asString() && key.asString())
+      items.push_back({*domain.asString(), *key.asString(), element.get("Value")});
   }
   return items;
 }
@@ -171,7 +166,7 @@ void HandleTaskingAndOSChange(Platform& platform) {
 
   const PlistValue scheduled =
       platform.preferences.getValue("ScheduledTasking", preference_domain::kLogSubmission);
-  const PlistValue id = entryOf(scheduled, "TaskingID");
+  const PlistValue id = scheduled.get("TaskingID");
   if (!id.asString()) return;
   TaskingStep(platform, *scheduled.asDictionary(), *id.asString(), build).run();
   submitOnAggressiveDays(platform, today, last);

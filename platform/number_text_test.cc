@@ -7,6 +7,8 @@
 #include <limits>
 #include <random>
 
+#include "platform/calendar.h"
+
 namespace tbdaily {
 namespace {
 

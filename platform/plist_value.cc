@@ -107,6 +107,16 @@ const PlistDictionary* PlistValue::asDictionary() const {
   return entries != nullptr ? entries->get() : nullptr;
 }
 
+PlistValue PlistValue::get(std::string_view key) const {
+  const PlistDictionary* dictionary = asDictionary();
+  return dictionary != nullptr ? dictionary->get(key) : PlistValue();
+}
+
+PlistDictionary PlistValue::mutableDictionary() const {
+  const PlistDictionary* dictionary = asDictionary();
+  return dictionary != nullptr ? *dictionary : PlistDictionary();
+}
+
 bool operator==(const PlistValue& a, const PlistValue& b) {
   if (a.value_.index() != b.value_.index()) return false;
   return std::visit(

@@ -107,6 +107,10 @@ class PlistValue {
   std::optional<std::span<const std::byte>> asData() const;
   const PlistArray* asArray() const;
   const PlistDictionary* asDictionary() const;
+  // The value of the key; none unless this is a dictionary that has it.
+  PlistValue get(std::string_view key) const;
+  // A copy to change; an empty one unless this is a dictionary.
+  PlistDictionary mutableDictionary() const;
 
   // Same kind and equal contents. Dictionaries are equal when they hold equal entries, in whatever order.
   // Nesting is limited by the codec's reader, not here.
@@ -132,6 +136,8 @@ class PlistDictionary {
   const PlistValue* find(std::string_view key) const;
   // The value of the key, or none.
   PlistValue get(std::string_view key) const;
+  // A copy to change; an empty one unless this is a dictionary.
+  PlistDictionary mutableDictionary() const;
   bool contains(std::string_view key) const { return find(key) != nullptr; }
   // The key's place in the order of the keys.
   std::optional<std::size_t> positionOf(std::string_view key) const;

@@ -3,12 +3,8 @@
 // Absent service: no endpoint can be created; a slice times out.
 #pragma once
 
-#include <array>
-#include <cstddef>
 #include <cstdint>
 #include <functional>
-#include <optional>
-#include <string>
 #include <string_view>
 
 #include "platform/plist_value.h"
@@ -23,7 +19,7 @@ enum class ServiceEventKind : std::uint8_t { NewPeer, Message, Error };
 struct ServiceEvent {
   ServiceEventKind kind = ServiceEventKind::Error;
   ServiceConnection peer = 0;  // NewPeer: the new connection
-  PlistDictionary message;     // Message: what was received
+  PlistValue message;          // Message: a dictionary, what was received
 };
 
 using ServiceEventHandler = std::function<void(const ServiceEvent&)>;
@@ -33,8 +29,6 @@ using ServiceEventHandler = std::function<void(const ServiceEvent&)>;
 enum class DeliveryQueue : std::uint8_t { Main };
 
 enum class SliceResult : std::uint8_t { Finished, Stopped, TimedOut, HandledEvent };
-
-using UuidBytes = std::array<std::byte, 16>;
 
 class ServiceListener {
  public:
@@ -50,16 +44,5 @@ class ServiceListener {
   // Runs the main event loop in its default mode until one event was handled, at most for `seconds`.
   virtual SliceResult runSlice(double seconds) = 0;
 };
-
-// Message fields. A field that is absent or of another type reads as 0 or none.
-std::int64_t messageInteger(const PlistDictionary& message, std::string_view field);
-std::optional<std::string_view> messageText(const PlistDictionary& message, std::string_view field);
-std::optional<UuidBytes> messageUuid(const PlistDictionary& message, std::string_view field);
-PlistValue messageValue(const PlistDictionary& message, std::string_view field);
-// Visits every element in order; an absent or other value has none.
-void forEachElement(const PlistValue& array, const std::function<void(const PlistValue& element)>& visit);
-
-// The 36-character text, in upper case.
-std::string uuidText(const UuidBytes& uuid);
 
 }  // namespace tbdaily

@@ -66,9 +66,4 @@ class SystemLog {
 std::string formatLogMessage(std::string_view format, std::span<const LogArgument> arguments,
                              bool showPrivate);
 
-// One-line text of a value, for log lines: an absent value "(null)", a string as it is, a number in decimal,
-// a boolean 1 or 0, a date "2026-11-24 09:07:04 +0000", data in hexadecimal, containers with keys and strings
-// quoted.
-std::string plistText(const PlistValue& value);
-
 }  // namespace tbdaily

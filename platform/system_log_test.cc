@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "platform/plist_text.h"
+
 namespace tbdaily {
 namespace {
 

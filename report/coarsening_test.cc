@@ -3,7 +3,7 @@
 #include <cmath>
 #include <limits>
 
-#include "platform/system_log.h"
+#include "platform/plist_text.h"
 #include "report/distribution_summary.h"
 #include "report/scalar_rounding.h"
 

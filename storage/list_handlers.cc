@@ -111,10 +111,7 @@ bool HandleValidityList(Platform& platform, const FetchedList& list, Diagnostics
 bool HandleDefectsList(Platform& platform, const FetchedList& list, Diagnostics& diagnostics) {
   PlistDictionary summary;
   SetNumberValue(summary, "Factory Count", number32(wordAt(list.filled, kWord)), diagnostics);
-  const PlistDictionary* characteristics = list.characteristics.asDictionary();
-  const PlistValue description =
-      characteristics != nullptr ? characteristics->get("nand-device-desc") : PlistValue();
-  if (const auto number = description.asNumber()) {
+  if (const auto number = list.characteristics.get("nand-device-desc").asNumber()) {
     SetNumberValue(summary, "com.velmora.NANDInfo.nandDesc",
                    PlistNumber::int32(static_cast<std::int32_t>(number->toInt64())), diagnostics);
   }

@@ -12,6 +12,7 @@
 
 #include "platform/kernel.h"
 #include "platform/log_submission.h"
+#include "platform/plist_text.h"
 #include "platform/preferences_store.h"
 #include "platform/system_log.h"
 

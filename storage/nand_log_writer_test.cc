@@ -4,7 +4,7 @@
 
 #include <cstdlib>
 
-#include "platform/number_text.h"
+#include "platform/calendar.h"
 #include "platform/platform_with.h"
 #include "testing/fake_platform.h"
 

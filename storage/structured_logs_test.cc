@@ -5,6 +5,7 @@
 #include <cmath>
 #include <limits>
 
+#include "platform/plist_text.h"
 #include "storage/storage_test_support.h"
 #include "storage/write_amplification.h"
 #include "testing/fake_platform.h"

@@ -217,7 +217,7 @@ class FakeServiceListener : public ServiceListener {
     steps.push_back({kListener, {ServiceEventKind::NewPeer, peer, {}}});
   }
   void addMessage(ServiceConnection peer, PlistDictionary message) {
-    steps.push_back({peer, {ServiceEventKind::Message, 0, std::move(message)}});
+    steps.push_back({peer, {ServiceEventKind::Message, 0, PlistValue::dictionary(std::move(message))}});
   }
   void addError(ServiceConnection connection) { steps.push_back({connection, {}}); }
   void addFinishedSlice() { steps.push_back({0, {}}); }

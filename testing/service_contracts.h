@@ -13,6 +13,7 @@
 //   put(path, text), library(), symbolName()  a file; a library that is there and a symbol that it has
 #pragma once
 
+#include "platform/plist_text.h"
 #include "testing/contract_test.h"
 
 namespace tbdaily::testing {
@@ -172,7 +173,8 @@ TYPED_TEST_P(ServiceContract, OneEventASliceGoesToWhatWasResumed) {
   EXPECT_EQ(listener.runSlice(kLong), SliceResult::HandledEvent);
   ASSERT_NE(peer, 0U);
   listener.setDeliveryQueue(peer, DeliveryQueue::Main);
-  listener.setEventHandler(peer, [&](const ServiceEvent& event) { received.push_back(event.message); });
+  listener.setEventHandler(
+      peer, [&](const ServiceEvent& event) { received.push_back(*event.message.asDictionary()); });
   EXPECT_EQ(listener.runSlice(kShort), SliceResult::TimedOut);
   EXPECT_TRUE(received.empty());
   listener.resume(peer);

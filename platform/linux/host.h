@@ -1,11 +1,8 @@
-// What the host layer knows of the machine that it runs on: where the device's file tree lies, whether live
-// sources may be asked, and the one way in which it tells an administrator about trouble.
+// What the host layer knows of the machine that it runs on: where the device's file tree lies, and whether
+// live sources may be asked.
 #pragma once
 
 #include <filesystem>
-#include <mutex>
-#include <set>
-#include <string>
 #include <string_view>
 
 namespace tbdaily {
@@ -30,20 +27,10 @@ class Host {
   // value.
   int makeFolders(const std::filesystem::path& folder) const;
 
-  // One line on standard error, prefixed by the program's name. The same line is written once in the life of
-  // a process, and no more than a thousand altogether.
-  static void noteOnce(const std::string& line);
-  // For a file or folder that could not be written: one line for each kind of failure in the life of a
-  // process, since a root that cannot be written fails every write in the same way.
-  static void noteWriteFailure(const std::filesystem::path& path, int error);
-
  private:
   std::filesystem::path root_;
   bool live_;
   std::filesystem::path liveRoot_;
 };
-
-// "permission denied" and the like, for an errno value.
-std::string errorText(int error);
 
 }  // namespace tbdaily

@@ -5,6 +5,7 @@
 #include "platform/linux/host_identity.h"
 #include "platform/linux/host_test_support.h"
 #include "platform/linux/os_release.h"
+#include "platform/plist_text.h"
 #include "testing/fake_platform.h"  // for the interfaces of all families
 
 namespace tbdaily {

@@ -11,7 +11,7 @@
 #include <span>
 
 #include "platform/hexadecimal.h"
-#include "platform/service_listener.h"
+#include "platform/uuid.h"
 
 namespace tbdaily {
 

@@ -10,6 +10,7 @@
 #include "platform/linux/linux_notifications.h"
 #include "platform/linux/linux_preferences.h"
 #include "platform/linux/log_spool.h"
+#include "platform/plist_text.h"
 #include "platform/system_log.h"
 
 namespace tbdaily {

@@ -57,7 +57,7 @@ struct TestHost {
   void record(std::string_view file, std::string_view key, const PlistValue& value) {
     const std::string place = "/System/Device/" + std::string(file);
     const PlistValue before = parse(text(place));
-    PlistDictionary root = before.asDictionary() != nullptr ? *before.asDictionary() : PlistDictionary();
+    PlistDictionary root = before.mutableDictionary();
     root.set(key, value);
     put(place, codec.write(PlistValue::dictionary(std::move(root))).bytes);
   }

@@ -75,7 +75,7 @@ void LinuxAppRegistry::enumerateBundles(BundleKind kind,
   if (const PlistArray* bundles = recorded.asArray()) {
     for (const PlistValue& entry : *bundles) {
       if (entry.asDictionary() == nullptr) continue;
-      const PlistValue type = entry.asDictionary()->get("type");
+      const PlistValue type = entry.get("type");
       bundle(type.asString().value_or(std::string_view()));
     }
     return;

@@ -45,9 +45,7 @@ std::optional<bool> LinuxDeviceAnswers::multiUserMode() {
 
 SystemGroupContainer LinuxDeviceAnswers::systemGroupContainerPath(std::string_view identifier) {
   constexpr std::uint64_t kNoSuchContainer = 2;
-  const PlistValue containers = recordings_.entry(recording::kAnswers, "GroupContainers");
-  const PlistValue path =
-      containers.asDictionary() != nullptr ? containers.asDictionary()->get(identifier) : PlistValue();
+  const PlistValue path = recordings_.entry(recording::kAnswers, "GroupContainers").get(identifier);
   if (const auto text = path.asString()) return {std::string(*text), 0};
   return {std::nullopt, kNoSuchContainer};
 }

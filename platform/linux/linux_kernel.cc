@@ -8,6 +8,8 @@
 #include <ctime>
 #include <limits>
 
+#include "platform/linux/host_notes.h"
+
 namespace tbdaily {
 
 namespace {
@@ -66,9 +68,7 @@ std::optional<std::uint32_t> unsigned32(const PlistValue& value) {
 }  // namespace
 
 int LinuxKernel::recordedErrno(std::string_view name) {
-  const PlistValue errors = recordings_.entry(recording::kKernel, "errno");
-  if (errors.asDictionary() == nullptr) return 0;
-  const auto number = errors.asDictionary()->get(name).asInteger();
+  const auto number = recordings_.entry(recording::kKernel, "errno").get(name).asInteger();
   constexpr std::int64_t kLimit = std::numeric_limits<int>::max();
   return number && *number > 0 && *number <= kLimit ? static_cast<int>(*number) : 0;
 }
@@ -89,8 +89,7 @@ int LinuxKernel::sysctlByName(std::string_view name, std::span<std::byte> buffer
   if (name == kNextEccEvent) return nextEccEvent(buffer, length);
   if (const int error = recordedErrno(name); error != 0) return error;
 
-  const PlistValue values = recordings_.entry(recording::kKernel, "sysctl");
-  const PlistValue value = values.asDictionary() != nullptr ? values.asDictionary()->get(name) : PlistValue();
+  const PlistValue value = recordings_.entry(recording::kKernel, "sysctl").get(name);
   if (const auto integer = value.asInteger()) return copyInteger(*integer, buffer, length);
   if (const auto data = value.asData()) return copyData(*data, buffer, length);
   if (host_.live() && name == kSwapUsage) return liveSwapUsage(buffer, length);
@@ -118,8 +117,8 @@ std::optional<Timebase> LinuxKernel::timebase() {
 PlistDate LinuxKernel::currentTime() {
   if (const auto now = recordings_.entry(recording::kClock, "now").asDate()) return *now;
   if (!host_.live()) {
-    Host::noteOnce("live sources are off and " + recordings_.path(recording::kClock).native() +
-                   " records no \"now\": the time is 1970-01-01");
+    noteOnce("live sources are off and " + recordings_.path(recording::kClock).native() +
+             " records no \"now\": the time is 1970-01-01");
     return PlistDate::fromUnixSeconds(0);
   }
   const timespec time = clockTime(CLOCK_REALTIME);

@@ -3,6 +3,7 @@
 #include <charconv>
 
 #include "platform/linux/file_io.h"
+#include "platform/linux/host_notes.h"
 
 namespace tbdaily {
 
@@ -21,15 +22,14 @@ std::uint64_t LinuxNotifications::postCount(std::string_view name) const {
 
 void LinuxNotifications::post(std::string_view name) {
   if (!isSafeName(name))
-    return Host::noteOnce("notification \"" + std::string(name.substr(0, 40)) + "\" is refused: bad name");
-  if (const int error = host_.makeFolders(folder()); error != 0)
-    return Host::noteWriteFailure(folder(), error);
+    return noteOnce("notification \"" + std::string(name.substr(0, 40)) + "\" is refused: bad name");
+  if (const int error = host_.makeFolders(folder()); error != 0) return noteWriteFailure(folder(), error);
   const std::filesystem::path lockFile = folder().parent_path() / "notifications.lock";
   FileLock lock;
-  if (const int error = lock.acquire(lockFile); error != 0) return Host::noteWriteFailure(lockFile, error);
+  if (const int error = lock.acquire(lockFile); error != 0) return noteWriteFailure(lockFile, error);
   const std::filesystem::path place = folder() / name;
   const int error = replaceFile(place, std::to_string(postCount(name) + 1) + "\n");
-  if (error != 0) Host::noteWriteFailure(place, error);
+  if (error != 0) noteWriteFailure(place, error);
 }
 
 }  // namespace tbdaily

@@ -4,10 +4,12 @@
 
 #include "platform/linux/linux_app_registry.h"
 #include "platform/linux/linux_device_answers.h"
+#include "platform/linux/linux_dynamic_loader.h"
 #include "platform/linux/linux_file_system.h"
 #include "platform/linux/linux_kernel.h"
 #include "platform/linux/linux_locale_settings.h"
 #include "platform/linux/linux_log_submission.h"
+#include "platform/linux/linux_message_digest.h"
 #include "platform/linux/linux_notifications.h"
 #include "platform/linux/linux_preferences.h"
 #include "platform/linux/linux_service_listener.h"

@@ -8,6 +8,8 @@
 #include <unordered_map>
 #include <vector>
 
+#include "platform/linux/host_notes.h"
+
 namespace tbdaily {
 
 namespace fs = std::filesystem;
@@ -23,9 +25,9 @@ fs::path LinuxPreferences::file(std::string_view domain) const {
 bool LinuxPreferences::acceptsDomain(std::string_view domain) {
   if (isSafeName(domain)) return true;
   constexpr std::size_t kShown = 40;
-  Host::noteOnce("preference domain \"" + std::string(domain.substr(0, kShown)) +
-                 "\" is refused: a domain is 1 to 200 letters, " +
-                 "digits, '.', '-' or '_' and does not begin with '.'");
+  noteOnce("preference domain \"" + std::string(domain.substr(0, kShown)) +
+           "\" is refused: a domain is 1 to 200 letters, " +
+           "digits, '.', '-' or '_' and does not begin with '.'");
   return false;
 }
 
@@ -35,8 +37,7 @@ void LinuxPreferences::read(const fs::path& place, Domain& domain) {
   if (const int error = readRegularFile(place, contents); error != 0) {
     domain.identity = FileIdentity{};  // tried again at the next look
     domain.state = error == ENOENT ? FileState::Missing : FileState::Unreadable;
-    if (error != ENOENT)
-      Host::noteOnce("cannot read preferences " + place.native() + ": " + errorText(error));
+    if (error != ENOENT) noteOnce("cannot read preferences " + place.native() + ": " + errorText(error));
     return;
   }
   domain.identity = contents.identity;
@@ -47,8 +48,8 @@ void LinuxPreferences::read(const fs::path& place, Domain& domain) {
     return;
   }
   domain.state = FileState::Damaged;
-  Host::noteOnce("preferences " + place.native() + " are damaged and read as empty: " +
-                 (parsed.error.empty() ? "the root is no dictionary" : parsed.error));
+  noteOnce("preferences " + place.native() + " are damaged and read as empty: " +
+           (parsed.error.empty() ? "the root is no dictionary" : parsed.error));
 }
 
 LinuxPreferences::Domain& LinuxPreferences::current(std::string_view name) {
@@ -68,7 +69,7 @@ LinuxPreferences::Domain& LinuxPreferences::current(std::string_view name) {
 PlistValue LinuxPreferences::getValue(std::string_view key, std::string_view domain) {
   if (!acceptsDomain(domain)) return {};
   const std::lock_guard guard(mutex_);
-  return current(domain).values.asDictionary()->get(key);
+  return current(domain).values.get(key);
 }
 
 bool LinuxPreferences::moveAside(const fs::path& place) {
@@ -77,15 +78,15 @@ bool LinuxPreferences::moveAside(const fs::path& place) {
     // A link never replaces, so that an earlier damaged file stays too.
     if (::link(place.c_str(), aside.c_str()) == 0) {
       ::unlink(place.c_str());
-      Host::noteOnce("damaged preferences were moved aside as " + aside.native());
+      noteOnce("damaged preferences were moved aside as " + aside.native());
       return true;
     }
     if (errno != EEXIST) {
-      Host::noteWriteFailure(aside, errno);
+      noteWriteFailure(aside, errno);
       return false;
     }
   }
-  Host::noteOnce("too many damaged copies beside " + place.native() + "; remove some of them");
+  noteOnce("too many damaged copies beside " + place.native() + "; remove some of them");
   return false;
 }
 
@@ -93,8 +94,7 @@ bool LinuxPreferences::isWritable(const Change& change, std::string_view name) {
   PlistDictionary alone;
   alone.set(change.key, change.value);
   const PlistWriteResult written = codec_.write(PlistValue::dictionary(std::move(alone)), PlistForm::Exact);
-  if (!written.ok)
-    Host::noteOnce("a preference of " + std::string(name) + " cannot be written: " + written.error);
+  if (!written.ok) noteOnce("a preference of " + std::string(name) + " cannot be written: " + written.error);
   return written.ok;
 }
 
@@ -133,11 +133,10 @@ void LinuxPreferences::changeDomain(std::string_view name, std::span<const Chang
   const bool onlyRemoves =
       std::all_of(changes.begin(), changes.end(), [](const Change& c) { return c.value.isNone(); });
   if (onlyRemoves && !fileIdentity(place)) return;  // nothing to remove, nothing to make
-  if (const int error = host_.makeFolders(folder()); error != 0)
-    return Host::noteWriteFailure(folder(), error);
+  if (const int error = host_.makeFolders(folder()); error != 0) return noteWriteFailure(folder(), error);
   const fs::path lockFile = place.native() + ".lock";
   FileLock lock;
-  if (const int error = lock.acquire(lockFile); error != 0) return Host::noteWriteFailure(lockFile, error);
+  if (const int error = lock.acquire(lockFile); error != 0) return noteWriteFailure(lockFile, error);
 
   Domain& domain = current(name);
   if (domain.state == FileState::Unreadable)
@@ -151,7 +150,7 @@ void LinuxPreferences::changeDomain(std::string_view name, std::span<const Chang
   const std::string bytes = bytesOf(name, domain, changes);
   domain.identity = FileIdentity{};  // read anew at the next look, whatever becomes of the write
   if (bytes.empty()) return;
-  if (const int error = replaceFile(place, bytes); error != 0) Host::noteWriteFailure(place, error);
+  if (const int error = replaceFile(place, bytes); error != 0) noteWriteFailure(place, error);
 }
 
 void LinuxPreferences::setValue(std::string_view key, const PlistValue& value, std::string_view name) {
@@ -177,11 +176,11 @@ void LinuxPreferences::synchronize(std::string_view name) {
   const fs::path place = file(name);
   const FileDescriptor fd(::open(place.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   if (!fd.isOpen()) {
-    if (errno != ENOENT) Host::noteWriteFailure(place, errno);
+    if (errno != ENOENT) noteWriteFailure(place, errno);
     return;
   }
-  if (::fsync(fd.get()) != 0) Host::noteWriteFailure(place, errno);
-  if (const int error = syncFolder(folder()); error != 0) Host::noteWriteFailure(folder(), error);
+  if (::fsync(fd.get()) != 0) noteWriteFailure(place, errno);
+  if (const int error = syncFolder(folder()); error != 0) noteWriteFailure(folder(), error);
 }
 
 }  // namespace tbdaily

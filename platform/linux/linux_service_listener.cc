@@ -11,6 +11,7 @@
 #include <limits>
 #include <thread>
 
+#include "platform/linux/host_notes.h"
 #include "platform/linux/unix_socket.h"
 
 namespace tbdaily {
@@ -70,12 +71,12 @@ ServiceConnection LinuxServiceListener::createListener(std::string_view endpoint
 
   const std::filesystem::path path = endpointPath(host_, endpointName);
   const auto refuse = [&path](int error) -> ServiceConnection {
-    Host::noteOnce("cannot serve " + path.native() + ": " +
-                   (error == EADDRINUSE ? "another job is listening there" : errorText(error)));
+    noteOnce("cannot serve " + path.native() + ": " +
+             (error == EADDRINUSE ? "another job is listening there" : errorText(error)));
     return 0;
   };
   if (const int error = host_.makeFolders(path.parent_path()); error != 0) {
-    Host::noteWriteFailure(path.parent_path(), error);
+    noteWriteFailure(path.parent_path(), error);
     return 0;
   }
   // Two jobs that start at once must not both find the same stale socket.
@@ -110,7 +111,7 @@ void LinuxServiceListener::deliver(ServiceConnection id, const ServiceEvent& eve
 }
 
 bool LinuxServiceListener::fail(ServiceConnection peer, const std::string& reason) {
-  Host::noteOnce("a message to the endpoint was refused: " + reason);
+  noteOnce("a message to the endpoint was refused: " + reason);
   deliver(peer, ServiceEvent{});
   connections_.erase(peer);
   return true;
@@ -126,7 +127,7 @@ bool LinuxServiceListener::acceptPeer(ServiceConnection listener) {
     return false;
   }
   if (!isTrustedPeer(socket.get())) {
-    Host::noteOnce("a peer of another user was refused at the endpoint");
+    noteOnce("a peer of another user was refused at the endpoint");
     return false;
   }
   const ServiceConnection peer = add(std::move(socket), false);
@@ -138,9 +139,9 @@ bool LinuxServiceListener::finishMessage(ServiceConnection peer) {
   std::vector<std::byte>& received = connections_.at(peer).received;
   PlistParseResult parsed = codec_.parse(std::span(received).subspan(kLengthSize));
   received = {};
-  const PlistDictionary* root = parsed.value.asDictionary();
-  if (root == nullptr) return fail(peer, parsed.error.empty() ? "its root is no dictionary" : parsed.error);
-  deliver(peer, ServiceEvent{ServiceEventKind::Message, 0, *root});
+  if (parsed.value.asDictionary() == nullptr)
+    return fail(peer, parsed.error.empty() ? "its root is no dictionary" : parsed.error);
+  deliver(peer, ServiceEvent{ServiceEventKind::Message, 0, std::move(parsed.value)});
   return true;
 }
 

@@ -45,7 +45,7 @@ class EndpointTest : public ::testing::Test {
         const std::string who = std::to_string(peer) + " ";
         events.push_back(received.kind == ServiceEventKind::Error
                              ? who + "error"
-                             : who + std::to_string(messageInteger(received.message, "n")));
+                             : who + std::to_string(received.message.get("n").asInteger().value_or(0)));
       });
       listener.resume(peer);
     });

@@ -7,7 +7,8 @@
 #include <cerrno>
 #include <cstdlib>
 
-#include "platform/number_text.h"
+#include "platform/calendar.h"
+#include "platform/linux/host_notes.h"
 
 namespace tbdaily {
 
@@ -84,13 +85,13 @@ void LinuxSystemLog::append(const std::string& lines) {
   const std::filesystem::path place = host_.devicePath("/var/log/tbdaily.log");
   if (!file_.isOpen()) {
     if (const int error = host_.makeFolders(place.parent_path()); error != 0) {
-      return Host::noteWriteFailure(place.parent_path(), error);
+      return noteWriteFailure(place.parent_path(), error);
     }
     file_ = FileDescriptor(
         ::open(place.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOCTTY | O_NONBLOCK, 0600));
-    if (!file_.isOpen()) return Host::noteWriteFailure(place, errno);
+    if (!file_.isOpen()) return noteWriteFailure(place, errno);
   }
-  if (const int error = writeAll(file_.get(), lines); error != 0) Host::noteWriteFailure(place, error);
+  if (const int error = writeAll(file_.get(), lines); error != 0) noteWriteFailure(place, error);
 }
 
 }  // namespace tbdaily

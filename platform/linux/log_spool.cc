@@ -8,8 +8,9 @@
 #include <cstdio>
 #include <vector>
 
+#include "platform/calendar.h"
 #include "platform/linux/file_io.h"
-#include "platform/number_text.h"
+#include "platform/linux/host_notes.h"
 #include "platform/plist/json.h"
 
 namespace tbdaily {
@@ -115,7 +116,7 @@ bool LogSpool::writePending(std::string_view type, std::string_view name, const 
   const PlistWriteResult meta =
       codec_.write(PlistValue::dictionary(std::move(description)), PlistForm::Plain);
   if (!meta.ok) {
-    Host::noteOnce("the log " + std::string(name) + " cannot be described: " + meta.error);
+    noteOnce("the log " + std::string(name) + " cannot be described: " + meta.error);
     return false;
   }
 
@@ -128,7 +129,7 @@ bool LogSpool::writePending(std::string_view type, std::string_view name, const 
   if (error == 0) error = writeAll(metaFile.fd(), meta.bytes);
   if (error == 0) error = logFile.create(pending());
   if (error != 0) {
-    Host::noteWriteFailure(pending(), error);
+    noteWriteFailure(pending(), error);
     return false;
   }
   FileOutput output(logFile.fd());
@@ -137,7 +138,7 @@ bool LogSpool::writePending(std::string_view type, std::string_view name, const 
   if (error == 0 && !whole) return false;
   if (error == 0)
     error = placePair(pending() / (std::string(name) + "-" + spoolStamp(now)), type, metaFile, logFile);
-  if (error != 0) Host::noteWriteFailure(pending(), error);
+  if (error != 0) noteWriteFailure(pending(), error);
   return error == 0;
 }
 
@@ -153,7 +154,7 @@ void LogSpool::appendStructured(int type, const PlistDictionary& data, PlistDate
         ::open(place.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0600));
     error = fd.isOpen() ? appendWhole(fd.get(), line) : errno;
   }
-  if (error != 0) Host::noteWriteFailure(place, error);
+  if (error != 0) noteWriteFailure(place, error);
 }
 
 void LogSpool::dumpOldStructured(PlistDate now) {
@@ -161,20 +162,20 @@ void LogSpool::dumpOldStructured(PlistDate now) {
   std::error_code ignored;
   if (!fs::is_directory(structured, ignored)) return;
   FileLock lock;
-  if (const int error = lockSpool(lock); error != 0) return Host::noteWriteFailure(structured, error);
+  if (const int error = lockSpool(lock); error != 0) return noteWriteFailure(structured, error);
   const std::string today = dayText(now);
   for (const fs::path& typeFolder : filesIn(structured)) {
     for (const fs::path& file : filesIn(typeFolder)) {
       const std::string day = file.stem().native();
       if (file.extension() != ".jsonl" || day.size() != today.size() || day >= today) continue;
       if (const int error = host_.makeFolders(pending()); error != 0)
-        return Host::noteWriteFailure(pending(), error);
+        return noteWriteFailure(pending(), error);
       const std::string stem = "structured-" + typeFolder.filename().native() + "-" + day;
       fs::path place = pending() / (stem + ".jsonl");
       for (unsigned n = 1; fs::exists(fs::symlink_status(place, ignored)) && n < kMaximumNumber; ++n) {
         place = pending() / (stem + "-" + std::to_string(n) + ".jsonl");
       }
-      if (::rename(file.c_str(), place.c_str()) != 0) Host::noteWriteFailure(place, errno);
+      if (::rename(file.c_str(), place.c_str()) != 0) noteWriteFailure(place, errno);
     }
   }
 }
@@ -183,11 +184,10 @@ void LogSpool::submitPending(PlistDate now) {
   std::error_code ignored;
   if (!fs::is_directory(pending(), ignored)) return;
   FileLock lock;
-  if (const int error = lockSpool(lock); error != 0) return Host::noteWriteFailure(pending(), error);
+  if (const int error = lockSpool(lock); error != 0) return noteWriteFailure(pending(), error);
   removeRemains(pending());
   if (fs::is_empty(pending(), ignored)) return;
-  if (const int error = host_.makeFolders(outbox()); error != 0)
-    return Host::noteWriteFailure(outbox(), error);
+  if (const int error = host_.makeFolders(outbox()); error != 0) return noteWriteFailure(outbox(), error);
 
   // The folder itself moves, so that a submission is never half handed over.
   fs::path place;
@@ -195,8 +195,8 @@ void LogSpool::submitPending(PlistDate now) {
     place = outbox() / (spoolStamp(now) + "-" + std::to_string(n));
     if (!fs::exists(fs::symlink_status(place, ignored))) break;
   }
-  if (::rename(pending().c_str(), place.c_str()) != 0) return Host::noteWriteFailure(place, errno);
-  if (const int error = host_.makeFolders(pending()); error != 0) Host::noteWriteFailure(pending(), error);
+  if (::rename(pending().c_str(), place.c_str()) != 0) return noteWriteFailure(place, errno);
+  if (const int error = host_.makeFolders(pending()); error != 0) noteWriteFailure(pending(), error);
   syncFolder(outbox());
 }
 
@@ -205,7 +205,7 @@ void LogSpool::rollCarewell() {
   std::error_code ignored;
   if (!fs::is_directory(carewell, ignored)) return;
   FileLock lock;
-  if (const int error = lockSpool(lock); error != 0) return Host::noteWriteFailure(carewell, error);
+  if (const int error = lockSpool(lock); error != 0) return noteWriteFailure(carewell, error);
   for (const fs::path& file : filesIn(carewell)) {
     if (file.extension() != ".log") continue;
     for (int generation = kCarewellGenerations; generation >= 1; --generation) {
@@ -213,7 +213,7 @@ void LogSpool::rollCarewell() {
       const fs::path newer =
           generation == 1 ? file : fs::path(file.native() + "." + std::to_string(generation - 1));
       if (::rename(newer.c_str(), older.c_str()) == 0 || errno == ENOENT) continue;
-      Host::noteWriteFailure(older, errno);
+      noteWriteFailure(older, errno);
       break;  // going on would replace the generation that could not move
     }
   }

@@ -8,7 +8,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/number_text.h"
+#include "platform/calendar.h"
 #include "platform/plist/big_endian_reader.h"
 #include "platform/plist/limits.h"
 #include "platform/utf8.h"

@@ -11,7 +11,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/system_log.h"
+#include "platform/plist_text.h"
 #include "testing/binary_plist_builder.h"
 
 namespace tbdaily {

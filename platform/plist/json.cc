@@ -7,6 +7,7 @@
 #include <nlohmann/json.hpp>
 #include <utility>
 
+#include "platform/calendar.h"
 #include "platform/number_text.h"
 #include "platform/plist/base64.h"
 #include "platform/plist/builder.h"

@@ -8,7 +8,7 @@
 #include <string>
 #include <utility>
 
-#include "platform/number_text.h"
+#include "platform/calendar.h"
 
 namespace tbdaily {
 

@@ -6,6 +6,7 @@
 #include <cmath>
 #include <utility>
 
+#include "platform/calendar.h"
 #include "platform/number_text.h"
 #include "platform/plist/base64.h"
 #include "platform/plist/limits.h"

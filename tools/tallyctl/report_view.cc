@@ -7,8 +7,8 @@
 #include <string>
 
 #include "platform/analytics_client.h"
-#include "platform/number_text.h"
-#include "platform/system_log.h"
+#include "platform/calendar.h"
+#include "platform/plist_text.h"
 
 namespace tbdaily {
 
@@ -117,10 +117,9 @@ void printAppInfo(Terminal& out, const PlistDictionary& root) {
   using enum Table::Align;
   Table table({Left, Left, Right, Right, Left});
   for (const PlistValue& record : *records) {
-    const PlistDictionary* app = record.asDictionary();
-    if (app == nullptr) continue;
-    table.add({text(app->get("bundle")), text(app->get("version")), text(app->get("kestrelID")),
-               text(app->get("arch")), text(app->get("uuid"))});
+    if (record.asDictionary() == nullptr) continue;
+    table.add({text(record.get("bundle")), text(record.get("version")), text(record.get("kestrelID")),
+               text(record.get("arch")), text(record.get("uuid"))});
   }
   table.print(out);
 }

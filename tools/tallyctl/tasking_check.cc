@@ -12,16 +12,15 @@ namespace {
 constexpr std::array<std::string_view, 3> kEntries = {"TaskingID", "TaskingDigest", "TaskingPayload"};
 
 std::string itemFault(const PlistValue& element) {
-  const PlistDictionary* item = element.asDictionary();
-  if (item == nullptr) return "is no dictionary";
-  const PlistValue domain = item->get("Domain");
-  const PlistValue key = item->get("Key");
+  if (element.asDictionary() == nullptr) return "is no dictionary";
+  const PlistValue domain = element.get("Domain");
+  const PlistValue key = element.get("Key");
   if (!domain.asString()) return "has no text as \"Domain\"";
   if (!isSafeName(*domain.asString())) {
     return "has a \"Domain\" that is none: 1 to 200 letters, digits, '.', '-' or '_', not beginning with '.'";
   }
   if (!key.asString() || key.asString()->empty()) return "has no text as \"Key\"";
-  if (!item->contains("Value")) return "has no \"Value\"";
+  if (element.get("Value").isNone()) return "has no \"Value\"";
   return {};
 }
 

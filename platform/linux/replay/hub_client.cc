@@ -261,11 +261,9 @@ class HubClient : public RecordedClient {
 
   static void fillFromElement(const PlistValue& value, std::array<std::uint64_t, kElementNumbers>& numbers) {
     std::fill(numbers.begin() + kStamp, numbers.end(), 0);
-    const PlistDictionary* element = value.asDictionary();
-    if (element == nullptr) return;
-    numbers[kStamp] = integerOrZero(*element, "stamp");
-    const PlistValue* recorded = element->find("words");
-    const PlistArray* words = recorded != nullptr ? recorded->asArray() : nullptr;
+    numbers[kStamp] = static_cast<std::uint64_t>(value.get("stamp").asInteger().value_or(0));
+    const PlistValue recorded = value.get("words");
+    const PlistArray* words = recorded.asArray();
     if (words == nullptr) return;
     for (std::size_t i = 0; i < words->size() && kWordsFrom + i < kElementNumbers; ++i)
       numbers[kWordsFrom + i] = static_cast<std::uint64_t>((*words)[i].asInteger().value_or(0));

@@ -19,8 +19,7 @@ struct ClientKind {
 constexpr ClientKind kClientKinds[] = {{"storage", makeStorageClient}, {"hub", makeHubClient}};
 
 PlistDictionary propertiesOf(const PlistDictionary& entry) {
-  const PlistValue properties = entry.get("properties");
-  return properties.asDictionary() != nullptr ? *properties.asDictionary() : PlistDictionary();
+  return entry.get("properties").mutableDictionary();
 }
 
 // Numbers of different widths are equal when they mean the same.
@@ -127,11 +126,9 @@ PlistValue RecordedDriverRegistry::KdRegistryEntrySearchCFProperty(KdHandle hand
     if (PlistValue value = propertiesOf(*entry).get(key); !value.isNone()) return value;
     const auto parent = entry->get("parent").asInteger();
     if (!parent || steps >= longestWay) break;  // parents in a circle end too
-    const auto found =
-        std::find_if(all.asArray()->begin(), all.asArray()->end(), [&parent](const PlistValue& candidate) {
-          return candidate.asDictionary() != nullptr &&
-                 candidate.asDictionary()->get("id").asInteger() == parent;
-        });
+    const auto found = std::find_if(
+        all.asArray()->begin(), all.asArray()->end(),
+        [&parent](const PlistValue& candidate) { return candidate.get("id").asInteger() == parent; });
     entry = found != all.asArray()->end() ? found->asDictionary() : nullptr;
   }
   return {};

@@ -6,6 +6,8 @@
 #include <string>
 #include <utility>
 
+#include "platform/linux/host_notes.h"
+
 namespace tbdaily {
 
 class RecordedUsageService::Feed : public UsageFeed {
@@ -59,7 +61,7 @@ void RecordedUsageService::request(UsageReplyHandler handler) {
     try {
       handler(records);
     } catch (const std::exception& failure) {
-      Host::noteOnce(std::string("a usage reply was not processed: ") + failure.what());
+      noteOnce(std::string("a usage reply was not processed: ") + failure.what());
     }
   });
 }

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cerrno>
 
+#include "platform/linux/host_notes.h"
+
 namespace tbdaily {
 
 std::filesystem::path Recordings::path(std::string_view file) const {
@@ -24,7 +26,7 @@ PlistValue Recordings::load(std::string_view file) {
   loaded.identity = FileIdentity{};  // what could not be read is tried again
   FileContents contents;
   if (const int error = readRegularFile(place, contents); error != 0) {
-    if (error != ENOENT) Host::noteOnce("recording " + place.native() + " is ignored: " + errorText(error));
+    if (error != ENOENT) noteOnce("recording " + place.native() + " is ignored: " + errorText(error));
     return loaded.root;
   }
   loaded.identity = contents.identity;
@@ -33,7 +35,7 @@ PlistValue Recordings::load(std::string_view file) {
     loaded.root = parsed.value;
   } else {
     const std::string reason = parsed.error.empty() ? "its root is no dictionary" : parsed.error;
-    Host::noteOnce("recording " + place.native() + " is ignored: " + reason);
+    noteOnce("recording " + place.native() + " is ignored: " + reason);
   }
   return loaded.root;
 }
@@ -43,16 +45,16 @@ bool Recordings::readFile(std::string_view file, FileContents& contents) {
   const std::filesystem::path place = (folder / file).lexically_normal();
   // What a recording names comes from outside: it leads nowhere else.
   if (std::mismatch(folder.begin(), folder.end(), place.begin(), place.end()).first != folder.end()) {
-    Host::noteOnce("recorded file " + place.native() + " is ignored: it lies outside of " + folder.native());
+    noteOnce("recorded file " + place.native() + " is ignored: it lies outside of " + folder.native());
     return false;
   }
   const int error = readRegularFile(place, contents);
-  if (error != 0) Host::noteOnce("recorded file " + place.native() + " is ignored: " + errorText(error));
+  if (error != 0) noteOnce("recorded file " + place.native() + " is ignored: " + errorText(error));
   return error == 0;
 }
 
 PlistValue Recordings::entry(std::string_view file, std::string_view key) {
-  return load(file).asDictionary()->get(key);
+  return load(file).get(key);
 }
 
 }  // namespace tbdaily

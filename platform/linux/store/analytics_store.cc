@@ -10,7 +10,7 @@
 #include <utility>
 
 #include "platform/linux/file_io.h"
-#include "platform/linux/host.h"
+#include "platform/linux/host_notes.h"
 
 namespace tbdaily {
 

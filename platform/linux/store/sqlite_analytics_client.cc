@@ -3,20 +3,20 @@
 #include <string>
 #include <utility>
 
-#include "platform/linux/host.h"
+#include "platform/linux/host_notes.h"
 
 namespace tbdaily {
 
 namespace {
 
 void noteLostWrite(const AnalyticsStore& store, std::string_view key, const StoreResult& result) {
-  if (result.systemError != 0) return Host::noteWriteFailure(store.file(), result.systemError);
+  if (result.systemError != 0) return noteWriteFailure(store.file(), result.systemError);
   const bool concernsOnlyThisWrite = result.fault == StoreFault::Locked || analyticsKeyFault(key).has_value();
-  if (!concernsOnlyThisWrite) return Host::noteOnce(result.error);
+  if (!concernsOnlyThisWrite) return noteOnce(result.error);
   // The key may be hostile: no control character of it reaches a terminal.
   std::string line = "\"";
   for (const char c : key.substr(0, kLongestAnalyticsKey)) line += c >= ' ' && c < '\x7F' ? c : '?';
-  Host::noteOnce(line.append("\" was not written: ").append(result.error));
+  noteOnce(line.append("\" was not written: ").append(result.error));
 }
 
 }  // namespace
@@ -38,7 +38,7 @@ PlistDate SqliteAnalyticsClient::dateOfDayNumber(DayNumber day) {
 void SqliteAnalyticsClient::checkpoint() {
   AnalyticsStore* target = store();
   if (target == nullptr) return;
-  if (const StoreResult result = target->checkpoint(); !result.ok()) Host::noteOnce(result.error);
+  if (const StoreResult result = target->checkpoint(); !result.ok()) noteOnce(result.error);
 }
 
 void SqliteAnalyticsClient::setValueForScalarKey(std::string_view key, std::int64_t value) {

@@ -7,7 +7,7 @@
 #include <string>
 #include <utility>
 
-#include "platform/linux/host.h"
+#include "platform/linux/host_notes.h"
 
 namespace tbdaily {
 
@@ -56,17 +56,17 @@ class Reader {
 
   // Names what ended an enumeration early.
   void noteEnd(int code) {
-    if (code != SQLITE_DONE) Host::noteOnce(storeFailure(database_, file_).error);
+    if (code != SQLITE_DONE) noteOnce(storeFailure(database_, file_).error);
   }
   // Rows that come in another order than that of their index are the work of a damaged index, which may go
   // round in circles.
-  void noteDisorder() { Host::noteOnce(unusableStore(file_, "its rows are out of order").error); }
+  void noteDisorder() { noteOnce(unusableStore(file_, "its rows are out of order").error); }
   void noteForeignRow() {
-    Host::noteOnce(file_.native() + ": rows with values of a foreign type or range are passed over");
+    noteOnce(file_.native() + ": rows with values of a foreign type or range are passed over");
   }
   bool isUsableKey(std::string_view key) {
     if (!analyticsKeyFault(key)) return true;
-    Host::noteOnce(file_.native() + ": rows with keys that no report can carry are passed over");
+    noteOnce(file_.native() + ": rows with keys that no report can carry are passed over");
     return false;
   }
 
@@ -294,7 +294,7 @@ std::unique_ptr<OpenAnalyticsHistory> SqliteAnalyticsHistory::open() {
   const std::optional<std::filesystem::path> file = locate_();
   if (!file) return std::make_unique<EmptyHistory>();
   OpenedStore store = openStoreForReading(*file, busyTimeout_);
-  if (!store.result.ok()) Host::noteOnce(store.result.error);
+  if (!store.result.ok()) noteOnce(store.result.error);
   if (!store.database.isOpen()) return std::make_unique<EmptyHistory>();
   return std::make_unique<LinuxOpenHistory>(std::move(store.database), *file);
 }

@@ -2,7 +2,7 @@
 
 #include <sqlite3.h>
 
-#include "platform/linux/host.h"
+#include "platform/linux/host_notes.h"
 
 namespace tbdaily {
 

@@ -10,7 +10,7 @@
 #include <thread>
 
 #include "platform/linux/file_io.h"
-#include "platform/linux/host.h"
+#include "platform/linux/host_notes.h"
 #include "platform/utf8.h"
 
 namespace tbdaily {

@@ -4,6 +4,7 @@
 #include <array>
 
 #include "platform/linux/file_io.h"
+#include "platform/linux/host_notes.h"
 #include "platform/plist/json.h"
 #include "storage/snapshot_renderer.h"
 #include "storage/stats_context.h"

@@ -9,6 +9,7 @@
 #include "driver/daily_tasks.h"
 #include "platform/analytics_home.h"
 #include "platform/linux/file_io.h"
+#include "platform/linux/host_notes.h"
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
 #include "report/tb_config.h"

@@ -5,7 +5,7 @@
 #include <vector>
 
 #include "driver/device_metrics.h"
-#include "platform/system_log.h"
+#include "platform/plist_text.h"
 #include "storage/nand_info.h"
 #include "tools/tallyctl/controller_buffer.h"
 #include "tools/tallyctl/nand_glossary.h"

@@ -7,8 +7,8 @@
 #include "platform/device_answers.h"
 #include "platform/linux/file_io.h"
 #include "platform/log_submission.h"
+#include "platform/plist_text.h"
 #include "platform/preferences_store.h"
-#include "platform/system_log.h"
 #include "tools/tallyctl/input_file.h"
 #include "tools/tallyctl/tasking_check.h"
 #include "tools/tallyctl/tool.h"
@@ -42,10 +42,7 @@ struct TaskingState {
     if (isScheduled() && elapsed >= 0 && elapsed < days) daysLeft = days - elapsed;
   }
 
-  bool isScheduled() const {
-    return scheduled.asDictionary() != nullptr &&
-           scheduled.asDictionary()->get("TaskingID").asString().has_value();
-  }
+  bool isScheduled() const { return scheduled.get("TaskingID").asString().has_value(); }
 
   PlistValue scheduled, id, os, digest, payload;
   OSUpdate update;
@@ -84,7 +81,7 @@ void printItems(Terminal& out, const PlistValue& payload) {
 }
 
 void print(Terminal& out, const TaskingState& state) {
-  const auto entry = [&state](std::string_view key) { return state.scheduled.asDictionary()->get(key); };
+  const auto entry = [&state](std::string_view key) { return state.scheduled.get(key); };
   if (state.scheduled.asDictionary() == nullptr) {
     out.line("No tasking is scheduled.");
   } else if (!state.isScheduled()) {

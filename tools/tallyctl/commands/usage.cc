@@ -4,8 +4,8 @@
 
 #include "driver/daily_tasks.h"
 #include "driver/data_usage.h"
+#include "platform/calendar.h"
 #include "platform/linux/replay/recordings.h"
-#include "platform/number_text.h"
 #include "platform/preferences_store.h"
 #include "tools/tallyctl/tool.h"
 
@@ -53,8 +53,7 @@ void show(Tool& tool) {
                                   static_cast<std::uint64_t>(n);
                  adds.set(key, PlistValue::int64(static_cast<std::int64_t>(sum)));
                });
-  const PlistDictionary baseline =
-      stored.asDictionary() != nullptr ? *stored.asDictionary() : PlistDictionary();
+  const PlistDictionary baseline = stored.mutableDictionary();
   if (tool.printedAsJson(PlistValue::dictionary(
           {{"baseline", PlistValue::dictionary(baseline)}, {"adds", PlistValue::dictionary(adds)}}))) {
     return;

@@ -12,6 +12,7 @@
 #include <optional>
 
 #include "platform/linux/file_io.h"
+#include "platform/linux/host_notes.h"
 #include "platform/linux/linux_notifications.h"
 #include "tools/tallyctl/tool.h"
 

@@ -4,6 +4,7 @@
 
 #include "platform/file_system.h"
 #include "platform/platform_with.h"
+#include "platform/plist_text.h"
 #include "platform/property_list_codec.h"
 #include "report/tb_config.h"
 #include "tools/tallyctl/captured_log.h"

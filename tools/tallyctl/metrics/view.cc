@@ -6,7 +6,7 @@
 #include <cstdio>
 #include <unordered_map>
 
-#include "platform/number_text.h"
+#include "platform/calendar.h"
 
 namespace tbdaily {
 

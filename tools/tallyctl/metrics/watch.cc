@@ -7,8 +7,8 @@
 #include <cstdlib>
 #include <map>
 
+#include "platform/calendar.h"
 #include "platform/kernel.h"
-#include "platform/number_text.h"
 #include "platform/platform.h"
 #include "platform/plist/json.h"
 #include "tools/tallyctl/metrics/json.h"

@@ -77,18 +77,14 @@ PlistDictionary optionsOf(const Entry& entry) {
   return options;
 }
 
-PlistDictionary mutableCopyOf(const PlistValue& dictionary) {
-  return dictionary.asDictionary() != nullptr ? *dictionary.asDictionary() : PlistDictionary();
-}
-
 }  // namespace
 
 PlistDictionary sampleWhitelist() {
   PlistDictionary groups;
   for (const Entry& entry : kEntries) {
     const std::string_view listName = kListNames[static_cast<std::size_t>(entry.list)];
-    PlistDictionary group = mutableCopyOf(groups.get(entry.group));
-    PlistDictionary list = mutableCopyOf(group.get(listName));
+    PlistDictionary group = groups.get(entry.group).mutableDictionary();
+    PlistDictionary list = group.get(listName).mutableDictionary();
     list.set(entry.key, PlistValue::dictionary(optionsOf(entry)));
     group.set(listName, PlistValue::dictionary(std::move(list)));
     groups.set(entry.group, PlistValue::dictionary(std::move(group)));

@@ -1,0 +1,21 @@
+// Run-time libraries of the device.
+#pragma once
+
+#include "platform/dynamic_loader.h"
+#include "platform/linux/host.h"
+
+namespace tbdaily {
+
+// Opens a library only when it and its folder belong to root or to the job's user and nobody else can write
+// to them: what is loaded runs with the job's rights.
+class LinuxDynamicLoader : public DynamicLoader {
+ public:
+  explicit LinuxDynamicLoader(const Host& host) : host_(host) {}
+  LibraryHandle open(std::string_view path) override;
+  void* symbol(LibraryHandle library, const std::string& name) override;
+
+ private:
+  const Host& host_;
+};
+
+}  // namespace tbdaily
