@@ -9,6 +9,7 @@
 #include <string_view>
 #include <vector>
 
+#include "platform/byte_writer.h"
 #include "storage/snapshot_layout.h"
 #include "storage/snapshot_renderer.h"
 
@@ -23,20 +24,16 @@ std::uint32_t word(std::size_t record, std::size_t index) {
   return static_cast<std::uint32_t>((record + 1) * (index * 37 + 1) % 100000);
 }
 
-void append(std::vector<std::byte>& bytes, std::uint32_t value) {
-  for (int i = 0; i < 4; ++i) bytes.push_back(static_cast<std::byte>(value >> 8 * i));
-}
-
 std::vector<std::byte> records() {
   std::vector<std::byte> bytes;
   for (std::size_t i = 0; i < kRecords * kRecordWords; ++i)
-    append(bytes, word(i / kRecordWords, i % kRecordWords));
+    appendLittleEndian(bytes, word(i / kRecordWords, i % kRecordWords));
   return bytes;
 }
 
 void appendField(std::vector<std::byte>& bytes, std::uint32_t kind, std::uint32_t offset, std::uint32_t size,
                  std::string_view format) {
-  for (const std::uint32_t value : {kind, offset, size}) append(bytes, value);
+  for (const std::uint32_t value : {kind, offset, size}) appendLittleEndian(bytes, value);
   for (std::size_t i = 0; i < 16; ++i)
     bytes.push_back(i < format.size() ? static_cast<std::byte>(format[i]) : std::byte{0});
 }
@@ -47,8 +44,9 @@ constexpr std::uint32_t kDescribedValues = 20;
 std::vector<std::byte> header() {
   std::vector<std::byte> bytes;
   const auto recordSize = std::uint32_t{kSnapshotRecordSize}, slots = std::uint32_t{kRecords + 1};
-  for (const std::uint32_t value : {0U, 6U, recordSize, slots, 0U, 0U, 40U, 0U, 0U, 0U}) append(bytes, value);
-  for (const std::uint32_t value : {kDescribedValues + 3, 0U}) append(bytes, value);
+  for (const std::uint32_t value : {0U, 6U, recordSize, slots, 0U, 0U, 40U, 0U, 0U, 0U})
+    appendLittleEndian(bytes, value);
+  for (const std::uint32_t value : {kDescribedValues + 3, 0U}) appendLittleEndian(bytes, value);
   for (std::uint32_t i = 0; i < kDescribedValues; ++i) appendField(bytes, 0, 4 * (30 + i), 0, " AB=%4u");
   appendField(bytes, 2, 4 * 39, 0, " TH=%8u.%02u");
   appendField(bytes, 3, 4 * 14, 48, " R%s=");

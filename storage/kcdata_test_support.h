@@ -5,6 +5,8 @@
 #include <string>
 #include <string_view>
 
+#include "platform/byte_writer.h"
+
 namespace tbdaily::testing {
 
 class KcdataBuffer {
@@ -28,7 +30,7 @@ class KcdataBuffer {
 
  private:
   KcdataBuffer& number(std::uint64_t value, unsigned size) {
-    for (unsigned i = 0; i < size; ++i) bytes += static_cast<char>(value >> 8 * i);
+    appendLittleEndian(bytes, value, size);
     return *this;
   }
 };

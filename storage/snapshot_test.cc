@@ -4,6 +4,7 @@
 #include <random>
 #include <sstream>
 
+#include "platform/byte_writer.h"
 #include "storage/snapshot_format.h"
 #include "storage/snapshot_layout.h"
 #include "storage/snapshot_renderer.h"
@@ -14,8 +15,7 @@ namespace {
 
 struct Bytes : std::vector<std::byte> {
   Bytes& words(const std::vector<std::uint32_t>& values, std::size_t width = 4) {
-    for (const std::uint32_t value : values)
-      for (std::size_t i = 0; i < width; ++i) push_back(static_cast<std::byte>(value >> 8 * i));
+    for (const std::uint32_t value : values) appendLittleEndian(*this, value, width);
     return *this;
   }
   Bytes& text(std::string_view characters, std::size_t length) {

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "platform/byte_reader.h"
+#include "platform/byte_writer.h"
 #include "storage/diagnostics.h"
 #include "testing/fake_drivers.h"
 
@@ -29,7 +30,7 @@ class StatsBuffer {
     return *this;
   }
   StatsBuffer& word(std::uint64_t value) {
-    for (int i = 0; i < 8; ++i) bytes.push_back(static_cast<std::byte>(value >> 8 * i));
+    appendLittleEndian(bytes, value);
     return *this;
   }
   std::vector<std::byte> bytes;
@@ -48,8 +49,7 @@ struct ScriptedController {
       const bool asksSize = input.empty() ? methods.size() == 1 : (*reader.at<std::uint16_t>(4) & 1) != 0;
       const auto& buffer = buffers[reader.at<std::uint32_t>(0).value_or(0)];
       if (asksSize) {
-        const std::uint64_t answer = sizeAnswer.value_or(buffer.size());
-        for (std::size_t i = 0; i < output.size(); ++i) output[i] = static_cast<std::byte>(answer >> 8 * i);
+        writeLittleEndian(output, sizeAnswer.value_or(buffer.size()));
         return sizeStatus;
       }
       std::copy_n(buffer.begin(), std::min(buffer.size(), output.size()), output.begin());

@@ -1,5 +1,9 @@
 #include "storage/stx_request.h"
 
+#include <span>
+
+#include "platform/byte_writer.h"
+
 namespace tbdaily {
 
 namespace {
@@ -25,9 +29,8 @@ StxRequest StxRequest::dataFetch(const STXSelectorPair& selectors, const StxRequ
 
 std::array<std::byte, 24> StxRequest::bytes() const {
   std::array<std::byte, 24> bytes{};
-  const std::uint64_t head = std::uint64_t{flags} << 32 | command;
-  for (std::size_t i = 0; i < sizeof(command) + sizeof(flags); ++i)
-    bytes[i] = static_cast<std::byte>(head >> 8 * i);
+  writeLittleEndian(std::span(bytes).first(sizeof(command)), command);
+  writeLittleEndian(std::span(bytes).subspan(sizeof(command), sizeof(flags)), flags);
   return bytes;
 }
 

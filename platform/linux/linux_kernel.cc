@@ -8,6 +8,7 @@
 #include <ctime>
 #include <limits>
 
+#include "platform/byte_writer.h"
 #include "platform/linux/host_notes.h"
 
 namespace tbdaily {
@@ -16,13 +17,6 @@ namespace {
 
 constexpr std::string_view kNextEccEvent = "kern.next_ecc_event";
 constexpr std::string_view kSwapUsage = "vm.swapusage";
-
-void putLittleEndian(std::span<std::byte> out, std::uint64_t value) {
-  for (std::byte& byte : out) {
-    byte = static_cast<std::byte>(value & 0xFF);
-    value >>= 8;
-  }
-}
 
 int copyData(std::span<const std::byte> data, std::span<std::byte> buffer, std::size_t& length) {
   if (data.size() > buffer.size()) return ENOMEM;
@@ -33,7 +27,7 @@ int copyData(std::span<const std::byte> data, std::span<std::byte> buffer, std::
 
 int copyInteger(std::int64_t value, std::span<std::byte> buffer, std::size_t& length) {
   if (buffer.size() != sizeof(std::uint32_t) && buffer.size() != sizeof(std::uint64_t)) return EINVAL;
-  putLittleEndian(buffer, static_cast<std::uint64_t>(value));
+  writeLittleEndian(buffer, static_cast<std::uint64_t>(value));
   length = buffer.size();
   return 0;
 }
@@ -46,10 +40,10 @@ int liveSwapUsage(std::span<std::byte> buffer, std::size_t& length) {
   const std::uint64_t available = std::uint64_t{info.freeswap} * info.mem_unit;
   std::array<std::byte, 32> record{};
   const std::span<std::byte> bytes(record);
-  putLittleEndian(bytes.subspan(0, 8), total);
-  putLittleEndian(bytes.subspan(8, 8), available);
-  putLittleEndian(bytes.subspan(16, 8), total - std::min(available, total));
-  putLittleEndian(bytes.subspan(24, 4), static_cast<std::uint64_t>(::sysconf(_SC_PAGESIZE)));
+  writeLittleEndian(bytes.subspan(0, 8), total);
+  writeLittleEndian(bytes.subspan(8, 8), available);
+  writeLittleEndian(bytes.subspan(16, 8), total - std::min(available, total));
+  writeLittleEndian(bytes.subspan(24, 4), static_cast<std::uint64_t>(::sysconf(_SC_PAGESIZE)));
   return copyData(record, buffer, length);
 }
 

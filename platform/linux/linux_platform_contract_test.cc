@@ -1,6 +1,7 @@
 // The host layer keeps the contracts of the families.
 #include <gtest/gtest.h>
 
+#include "platform/byte_writer.h"
 #include "platform/linux/host_test_support.h"
 #include "platform/linux/linux_notifications.h"
 #include "platform/linux/linux_preferences.h"
@@ -59,9 +60,9 @@ class LinuxSubject : public TestPlatform {
   void connectPeer() { peer_ = connectUnixSocket(endpointPath(host, "com.example.endpoint")).socket; }
   void send(const PlistDictionary& message) {
     const std::string list = codec.write(PlistValue::dictionary(message)).bytes;
-    const std::string length{static_cast<char>(list.size() & 0xFF), static_cast<char>(list.size() >> 8), 0,
-                             0};
-    EXPECT_EQ(writeAll(peer_.get(), length + list), 0);
+    std::string bytes;
+    appendLittleEndian(bytes, list.size(), 4);
+    EXPECT_EQ(writeAll(peer_.get(), bytes + list), 0);
   }
   void setDrivers(const std::vector<FakeDriver>& drivers) {
     PlistArray entries;

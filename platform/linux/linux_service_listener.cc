@@ -11,6 +11,7 @@
 #include <limits>
 #include <thread>
 
+#include "platform/byte_reader.h"
 #include "platform/linux/host_notes.h"
 #include "platform/linux/unix_socket.h"
 
@@ -23,13 +24,6 @@ using Clock = std::chrono::steady_clock;
 constexpr std::size_t kLengthSize = 4;
 constexpr std::size_t kReadSize = std::size_t{64} << 10;
 constexpr auto kRestWithoutDescriptors = std::chrono::milliseconds(20);
-
-std::size_t messageLength(std::span<const std::byte> received) {
-  std::size_t length = 0;
-  for (std::size_t i = kLengthSize; i-- > 0;)
-    length = length << 8 | std::to_integer<std::size_t>(received[i]);
-  return length;
-}
 
 int pollTimeout(Clock::time_point deadline) {
   const auto left = std::chrono::ceil<std::chrono::milliseconds>(deadline - Clock::now()).count();
@@ -150,7 +144,8 @@ bool LinuxServiceListener::receive(ServiceConnection peer) {
   std::vector<std::byte>& received = connection.received;
   while (true) {
     const std::size_t have = received.size();
-    const std::size_t whole = have < kLengthSize ? kLengthSize : kLengthSize + messageLength(received);
+    const std::size_t whole =
+        have < kLengthSize ? kLengthSize : kLengthSize + *ByteReader(received).at<std::uint32_t>(0);
     if (whole - kLengthSize > kMaximumMessageLength) return fail(peer, "it is longer than 16 MiB");
     if (have >= kLengthSize && have == whole) return finishMessage(peer);
 

@@ -9,6 +9,7 @@
 #include <iterator>
 #include <thread>
 
+#include "platform/byte_writer.h"
 #include "platform/linux/host_test_support.h"
 #include "platform/linux/unix_socket.h"
 
@@ -20,7 +21,7 @@ constexpr std::size_t kMost = LinuxServiceListener::kMaximumMessageLength;
 
 std::string frame(std::size_t length, std::string_view list) {
   std::string bytes;
-  for (int shift = 0; shift < 32; shift += 8) bytes += static_cast<char>(length >> shift & 0xFF);
+  appendLittleEndian(bytes, length, 4);
   return bytes.append(list);
 }
 

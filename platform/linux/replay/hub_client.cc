@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "platform/byte_reader.h"
+#include "platform/byte_writer.h"
 #include "platform/linux/file_io.h"
 #include "platform/linux/replay/recorded_client.h"
 
@@ -155,8 +156,8 @@ class SharedBuffer {
 
 void putElement(std::span<std::byte, kElementBytes> out,
                 const std::array<std::uint64_t, kElementNumbers>& numbers) {
-  for (std::size_t i = 0; i < kElementBytes; ++i)
-    out[i] = static_cast<std::byte>(numbers[i / 8] >> 8 * (i % 8) & 0xFF);
+  for (std::size_t i = 0; i < kElementNumbers; ++i)
+    writeLittleEndian(out.subspan(i * sizeof(std::uint64_t), sizeof(std::uint64_t)), numbers[i]);
 }
 
 class HubClient : public RecordedClient {

@@ -7,6 +7,7 @@
 #include <fstream>
 
 #include "platform/byte_reader.h"
+#include "platform/byte_writer.h"
 #include "platform/linux/host_test_support.h"
 
 namespace tbdaily {
@@ -119,12 +120,10 @@ TEST_F(DriversTest, AStorageClientTellsRequestsApartAndIsStrict) {
 
 std::vector<std::byte> interests(const Numbers& channels) {
   std::vector<std::byte> list;
-  const auto put = [&list](std::uint64_t value) {
-    for (unsigned i = 0; i < 8; ++i) list.push_back(static_cast<std::byte>(value >> 8 * i & 0xFF));
-  };
-  put(channels.size());
+  appendLittleEndian(list, channels.size());
   for (const std::uint64_t id : channels) {
-    for (const std::uint64_t value : {std::uint64_t{7}, id, std::uint64_t{0}}) put(value);
+    for (const std::uint64_t value : {std::uint64_t{7}, id, std::uint64_t{0}})
+      appendLittleEndian(list, value);
   }
   return list;
 }

@@ -4,6 +4,7 @@
 #include <algorithm>
 
 #include "platform/byte_reader.h"
+#include "platform/byte_writer.h"
 #include "platform/linux/replay/recorded_client.h"
 
 namespace tbdaily {
@@ -39,13 +40,6 @@ std::optional<Request> parseRequest(std::span<const std::byte> input) {
 
 std::optional<std::int64_t> integerOf(const PlistDictionary& dictionary, std::string_view key) {
   return dictionary.get(key).asInteger();
-}
-
-void putLittleEndian32(std::span<std::byte> out, std::uint32_t value) {
-  for (std::byte& byte : out.first(kSizeAnswer)) {
-    byte = static_cast<std::byte>(value & 0xFF);
-    value >>= 8;
-  }
 }
 
 KdStatus fill(std::span<const std::byte> data, std::size_t most, std::span<std::byte> output,
@@ -115,7 +109,7 @@ class StorageClient : public RecordedClient {
     }
     if (const KdStatus status = recordedStatus(buffer, "sizeStatus"); status != kKdSuccess) return status;
     if (output.size() < kSizeAnswer) return kKdBadArgument;
-    putLittleEndian32(output, size);
+    writeLittleEndian(output.first(kSizeAnswer), size);
     outputSize = kSizeAnswer;
     return kKdSuccess;
   }

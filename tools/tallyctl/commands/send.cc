@@ -8,6 +8,7 @@
 
 #include "driver/service_endpoint.h"
 #include "platform/analytics_client.h"
+#include "platform/byte_writer.h"
 #include "platform/linux/host_notes.h"
 #include "platform/linux/linux_service_listener.h"
 #include "platform/linux/unix_socket.h"
@@ -32,7 +33,7 @@ int sendAll(int socket, std::string_view bytes) {
 // The length in front of a message, little-endian.
 std::string lengthPrefix(std::size_t length) {
   std::string prefix;
-  for (int shift = 0; shift < 32; shift += 8) prefix += static_cast<char>(length >> shift & 0xFF);
+  appendLittleEndian(prefix, static_cast<std::uint32_t>(length));
   return prefix;
 }
 

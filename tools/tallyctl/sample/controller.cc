@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <initializer_list>
 
+#include "platform/byte_writer.h"
 #include "storage/exporters.h"
 #include "storage/stats_table.h"
 #include "storage/vendor_counters.h"
@@ -14,13 +15,13 @@ namespace tbdaily {
 namespace {
 
 // Little-endian bytes of a controller's buffer.
-class ByteWriter {
+class BufferBuilder {
  public:
-  ByteWriter& u16(std::uint64_t value) { return put(value, 2); }
-  ByteWriter& u32(std::uint64_t value) { return put(value, 4); }
-  ByteWriter& u64(std::uint64_t value) { return put(value, 8); }
+  BufferBuilder& u16(std::uint64_t value) { return put(value, 2); }
+  BufferBuilder& u32(std::uint64_t value) { return put(value, 4); }
+  BufferBuilder& u64(std::uint64_t value) { return put(value, 8); }
   // Text with a NUL, in a field of so many bytes.
-  ByteWriter& text(std::string_view characters, std::size_t width) {
+  BufferBuilder& text(std::string_view characters, std::size_t width) {
     for (std::size_t i = 0; i < width; ++i)
       put(i < characters.size() ? static_cast<unsigned char>(characters[i]) : 0, 1);
     return *this;
@@ -28,8 +29,8 @@ class ByteWriter {
   PlistData take() { return std::move(bytes_); }
 
  private:
-  ByteWriter& put(std::uint64_t value, std::size_t width) {
-    for (std::size_t i = 0; i < width; ++i) bytes_.push_back(static_cast<std::byte>(value >> 8 * i & 0xFF));
+  BufferBuilder& put(std::uint64_t value, std::size_t width) {
+    appendLittleEndian(bytes_, value, width);
     return *this;
   }
   PlistData bytes_;
@@ -94,7 +95,7 @@ std::uint64_t sampleStat(const StatDefinition& stat, std::size_t element) {
 }
 
 PlistData sampleStatistics() {
-  ByteWriter out;
+  BufferBuilder out;
   for (const StatDefinition& stat : kStats) {
     const std::size_t count = std::max<std::size_t>(stat.limit, 1);
     out.u64(std::uint64_t{count} << 32 | stat.id);
@@ -106,7 +107,7 @@ PlistData sampleStatistics() {
 // Validity of 48 bands in four lists, in percent.
 PlistData sampleBandStatistics() {
   constexpr std::uint32_t kBands = 48;
-  ByteWriter out;
+  BufferBuilder out;
   out.u32(kBands).u32(2).u64(0).u64(0);
   for (std::uint32_t band = 0; band < kBands; ++band)
     out.u32(band).u32(band % 4).u32(100 - band * 2).u32(0).u32(0);
@@ -115,7 +116,7 @@ PlistData sampleBandStatistics() {
 
 PlistData sampleTelemetry(std::uint32_t channels, std::uint32_t list) {
   constexpr std::uint32_t kWords = kNandCounterBlockSize / 4;
-  ByteWriter out;
+  BufferBuilder out;
   for (std::uint32_t channel = 0; channel < channels; ++channel) {
     for (std::uint32_t word = 0; word < kWords; ++word)
       out.u32((word * 2246822519U >> 18) % (900 + 100 * list) + channel);
@@ -128,7 +129,7 @@ PlistData sampleTelemetry(std::uint32_t channels, std::uint32_t list) {
 
 PlistData sampleDefects() {
   constexpr std::uint32_t kDefects = 5;
-  ByteWriter out;
+  BufferBuilder out;
   out.u32(0).u32(37).u32(kDefects);
   for (std::uint32_t i = 0; i < kDefects; ++i) {
     const std::uint32_t temperature = i == 0 ? 0xF9 : 28 + i;  // the first one happened at -7 degrees
@@ -145,7 +146,7 @@ PlistData sampleDefects() {
 }
 
 PlistData sampleTaskScheduler() {
-  ByteWriter out;
+  BufferBuilder out;
   for (std::uint64_t task = 0; task < 16; ++task)
     out.u32(task).u32(task * 250).u32(10'000 - task * 400).u32(0);
   return out.take();
@@ -155,7 +156,7 @@ constexpr std::uint32_t kSnapshots = 12;
 constexpr std::uint32_t kSnapshotWords = 63;
 
 PlistData sampleSnapshots() {
-  ByteWriter out;
+  BufferBuilder out;
   for (std::uint32_t interval = 0; interval < kSnapshots; ++interval) {
     for (std::uint32_t word = 0; word < kSnapshotWords; ++word) {
       out.u32(word == 0 ? 1'000 * (interval + 1) : (word * 97 + interval * 31) % 1'000);
@@ -181,7 +182,7 @@ PlistData sampleSnapshotHeader() {
                                              {2, 39, 0, "TH:%u.%02u "}}};
   constexpr std::string_view kTitle = "Snapshots of the sample controller";
   constexpr std::uint32_t kFieldTable = 80;
-  ByteWriter out;
+  BufferBuilder out;
   out.u32(0).u32(6).u32(std::uint64_t{kSnapshotWords} * 4).u32(kSnapshots).u64(0).u32(kFieldTable).u64(0);
   out.text(kTitle, kFieldTable - 36);
   out.u32(kFields.size()).u32(0);
@@ -214,13 +215,13 @@ PlistArray sampleBuffers(const NandExporter& exporter, std::uint32_t channels) {
 }
 
 // An item of a kcdata buffer.
-void addItem(ByteWriter& out, std::uint32_t type, std::uint64_t flags,
+void addItem(BufferBuilder& out, std::uint32_t type, std::uint64_t flags,
              std::initializer_list<std::uint64_t> words) {
   out.u32(type).u32(words.size() * 8).u64(flags);
   for (const std::uint64_t word : words) out.u64(word);
 }
 
-void addThreadName(ByteWriter& out, std::string_view name) {
+void addThreadName(BufferBuilder& out, std::string_view name) {
   constexpr std::uint32_t kThreadName = 0x909;
   out.u32(kThreadName).u32(name.size() + 1).u64(0).text(name, name.size() + 1);
 }
@@ -231,7 +232,7 @@ PlistData sampleStackSnapshot() {
   constexpr std::uint32_t kContainerBegin = 0x13, kContainerEnd = 0x14, kIOStats = 0x901, kEnd = 0xF19158ED;
   constexpr std::uint64_t kTask = 1;
   constexpr std::array<std::string_view, 3> kThreads = {"VM_pageout", "VM_swapout", "VM_compressor"};
-  ByteWriter out;
+  BufferBuilder out;
   addItem(out, kContainerBegin, kTask, {0x902});
   for (std::uint64_t thread = 0; thread < kThreads.size(); ++thread) {
     addItem(out, kContainerBegin, 100 + thread, {0x903});
@@ -278,7 +279,7 @@ PlistDictionary sampleRegistry(std::string_view profile) {
 PlistArray sampleEccEvents() {
   PlistArray events;
   for (std::uint64_t event = 0; event < 2; ++event) {
-    ByteWriter out;
+    BufferBuilder out;
     out.u16((event + 1) | 3U << 8).u16(0).u32(0);  // an identifier, and three registers that count
     for (std::uint64_t i = 0; i < 8; ++i) out.u64(i < 3 ? 0x8000'0000'0000'0010 + 4096 * event + i : 0);
     events.push_back(PlistValue::data(out.take()));

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "drivermetrics/raw_elements.h"
+#include "platform/byte_writer.h"
 #include "tools/tallyctl/metrics/hub_legends.h"
 
 namespace tbdaily {
@@ -173,10 +174,8 @@ PlistValue channelInfo(const SampleGroup& group) {
   if (group.unit != unit::kNone) info.set(kd_report_key::kChannelUnit, PlistValue::int64(group.unit));
   PlistData config;
   for (const Segment& segment : segmentsOf(group.buckets)) {
-    for (std::uint32_t field : {segment.base, segment.isExponential, 0U, segment.buckets}) {
-      for (int byte = 0; byte < 4; ++byte, field >>= 8)
-        config.push_back(static_cast<std::byte>(field & 0xFF));
-    }
+    for (const std::uint32_t field : {segment.base, segment.isExponential, 0U, segment.buckets})
+      appendLittleEndian(config, field);
   }
   if (!config.empty()) info.set(kd_report_key::kChannelConfig, PlistValue::data(std::move(config)));
   return info.empty() ? PlistValue() : PlistValue::dictionary(std::move(info));
