@@ -4,19 +4,12 @@
 #include <string>
 #include <string_view>
 
+#include "platform/plist/json_writer.h"
 #include "platform/plist_value.h"
 
 namespace tbdaily {
 
-enum class JsonLayout {
-  OneLine,  // {"a": 1, "b": [2, 3]}
-  Indented  // one entry a line, two spaces a level; no line feed at the end
-};
-
-// Integers in full, reals in the shortest text that reads back to the same double (always with a point or an
-// exponent), data as base64, dates as RFC 3339 text with their fraction; null for a real that is not finite,
-// a date outside of the calendar, and an absent value. Keys in the dictionary's order. Text that is no UTF-8
-// has U+FFFD in its place.
+// As JsonWriter writes it; keys in the dictionary's order.
 std::string jsonText(const PlistValue& value, JsonLayout layout = JsonLayout::OneLine);
 
 struct PlistJsonResult {

@@ -5,8 +5,6 @@
 #include <filesystem>
 #include <limits>
 
-#include "platform/plist/json.h"
-
 namespace tbdaily {
 
 PlistValue jsonNull() {
@@ -36,8 +34,14 @@ bool Tool::hasUsableRoot() {
 }
 
 bool Tool::printedAsJson(const PlistValue& value) {
+  return printedAsJson([&value](JsonWriter& json) { json.add(value); });
+}
+
+bool Tool::printedAsJson(const std::function<void(JsonWriter& json)>& write) {
   if (!options.json) return false;
-  out_.line(jsonText(value, JsonLayout::Indented));
+  JsonWriter json(JsonLayout::Indented);
+  write(json);
+  out_.line(json.take());
   return true;
 }
 

@@ -8,6 +8,7 @@
 #include <string_view>
 
 #include "platform/linux/linux_platform.h"
+#include "platform/plist/json_writer.h"
 #include "platform/plist_value.h"
 #include "tools/tallyctl/terminal.h"
 
@@ -45,8 +46,9 @@ class Tool {
 
   Terminal& out() { return out_; }
 
-  // Prints the value as JSON when --json was given, and answers whether it did.
+  // Prints the value, or what the function writes, as JSON when --json was given; answers whether it did.
   bool printedAsJson(const PlistValue& value);
+  bool printedAsJson(const std::function<void(JsonWriter& json)>& write);
 
   // One line on standard error with the reason.
   void fail(std::string_view reason, int status = kFailed);

@@ -5,7 +5,6 @@
 
 #include "platform/linux/file_io.h"
 #include "platform/linux/host_notes.h"
-#include "platform/plist/json.h"
 #include "storage/snapshot_renderer.h"
 #include "storage/stats_context.h"
 #include "tools/tallyctl/controller_buffer.h"
@@ -73,30 +72,21 @@ constexpr std::array<ContextField, 18> kContextFields = {{
     {"maxHighEnduranceBlockErases", [](const StatsContext& c) { return c.maxHighEnduranceBlockErases; }},
 }};
 
-// By hand: the values are unsigned 64-bit, which a structured value cannot hold in full.
-std::string statsJson(const StatsContext& context, bool complete) {
-  std::string json(complete ? "{\"complete\": true, \"fields\": {" : "{\"complete\": false, \"fields\": {");
-  for (const ContextField& field : kContextFields) {
-    json.append("\"")
-        .append(field.name)
-        .append("\": ")
-        .append(std::to_string(field.value(context)))
-        .append(", ");
+void writeStats(JsonWriter& json, const StatsContext& context, bool complete) {
+  const auto root = json.object();
+  json.add("complete", complete);
+  {
+    const auto fields = json.object("fields");
+    for (const ContextField& field : kContextFields) json.add(field.name, field.value(context));
+    const auto histogram = json.array("readCountHisto");
+    for (const std::uint64_t count : context.readCountHisto) json.add(count);
   }
-  json += "\"readCountHisto\": [";
-  for (std::size_t i = 0; i < context.readCountHisto.size(); ++i) {
-    json.append(i == 0 ? "" : ", ").append(std::to_string(context.readCountHisto[i]));
+  const auto stats = json.array("stats");
+  for (const StatNode& node : context.nodes) {
+    const auto pair = json.array();
+    json.add(node.name());
+    json.add(node.value);
   }
-  json += "]}, \"stats\": [";
-  for (std::size_t i = 0; i < context.nodes.size(); ++i) {
-    const StatNode& node = context.nodes[i];
-    json.append(i == 0 ? "\n" : ",\n")
-        .append("  [")
-        .append(jsonText(PlistValue::string(node.name())))
-        .append(", ");
-    json.append(node.text()).append("]");
-  }
-  return json += "]}";
 }
 
 void showStats(Tool& tool, const std::string& file) {
@@ -105,7 +95,7 @@ void showStats(Tool& tool, const std::string& file) {
   StatsContext context;
   const bool complete = STXParseBufferToCxt(context, *bytes);
   Terminal& out = tool.out();
-  if (tool.options.json) return out.line(statsJson(context, complete));
+  if (tool.printedAsJson([&](JsonWriter& json) { writeStats(json, context, complete); })) return;
   if (!complete)
     out.line(out.styled("The buffer is damaged; this is what was read before the damage.", Style::Bad));
   out.line(out.styled("Fields", Style::Heading));

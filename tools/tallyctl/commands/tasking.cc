@@ -19,8 +19,8 @@ namespace {
 
 constexpr std::string_view kScheduled = "ScheduledTasking";
 
-PlistValue orNull(const PlistValue& value) {
-  return value.isNone() ? jsonNull() : value;
+PlistValue dictionaryOrNone(const PlistValue& value) {
+  return value.asDictionary() != nullptr ? value : PlistValue();
 }
 
 // Everything that the tasking step of a run looks at.
@@ -50,18 +50,21 @@ struct TaskingState {
   std::int32_t daysLeft = 0;
 };
 
-PlistValue asJson(const TaskingState& state) {
-  const PlistValue applied = state.id.isNone() ? jsonNull()
-                                               : PlistValue::dictionary({{"id", state.id},
-                                                                         {"os", orNull(state.os)},
-                                                                         {"digest", orNull(state.digest)},
-                                                                         {"payload", orNull(state.payload)}});
-  return PlistValue::dictionary(
-      {{"scheduled", state.scheduled.asDictionary() != nullptr ? state.scheduled : jsonNull()},
-       {"applied", applied},
-       {"lastOSUpdate", state.update.record.asDictionary() != nullptr ? state.update.record : jsonNull()},
-       {"aggressiveDays", PlistValue::int64(state.days)},
-       {"aggressiveDaysLeft", PlistValue::int64(state.daysLeft)}});
+void writeState(JsonWriter& json, const TaskingState& state) {
+  const auto root = json.object();
+  json.add("scheduled", dictionaryOrNone(state.scheduled));
+  if (state.id.isNone()) {
+    json.add("applied", std::nullopt);
+  } else {
+    const auto applied = json.object("applied");
+    json.add("id", state.id);
+    json.add("os", state.os);
+    json.add("digest", state.digest);
+    json.add("payload", state.payload);
+  }
+  json.add("lastOSUpdate", dictionaryOrNone(state.update.record));
+  json.add("aggressiveDays", state.days);
+  json.add("aggressiveDaysLeft", state.daysLeft);
 }
 
 std::string shown(const PlistValue& value) {
@@ -110,7 +113,7 @@ void print(Terminal& out, const TaskingState& state) {
 
 void show(Tool& tool) {
   const TaskingState state(tool.platform().services());
-  if (!tool.printedAsJson(asJson(state))) print(tool.out(), state);
+  if (!tool.printedAsJson([&state](JsonWriter& json) { writeState(json, state); })) print(tool.out(), state);
 }
 
 void storeScheduled(Tool& tool, const PlistValue& tasking) {
@@ -120,7 +123,11 @@ void storeScheduled(Tool& tool, const PlistValue& tasking) {
   if (!(preferences.getValue(kScheduled, preference_domain::kLogSubmission) == tasking)) {
     return tool.fail("the tasking could not be written");
   }
-  if (tool.printedAsJson(PlistValue::dictionary({{"scheduled", orNull(tasking)}}))) return;
+  const auto write = [&tasking](JsonWriter& json) {
+    const auto root = json.object();
+    json.add("scheduled", tasking);
+  };
+  if (tool.printedAsJson(write)) return;
   tool.out().line(tasking.isNone() ? "no tasking is scheduled any more; what is applied stays"
                                    : "scheduled; the next run applies it");
 }

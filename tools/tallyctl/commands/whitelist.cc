@@ -15,12 +15,6 @@ namespace tbdaily {
 
 namespace {
 
-PlistArray texts(const std::vector<std::string>& lines) {
-  PlistArray array;
-  for (const std::string& line : lines) array.push_back(PlistValue::string(line));
-  return array;
-}
-
 std::string_view nameOf(MatchKind kind) {
   return kind == MatchKind::Exact ? "exact" : kind == MatchKind::Prefix ? "prefix" : "internal";
 }
@@ -34,17 +28,30 @@ struct KeyAnswer {
   std::optional<WhitelistMatch> match;
 };
 
-PlistDictionary describe(const KeyAnswer& answer) {
+void writeAnswer(JsonWriter& json, const KeyAnswer& answer) {
   const auto& match = answer.match;
-  const auto text = [](std::string_view t) { return PlistValue::string(std::string(t)); };
   const bool listed = match && match->by != MatchKind::Internal;
-  return {{"key", PlistValue::string(answer.key)},
-          {"kind", text(nameOf(answer.kind))},
-          {"allowed", PlistValue::boolean(match.has_value())},
-          {"by", match ? text(nameOf(match->by)) : jsonNull()},
-          {"entry", listed ? text(match->entry) : jsonNull()},
-          {"group", listed ? text(match->group) : jsonNull()},
-          {"options", match ? PlistValue::dictionary(*match->options) : jsonNull()}};
+  const auto root = json.object();
+  json.add("key", answer.key);
+  json.add("kind", nameOf(answer.kind));
+  json.add("allowed", match.has_value());
+  json.add("by", match ? std::optional(nameOf(match->by)) : std::nullopt);
+  json.add("entry", listed ? std::optional(match->entry) : std::nullopt);
+  json.add("group", listed ? std::optional(match->group) : std::nullopt);
+  json.add("options", match ? PlistValue::dictionary(*match->options) : PlistValue());
+}
+
+void writeCheck(JsonWriter& json, const TBConfig& config, const std::vector<std::string>& problems,
+                const std::vector<KeyAnswer>& answers) {
+  const auto root = json.object();
+  json.add("digest", config.configFileDigest());
+  json.add("internal", config.isInternalDevice());
+  {
+    const auto texts = json.array("problems");
+    for (const std::string& problem : problems) json.add(problem);
+  }
+  const auto keys = json.array("keys");
+  for (const KeyAnswer& answer : answers) writeAnswer(json, answer);
 }
 
 void printAnswer(Terminal& out, const KeyAnswer& answer) {
@@ -87,15 +94,7 @@ void check(Tool& tool, const std::vector<std::string>& keys) {
     }
   }
 
-  if (tool.options.json) {
-    PlistArray described;
-    for (const KeyAnswer& answer : answers) described.push_back(PlistValue::dictionary(describe(answer)));
-    tool.printedAsJson(PlistValue::dictionary({{"digest", PlistValue::string(config->configFileDigest())},
-                                               {"internal", PlistValue::boolean(config->isInternalDevice())},
-                                               {"problems", PlistValue::array(texts(problems))},
-                                               {"keys", PlistValue::array(std::move(described))}}));
-    return;
-  }
+  if (tool.printedAsJson([&](JsonWriter& json) { writeCheck(json, *config, problems, answers); })) return;
   Terminal& out = tool.out();
   out.line(out.styled("Whitelist", Style::Heading));
   out.line("  digest   " + config->configFileDigest());
