@@ -17,7 +17,6 @@ namespace tbdaily {
 
 namespace {
 
-constexpr auto kReplyTimeout = std::chrono::seconds(10);
 constexpr std::int64_t kBytesPerKB = 1024;
 constexpr std::size_t kIncrementsAtOnce = 4096;  // of a long reply
 constexpr std::string_view kProcessPrefix = "com.velmora.";
@@ -61,7 +60,7 @@ const PlistArray* comparableEntry(const PlistDictionary* baseline, std::string_v
 
 class UsageComparison {
  public:
-  UsageComparison(const PlistDictionary* baseline, DayNumber yesterday, const UsageOutcome::AddKey& addKey)
+  UsageComparison(const PlistDictionary* baseline, DayNumber yesterday, const AddUsageKey& addKey)
       : stored_(baseline), yesterday_(yesterday), addKey_(addKey) {}
 
   void visit(const PlistDictionary& record) {
@@ -107,7 +106,7 @@ class UsageComparison {
 
   const PlistDictionary* stored_;
   const DayNumber yesterday_;
-  const UsageOutcome::AddKey& addKey_;
+  const AddUsageKey& addKey_;
   PlistDictionary baseline_;
   std::string key_;
 };
@@ -121,7 +120,7 @@ class IncrementBuffer {
     if (pending_.size() >= kIncrementsAtOnce) flush();
   }
   void flush() {
-    std::vector<ScalarIncrement> increments;
+    std::vector<ScalarFigure> increments;
     increments.reserve(pending_.size());
     for (const auto& [key, increment] : pending_) increments.push_back({key, increment});
     if (!increments.empty()) client_.addValuesForScalarKeys(increments);
@@ -135,30 +134,30 @@ class IncrementBuffer {
 
 }  // namespace
 
-UsageOutcome compareUsage(const PlistValue& records, const PlistValue& baseline, std::int32_t yesterday,
-                          const UsageOutcome::AddKey& addKey) {
+PlistDictionary compareUsage(const PlistValue& records, const PlistValue& baseline, DayNumber yesterday,
+                             const AddUsageKey& addKey) {
   UsageComparison comparison(baseline.asDictionary(), yesterday, addKey);
   if (records.asArray() != nullptr) {
     for (const PlistValue& record : *records.asArray()) {
       if (record.asDictionary() != nullptr) comparison.visit(*record.asDictionary());
     }
   }
-  return {comparison.takeBaseline()};
+  return comparison.takeBaseline();
 }
 
 void ProcessDataUsageReply(Platform& platform, const PlistValue& records) {
   const DayNumber yesterday = dayBefore(platform.analyticsClient.currentDayNumber());
   const PlistValue stored = platform.preferences.ownValue(kUsageBaselineKey);
   IncrementBuffer increments(platform.analyticsClient);
-  UsageOutcome outcome = compareUsage(
+  PlistDictionary baseline = compareUsage(
       records, stored, yesterday,
       [&increments](std::string_view key, std::int64_t increment) { increments.add(key, increment); });
   increments.flush();
-  platform.preferences.setOwnValue(kUsageBaselineKey, PlistValue::dictionary(std::move(outcome.baseline)));
+  platform.preferences.setOwnValue(kUsageBaselineKey, PlistValue::dictionary(std::move(baseline)));
   platform.preferences.synchronizeOwn();
 }
 
-void CollectDataUsage(Platform& platform) {
+void CollectDataUsage(Platform& platform, std::chrono::milliseconds replyTimeout) {
   // The handler holds its own references, so that a late reply never meets a released object.
   const std::shared_ptr<UsageWorkspace> workspace = platform.usageService.createWorkspace();
   const std::shared_ptr<UsageFeed> feed = workspace != nullptr ? workspace->createFeed() : nullptr;
@@ -170,7 +169,7 @@ void CollectDataUsage(Platform& platform) {
                                processed->release();
                              });
   }
-  if (!processed->try_acquire_for(kReplyTimeout)) {
+  if (!processed->try_acquire_for(replyTimeout)) {
     platform.systemLog.message(LogLevel::Default, "Netwatch timed out, no datausage available");
   }
 }

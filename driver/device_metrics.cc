@@ -2,6 +2,7 @@
 
 #include <array>
 #include <string>
+#include <vector>
 
 #include "driver/data_usage.h"
 #include "driver/driver_metrics.h"
@@ -56,11 +57,13 @@ PlistDictionary eccEventLog(std::span<const std::byte> record) {
 
 void CollectDiskUsage(Platform& platform) {
   const PlistValue answer = platform.deviceAnswers.copyAnswer("DiskUsage");
+  std::vector<ScalarFigure> figures;
   for (const DiskFigure& figure : kDiskFigures) {
     const auto bytes = answer.get(figure.answerKey).asNumber();
     const std::int64_t mebibytes = bytes ? bytes->toInt64() >> kMiBShift : kNotAvailable;
-    platform.analyticsClient.setValueForScalarKey(figure.scalarKey, mebibytes);
+    figures.push_back({figure.scalarKey, mebibytes});
   }
+  platform.analyticsClient.setValuesForScalarKeys(figures);
 }
 
 PlistDictionary currentNANDInfo(Platform& platform, Diagnostics& diagnostics) {
@@ -81,10 +84,13 @@ void CollectNANDInfo(Platform& platform) {
                                info.get(kNANDInfoErrorMessageKey));
     return;
   }
+  std::vector<ScalarFigure> figures;
+  figures.reserve(info.size());
   for (const auto& [key, value] : info) {
     const auto number = value.asNumber();
-    if (number) platform.analyticsClient.setValueForScalarKey(key, number->toInt64());
+    if (number) figures.push_back({key, number->toInt64()});
   }
+  platform.analyticsClient.setValuesForScalarKeys(figures);
 }
 
 void CollectECCEvents(Platform& platform) {

@@ -1,6 +1,8 @@
 #include "driver/driver_metrics.h"
 
+#include <deque>
 #include <string>
+#include <vector>
 
 #include "drivermetrics/kd_report.h"
 #include "platform/analytics_client.h"
@@ -16,13 +18,19 @@ std::uint32_t KeepSimpleChannel(ChannelRecord& channel) {
   return KdReportChannelGetFormat(&channel) == kKdReportSimple ? kKdReportKeep : kKdReportRemove;
 }
 
-std::uint32_t SetDriverMetricScalar(AnalyticsClient& client, ChannelRecord& channel) {
-  const auto name = KdReportChannelGetChannelName(&channel);
-  if (KdReportChannelGetFormat(&channel) != kKdReportSimple || !name) return kKdReportKeep;
-  std::string key(kKeyPrefix);
-  client.setValueForScalarKey(key.append(*name), KdReportSimpleGetIntegerValue(&channel));
-  return kKdReportKeep;
-}
+// The keys of sampled channels, with their values.
+struct DriverMetricScalars {
+  std::deque<std::string> keys;  // where they stay while others are added
+  std::vector<ScalarFigure> figures;
+
+  std::uint32_t add(ChannelRecord& channel) {
+    const auto name = KdReportChannelGetChannelName(&channel);
+    if (KdReportChannelGetFormat(&channel) != kKdReportSimple || !name) return kKdReportKeep;
+    std::string& key = keys.emplace_back(kKeyPrefix);
+    figures.push_back({key.append(*name), KdReportSimpleGetIntegerValue(&channel)});
+    return kKdReportKeep;
+  }
+};
 
 }  // namespace
 
@@ -37,9 +45,9 @@ void CollectDriverMetricScalars(Platform& platform) {
   const auto subscription = KdReportCreateSubscription(registry, nullptr, channels.get(), &subscribed, 0);
   if (subscription == nullptr) return;
   const KdReportCollection samples = KdReportCreateSamples(subscription.get(), subscribed.get());
-  KdReportIterate(samples.get(), [&platform](ChannelRecord& channel) {
-    return SetDriverMetricScalar(platform.analyticsClient, channel);
-  });
+  DriverMetricScalars scalars;
+  KdReportIterate(samples.get(), [&scalars](ChannelRecord& channel) { return scalars.add(channel); });
+  platform.analyticsClient.setValuesForScalarKeys(scalars.figures);
 }
 
 }  // namespace tbdaily

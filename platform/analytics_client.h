@@ -14,10 +14,10 @@ namespace tbdaily {
 using DayNumber = std::int32_t;
 inline constexpr std::int64_t kSecondsPerDay = 86400;
 
-// One increment of a series. The key is borrowed for the call.
-struct ScalarIncrement {
+// One of the figures that a step of a run writes together. The key is borrowed for the call.
+struct ScalarFigure {
   std::string_view key;
-  std::int64_t increment = 0;
+  std::int64_t number = 0;
 };
 
 class AnalyticsClient {
@@ -35,8 +35,11 @@ class AnalyticsClient {
   virtual void setValueForScalarKey(std::string_view key, std::int64_t value) = 0;
   // Adds to today's value of the key, which counts as 0 when absent; wraps at 64 bits.
   virtual void addValueForScalarKey(std::string_view key, std::int64_t increment) = 0;
-  // Comes to the same as adding one after the other; a store may do it at once.
-  virtual void addValuesForScalarKeys(std::span<const ScalarIncrement> increments) {
+  // Both come to the same as one call after the other; a store may do them at once.
+  virtual void setValuesForScalarKeys(std::span<const ScalarFigure> values) {
+    for (const auto& [key, value] : values) setValueForScalarKey(key, value);
+  }
+  virtual void addValuesForScalarKeys(std::span<const ScalarFigure> increments) {
     for (const auto& [key, increment] : increments) addValueForScalarKey(key, increment);
   }
 };

@@ -40,6 +40,7 @@ fs::path Host::livePath(std::string_view absolutePath) const {
 
 int Host::makeFolders(const fs::path& folder) const {
   struct stat status {};
+  if (::stat(folder.c_str(), &status) == 0) return S_ISDIR(status.st_mode) ? 0 : ENOTDIR;
   const int error = ::stat(root_.c_str(), &status) != 0 ? errno : S_ISDIR(status.st_mode) ? 0 : ENOTDIR;
   if (error == 0) return tbdaily::makeFolders(folder);
   noteUnusableRoot(root_, error);

@@ -146,7 +146,7 @@ StoreResult AnalyticsStore::open(MissingStore missing) {
 
 template <typename Write>
 StoreResult AnalyticsStore::writeRow(std::string_view key, const Write& write) {
-  if (const auto fault = analyticsKeyFault(key)) return {StoreFault::Failed, std::string(*fault), 0};
+  if (const auto fault = analyticsKeyFault(key)) return {StoreFault::UnusableKey, std::string(*fault), 0};
   const std::lock_guard lock(mutex_);
   if (StoreResult opened = open(MissingStore::Create); !opened.ok()) return opened;
   if (!loading_) {

@@ -176,7 +176,7 @@ TEST_F(AnalyticsStoreTest, RefusesKeysThatNoReportCanCarry) {
   const std::string longest(kLongestAnalyticsKey, 'k');
   for (const std::string& key : {longest + "k", std::string("\xFF"), std::string("\xED\xA0\x80"),
                                  std::string("a\0", 2), std::string("\x1B[m"), std::string("\xEF\xBF\xBF")}) {
-    EXPECT_EQ(store.setScalar(key, 1, 1).fault, StoreFault::Failed) << key;
+    EXPECT_EQ(store.setScalar(key, 1, 1).fault, StoreFault::UnusableKey) << key;
   }
   EXPECT_FALSE(fs::exists(file));
   for (const std::string& key : {longest, std::string("\xF0\x9F\x98\x80\t")}) {

@@ -11,7 +11,8 @@ namespace {
 
 void noteLostWrite(const AnalyticsStore& store, std::string_view key, const StoreResult& result) {
   if (result.systemError != 0) return noteWriteFailure(store.file(), result.systemError);
-  const bool concernsOnlyThisWrite = result.fault == StoreFault::Locked || analyticsKeyFault(key).has_value();
+  const bool concernsOnlyThisWrite =
+      result.fault == StoreFault::Locked || result.fault == StoreFault::UnusableKey;
   if (!concernsOnlyThisWrite) return noteOnce(result.error);
   // The key may be hostile: no control character of it reaches a terminal.
   std::string line = "\"";
@@ -42,32 +43,38 @@ void SqliteAnalyticsClient::checkpoint() {
 }
 
 void SqliteAnalyticsClient::setValueForScalarKey(std::string_view key, std::int64_t value) {
-  AnalyticsStore* target = store();
-  if (target == nullptr) return;
-  const StoreResult result = target->setScalar(key, currentDayNumber(), value);
-  if (!result.ok()) noteLostWrite(*target, key, result);
+  writeOne(&AnalyticsStore::setScalar, {key, value});
 }
-
 void SqliteAnalyticsClient::addValueForScalarKey(std::string_view key, std::int64_t increment) {
-  AnalyticsStore* target = store();
-  if (target == nullptr) return;
-  const StoreResult result = target->addScalar(key, currentDayNumber(), increment);
-  if (!result.ok()) noteLostWrite(*target, key, result);
+  writeOne(&AnalyticsStore::addScalar, {key, increment});
+}
+void SqliteAnalyticsClient::setValuesForScalarKeys(std::span<const ScalarFigure> values) {
+  writeAll(&AnalyticsStore::setScalar, values);
+}
+void SqliteAnalyticsClient::addValuesForScalarKeys(std::span<const ScalarFigure> increments) {
+  writeAll(&AnalyticsStore::addScalar, increments);
 }
 
-void SqliteAnalyticsClient::addValuesForScalarKeys(std::span<const ScalarIncrement> increments) {
+void SqliteAnalyticsClient::writeOne(Write write, const ScalarFigure& figure) {
   AnalyticsStore* target = store();
-  if (target == nullptr || increments.empty()) return;
+  if (target == nullptr) return;
+  const StoreResult result = (target->*write)(figure.key, currentDayNumber(), figure.number);
+  if (!result.ok()) noteLostWrite(*target, figure.key, result);
+}
+
+void SqliteAnalyticsClient::writeAll(Write write, std::span<const ScalarFigure> figures) {
+  AnalyticsStore* target = store();
+  if (target == nullptr || figures.empty()) return;
   const DayNumber today = currentDayNumber();
   if (const StoreResult begun = target->beginLoad(); !begun.ok()) {
-    return noteLostWrite(*target, increments.front().key, begun);
+    return noteLostWrite(*target, figures.front().key, begun);
   }
-  for (const auto& [key, increment] : increments) {
-    const StoreResult result = target->addScalar(key, today, increment);
+  for (const auto& [key, number] : figures) {
+    const StoreResult result = (target->*write)(key, today, number);
     if (!result.ok()) noteLostWrite(*target, key, result);
   }
   const StoreResult committed = target->commitLoad();
-  if (!committed.ok()) noteLostWrite(*target, increments.front().key, committed);
+  if (!committed.ok()) noteLostWrite(*target, figures.front().key, committed);
 }
 
 AnalyticsStore* SqliteAnalyticsClient::store() {

@@ -25,10 +25,14 @@ class SqliteAnalyticsClient : public AnalyticsClient {
   void checkpoint() override;
   void setValueForScalarKey(std::string_view key, std::int64_t value) override;
   void addValueForScalarKey(std::string_view key, std::int64_t increment) override;
-  // In one transaction; an increment that is refused does not keep the others from being written.
-  void addValuesForScalarKeys(std::span<const ScalarIncrement> increments) override;
+  // In one transaction; a figure that is refused does not keep the others from being written.
+  void setValuesForScalarKeys(std::span<const ScalarFigure> values) override;
+  void addValuesForScalarKeys(std::span<const ScalarFigure> increments) override;
 
  private:
+  using Write = StoreResult (AnalyticsStore::*)(std::string_view key, DayNumber day, std::int64_t number);
+  void writeOne(Write write, const ScalarFigure& figure);
+  void writeAll(Write write, std::span<const ScalarFigure> figures);
   // Null while the store has no place.
   AnalyticsStore* store();
 

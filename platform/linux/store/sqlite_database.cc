@@ -97,7 +97,31 @@ int SqliteDatabase::open(const std::filesystem::path& file, SqliteMode mode,
   sqlite3* connection = nullptr;
   const int code = sqlite3_open_v2(fileUri(file, mode).c_str(), &connection, flags, nullptr);
   connection_.reset(connection);
-  if (code != SQLITE_OK) return code & kPrimaryCode;
+  return code == SQLITE_OK ? configure(busyTimeout) : code & kPrimaryCode;
+}
+
+int SqliteDatabase::openImage(std::vector<std::byte> image) {
+  // The two bytes that ask for a write-ahead log, which memory has no place for.
+  constexpr std::size_t kWriteVersion = 18, kReadVersion = 19;
+  constexpr std::byte kWithoutLog{1}, kWithLog{2};
+  for (const std::size_t version : {kWriteVersion, kReadVersion}) {
+    if (image.size() > version && image[version] == kWithLog) image[version] = kWithoutLog;
+  }
+  connection_.reset();
+  image_ = std::move(image);
+  sqlite3* connection = nullptr;
+  int code = sqlite3_open_v2(":memory:", &connection, SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX, nullptr);
+  connection_.reset(connection);
+  const auto size = static_cast<sqlite3_int64>(image_.size());
+  if (code == SQLITE_OK) {
+    code = sqlite3_deserialize(connection, "main", reinterpret_cast<unsigned char*>(image_.data()), size,
+                               size, SQLITE_DESERIALIZE_READONLY);
+  }
+  return code == SQLITE_OK ? configure({}) : code & kPrimaryCode;
+}
+
+int SqliteDatabase::configure(std::chrono::milliseconds busyTimeout) {
+  sqlite3* connection = connection_.get();
   sqlite3_busy_timeout(connection, static_cast<int>(busyTimeout.count()));
   sqlite3_limit(connection, SQLITE_LIMIT_LENGTH, kLongestValue);
   sqlite3_db_config(connection, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);

@@ -5,11 +5,13 @@
 #pragma once
 
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <filesystem>
 #include <memory>
 #include <string>
 #include <string_view>
+#include <vector>
 
 struct sqlite3;
 struct sqlite3_stmt;
@@ -75,6 +77,8 @@ class SqliteDatabase {
   // Opens a file that exists. What its schema holds is not trusted: no triggers, no views, no unsafe
   // functions.
   int open(const std::filesystem::path& file, SqliteMode mode, std::chrono::milliseconds busyTimeout);
+  // Opens, for reading, what such a file holds, without a look at a log beside it.
+  int openImage(std::vector<std::byte> image);
   // Closing then leaves the write-ahead log as it is.
   void keepLogOnClose();
   void close() { connection_.reset(); }
@@ -102,9 +106,12 @@ class SqliteDatabase {
   std::string errorMessage() const;
 
  private:
+  int configure(std::chrono::milliseconds busyTimeout);
+
   struct Closer {
     void operator()(sqlite3* connection) const;
   };
+  std::vector<std::byte> image_;  // what the connection reads, where it is no file
   std::unique_ptr<sqlite3, Closer> connection_;
 };
 

@@ -136,6 +136,13 @@ Verdict examine(SqliteDatabase& database, const fs::path& file, Examination exam
 
 Verdict examineUntouched(const fs::path& file, Examination examination) {
   SqliteDatabase database;
+  // All pages are wanted: they are read at once, not one by one.
+  FileContents contents;
+  if (examination == Examination::Pages &&
+      readRegularFile(file, contents, static_cast<std::size_t>(kFullExaminationBytes)) == 0) {
+    if (database.openImage(std::move(contents.bytes)) != SQLITE_OK) return failed(database, file);
+    return examine(database, file, examination);
+  }
   if (database.open(file, SqliteMode::Immutable, {}) != SQLITE_OK) return failed(database, file);
   return examine(database, file, examination);
 }

@@ -20,9 +20,10 @@ inline constexpr std::size_t kLongestAnalyticsKey = 1024;  // bytes
 // Why a failed operation on the store failed.
 enum class StoreFault {
   None,
-  Unusable,  // what lies there is no store of ours, or a damaged one; an administrator has to act
-  Locked,    // another program kept it locked
-  Failed,    // everything else: no room, no permission, an unusable key
+  Unusable,     // what lies there is no store of ours, or a damaged one; an administrator has to act
+  Locked,       // another program kept it locked
+  UnusableKey,  // no key of a store: the write alone is refused
+  Failed,       // everything else: no room, no permission
 };
 
 struct StoreResult {
