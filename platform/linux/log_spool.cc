@@ -42,11 +42,18 @@ class FileOutput : public LogOutput {
 };
 
 // All of the text or none of it: half a line would spoil the next one too. Callers hold the lock.
-int appendWhole(int fd, std::string_view text) {
+int appendWhole(const fs::path& place, std::string_view text) {
+  const FileDescriptor fd(
+      ::open(place.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0600));
   struct stat before {};
-  if (::fstat(fd, &before) != 0) return errno;
-  const int error = writeAll(fd, text);
-  return error != 0 && ::ftruncate(fd, before.st_size) != 0 ? errno : error;
+  if (!fd.isOpen() || ::fstat(fd.get(), &before) != 0) return errno;
+  const int error = writeAll(fd.get(), text);
+  return error != 0 && ::ftruncate(fd.get(), before.st_size) != 0 ? errno : error;
+}
+
+// Folders are made when one turns out to be missing, not looked for each time.
+bool isMissingFolder(int error) {
+  return error == ENOENT || error == ENOTDIR;
 }
 
 std::vector<fs::path> filesIn(const fs::path& folder) {
@@ -102,8 +109,11 @@ std::string spoolStamp(PlistDate now) {
 }
 
 int LogSpool::lockSpool(FileLock& lock) const {
-  if (const int error = host_.makeFolders(folder()); error != 0) return error;
-  return lock.acquire(folder() / ".lock");
+  const fs::path place = folder() / ".lock";
+  const int error = lock.acquire(place);
+  if (!isMissingFolder(error)) return error;
+  const int folderError = host_.makeFolders(folder());
+  return folderError == 0 ? lock.acquire(place) : folderError;
 }
 
 bool LogSpool::writePending(std::string_view type, std::string_view name, const PlistValue& options,
@@ -148,11 +158,10 @@ void LogSpool::appendStructured(int type, const PlistDictionary& data, PlistDate
       "{\"time\": \"" + stampText(now, 3) + "\", \"data\": " + jsonText(PlistValue::dictionary(data)) + "}\n";
   FileLock lock;
   int error = lockSpool(lock);
-  if (error == 0) error = host_.makeFolders(place.parent_path());
-  if (error == 0) {
-    const FileDescriptor fd(
-        ::open(place.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0600));
-    error = fd.isOpen() ? appendWhole(fd.get(), line) : errno;
+  if (error == 0) error = appendWhole(place, line);
+  if (isMissingFolder(error)) {
+    error = host_.makeFolders(place.parent_path());
+    if (error == 0) error = appendWhole(place, line);
   }
   if (error != 0) noteWriteFailure(place, error);
 }
