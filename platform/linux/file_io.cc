@@ -54,10 +54,11 @@ int readRegularFile(const fs::path& path, FileContents& contents, std::size_t ma
   if (static_cast<std::uint64_t>(status.st_size) > maximumSize) return EFBIG;
   contents.identity = FileIdentity::of(status);
   if (!isSettled(contents.identity)) contents.identity = {};
-  contents.bytes.resize(static_cast<std::size_t>(status.st_size));
+  // Room for one byte more than the file had tells whether it grew since.
+  const auto size = static_cast<std::size_t>(status.st_size);
+  contents.bytes.resize(size + 1);
   std::size_t filled = 0;
   while (true) {
-    // One byte more than the file had tells whether it grew since.
     if (filled == contents.bytes.size()) contents.bytes.resize(filled + std::max<std::size_t>(filled / 8, 1));
     const ssize_t count = ::read(fd.get(), contents.bytes.data() + filled, contents.bytes.size() - filled);
     if (count < 0 && errno == EINTR) continue;
@@ -65,6 +66,7 @@ int readRegularFile(const fs::path& path, FileContents& contents, std::size_t ma
     if (count == 0) break;
     filled += static_cast<std::size_t>(count);
     if (filled > maximumSize) return EFBIG;
+    if (filled == size && filled < contents.bytes.size()) break;  // no more than it had
   }
   contents.bytes.resize(filled);
   return 0;
