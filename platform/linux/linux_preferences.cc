@@ -13,6 +13,7 @@
 namespace tbdaily {
 
 namespace fs = std::filesystem;
+using State = CachedPlistFile::State;
 
 fs::path LinuxPreferences::folder() const {
   return host_.devicePath("/var/mobile/Library/Preferences");
@@ -31,45 +32,23 @@ bool LinuxPreferences::acceptsDomain(std::string_view domain) {
   return false;
 }
 
-void LinuxPreferences::read(const fs::path& place, Domain& domain) {
-  domain.values = PlistValue::dictionary({});
-  FileContents contents;
-  if (const int error = readRegularFile(place, contents); error != 0) {
-    domain.identity = FileIdentity{};  // tried again at the next look
-    domain.state = error == ENOENT ? FileState::Missing : FileState::Unreadable;
-    if (error != ENOENT) noteOnce("cannot read preferences " + place.native() + ": " + errorText(error));
-    return;
-  }
-  domain.identity = contents.identity;
-  const PlistParseResult parsed = codec_.parse(contents.bytes);
-  if (parsed.value.asDictionary() != nullptr) {
-    domain.state = FileState::Readable;
-    domain.values = parsed.value;
-    return;
-  }
-  domain.state = FileState::Damaged;
-  noteOnce("preferences " + place.native() + " are damaged and read as empty: " +
-           (parsed.error.empty() ? "the root is no dictionary" : parsed.error));
-}
-
-LinuxPreferences::Domain& LinuxPreferences::current(std::string_view name) {
+CachedPlistFile& LinuxPreferences::current(std::string_view name) {
   auto found = domains_.find(name);
-  if (found == domains_.end()) found = domains_.emplace(std::string(name), Domain{}).first;
-  Domain& domain = found->second;
+  if (found == domains_.end()) found = domains_.try_emplace(std::string(name)).first;
+  CachedPlistFile& domain = found->second;
   const fs::path place = file(name);
-  const auto identity = fileIdentity(place);
-  if (!identity) {
-    domain = Domain{};
-  } else if (identity != domain.identity) {
-    read(place, domain);
-  }
+  domain.refresh(place, codec_);
+  if (domain.state() == State::Unreadable)
+    noteOnce("cannot read preferences " + place.native() + ": " + domain.fault());
+  if (domain.state() == State::Damaged)
+    noteOnce("preferences " + place.native() + " are damaged and read as empty: " + domain.fault());
   return domain;
 }
 
 PlistValue LinuxPreferences::getValue(std::string_view key, std::string_view domain) {
   if (!acceptsDomain(domain)) return {};
   const std::lock_guard guard(mutex_);
-  return current(domain).values.get(key);
+  return current(domain).root().get(key);
 }
 
 bool LinuxPreferences::moveAside(const fs::path& place) {
@@ -112,19 +91,16 @@ PlistDictionary LinuxPreferences::changed(PlistDictionary values, std::span<cons
   return values;
 }
 
-std::string LinuxPreferences::bytesOf(std::string_view name, Domain& domain,
+std::string LinuxPreferences::bytesOf(std::string_view name, const PlistDictionary& stored,
                                       std::span<const Change> changes) {
-  const PlistDictionary before = *domain.values.asDictionary();
-  domain.values = PlistValue::dictionary(changed(before, changes));
-  PlistWriteResult result = codec_.write(domain.values, PlistForm::Exact);
+  PlistWriteResult result = codec_.write(PlistValue::dictionary(changed(stored, changes)), PlistForm::Exact);
   if (result.ok) return std::move(result.bytes);
   // One value that no file can hold must not cost the others their place.
   std::vector<Change> writable;
   for (const Change& change : changes) {
     if (isWritable(change, name)) writable.push_back(change);
   }
-  domain.values = PlistValue::dictionary(changed(before, writable));
-  return codec_.write(domain.values, PlistForm::Exact).bytes;
+  return codec_.write(PlistValue::dictionary(changed(stored, writable)), PlistForm::Exact).bytes;
 }
 
 void LinuxPreferences::changeDomain(std::string_view name, std::span<const Change> changes) {
@@ -138,17 +114,17 @@ void LinuxPreferences::changeDomain(std::string_view name, std::span<const Chang
   FileLock lock;
   if (const int error = lock.acquire(lockFile); error != 0) return noteWriteFailure(lockFile, error);
 
-  Domain& domain = current(name);
-  if (domain.state == FileState::Unreadable)
+  CachedPlistFile& domain = current(name);
+  if (domain.state() == State::Unreadable)
     return;  // named when it was read; replacing it would lose what it holds
-  const PlistDictionary& stored = *domain.values.asDictionary();
+  const PlistDictionary& stored = *domain.root().asDictionary();
   const bool changesNothing =
       onlyRemoves && std::none_of(changes.begin(), changes.end(),
                                   [&stored](const Change& c) { return stored.contains(c.key); });
-  if (changesNothing && domain.state != FileState::Damaged) return;
-  if (domain.state == FileState::Damaged && !moveAside(place)) return;
-  const std::string bytes = bytesOf(name, domain, changes);
-  domain.identity = FileIdentity{};  // read anew at the next look, whatever becomes of the write
+  if (changesNothing && domain.state() != State::Damaged) return;
+  if (domain.state() == State::Damaged && !moveAside(place)) return;
+  const std::string bytes = bytesOf(name, stored, changes);
+  domain.forget();  // whatever becomes of the write
   if (bytes.empty()) return;
   if (const int error = replaceFile(place, bytes); error != 0) noteWriteFailure(place, error);
 }

@@ -7,9 +7,9 @@
 
 #include <map>
 #include <mutex>
-#include <optional>
 #include <string>
 
+#include "platform/linux/cached_plist_file.h"
 #include "platform/linux/file_io.h"
 #include "platform/linux/host.h"
 #include "platform/preferences_store.h"
@@ -30,18 +30,10 @@ class LinuxPreferences : public PreferencesStore {
   std::filesystem::path folder() const;
 
  private:
-  enum class FileState { Readable, Missing, Damaged, Unreadable };
-  struct Domain {
-    std::optional<FileIdentity> identity;
-    FileState state = FileState::Missing;
-    PlistValue values = PlistValue::dictionary({});
-  };
-
   static bool acceptsDomain(std::string_view domain);
   std::filesystem::path file(std::string_view domain) const;
   // The domain as its file stands now; parsed anew only when the file changed.
-  Domain& current(std::string_view domain);
-  void read(const std::filesystem::path& place, Domain& domain);
+  CachedPlistFile& current(std::string_view domain);
   struct Change {
     std::string_view key;
     PlistValue value;  // none removes the key
@@ -50,14 +42,14 @@ class LinuxPreferences : public PreferencesStore {
   void changeDomain(std::string_view name, std::span<const Change> changes);
   static PlistDictionary changed(PlistDictionary values, std::span<const Change> changes);
   // The file's contents after the changes; empty when they cannot be written.
-  std::string bytesOf(std::string_view name, Domain& domain, std::span<const Change> changes);
+  std::string bytesOf(std::string_view name, const PlistDictionary& stored, std::span<const Change> changes);
   bool isWritable(const Change& change, std::string_view name);
   static bool moveAside(const std::filesystem::path& place);
 
   const Host& host_;
   PropertyListCodec& codec_;
   std::mutex mutex_;  // over what follows: a usage reply is processed on a thread of its own
-  std::map<std::string, Domain, std::less<>> domains_;
+  std::map<std::string, CachedPlistFile, std::less<>> domains_;
 };
 
 }  // namespace tbdaily

@@ -1,7 +1,6 @@
 #include "platform/linux/replay/recordings.h"
 
 #include <algorithm>
-#include <cerrno>
 
 #include "platform/linux/host_notes.h"
 
@@ -12,32 +11,16 @@ std::filesystem::path Recordings::path(std::string_view file) const {
 }
 
 PlistValue Recordings::load(std::string_view file) {
+  using State = CachedPlistFile::State;
   const std::lock_guard guard(mutex_);
   auto found = loaded_.find(file);
-  if (found == loaded_.end()) found = loaded_.emplace(std::string(file), Loaded{}).first;
-  Loaded& loaded = found->second;
-
+  if (found == loaded_.end()) found = loaded_.try_emplace(std::string(file)).first;
+  CachedPlistFile& loaded = found->second;
   const std::filesystem::path place = path(file);
-  const auto identity = fileIdentity(place);
-  if (identity == loaded.identity) return loaded.root;
-  loaded = Loaded{};
-  if (!identity) return loaded.root;
-
-  loaded.identity = FileIdentity{};  // what could not be read is tried again
-  FileContents contents;
-  if (const int error = readRegularFile(place, contents); error != 0) {
-    if (error != ENOENT) noteOnce("recording " + place.native() + " is ignored: " + errorText(error));
-    return loaded.root;
-  }
-  loaded.identity = contents.identity;
-  const PlistParseResult parsed = codec_.parse(contents.bytes);
-  if (parsed.value.asDictionary() != nullptr) {
-    loaded.root = parsed.value;
-  } else {
-    const std::string reason = parsed.error.empty() ? "its root is no dictionary" : parsed.error;
-    noteOnce("recording " + place.native() + " is ignored: " + reason);
-  }
-  return loaded.root;
+  loaded.refresh(place, codec_);
+  if (loaded.state() == State::Damaged || loaded.state() == State::Unreadable)
+    noteOnce("recording " + place.native() + " is ignored: " + loaded.fault());
+  return loaded.root();
 }
 
 bool Recordings::readFile(std::string_view file, FileContents& contents) {

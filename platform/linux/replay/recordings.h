@@ -3,10 +3,10 @@
 
 #include <map>
 #include <mutex>
-#include <optional>
 #include <string>
 #include <string_view>
 
+#include "platform/linux/cached_plist_file.h"
 #include "platform/linux/file_io.h"
 #include "platform/linux/host.h"
 #include "platform/property_list_codec.h"
@@ -32,15 +32,10 @@ class Recordings {
   std::filesystem::path path(std::string_view file) const;
 
  private:
-  struct Loaded {
-    std::optional<FileIdentity> identity;
-    PlistValue root = PlistValue::dictionary({});
-  };
-
   const Host& host_;
   PropertyListCodec& codec_;
   std::mutex mutex_;  // a usage reply is processed on a thread of its own
-  std::map<std::string, Loaded, std::less<>> loaded_;
+  std::map<std::string, CachedPlistFile, std::less<>> loaded_;
 };
 
 namespace recording {

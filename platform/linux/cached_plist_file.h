@@ -1,0 +1,38 @@
+// A property-list file that is parsed anew only when it changed.
+#pragma once
+
+#include <filesystem>
+#include <optional>
+#include <string>
+
+#include "platform/linux/file_io.h"
+#include "platform/plist_value.h"
+#include "platform/property_list_codec.h"
+
+namespace tbdaily {
+
+class CachedPlistFile {
+ public:
+  enum class State { Missing, Readable, Damaged, Unreadable };
+
+  // Looks at the file as it stands now.
+  void refresh(const std::filesystem::path& place, PropertyListCodec& codec);
+  // The next look reads the file, whatever became of it meanwhile.
+  void forget() { identity_ = FileIdentity{}; }
+
+  State state() const { return state_; }
+  // A dictionary; an empty one unless the file is readable.
+  const PlistValue& root() const { return root_; }
+  // One line, of a file that is damaged or cannot be read.
+  const std::string& fault() const { return fault_; }
+
+ private:
+  void read(const std::filesystem::path& place, PropertyListCodec& codec);
+
+  std::optional<FileIdentity> identity_;  // none: there was no file
+  State state_ = State::Missing;
+  PlistValue root_ = PlistValue::dictionary({});
+  std::string fault_;
+};
+
+}  // namespace tbdaily
