@@ -74,7 +74,7 @@ PlistDictionary currentNANDInfo(Platform& platform, Diagnostics& diagnostics) {
 }
 
 void CollectNANDInfo(Platform& platform) {
-  const PlistDictionary info = currentNANDInfo(platform);
+  const PlistDictionary info = currentNANDInfo(platform, platform.diagnostics);
   if (info.empty()) {
     platform.systemLog.message(LogLevel::Default, "failed to get NAND info dict");
     return;
@@ -112,7 +112,7 @@ void CollectECCEvents(Platform& platform) {
 
 void CollectDailyDeviceMetrics(Platform& platform) {
   CollectDiskUsage(platform);
-  DumpStorageStructuredLog(platform, false);
+  DumpStorageStructuredLog(platform, false, platform.diagnostics);
   CollectNANDInfo(platform);
   CollectECCEvents(platform);
   CollectDataUsage(platform);

@@ -1,9 +1,9 @@
 // The device's health and usage figures of the moment, as analytics scalars and structured data logs.
 #pragma once
 
+#include "platform/diagnostics.h"
 #include "platform/platform.h"
 #include "platform/plist_value.h"
-#include "storage/diagnostics.h"
 
 namespace tbdaily {
 
@@ -19,6 +19,6 @@ void CollectNANDInfo(Platform& platform);
 void CollectECCEvents(Platform& platform);
 
 // The NAND info of the moment with the freezer's entries merged in, as the daily run records it.
-PlistDictionary currentNANDInfo(Platform& platform, Diagnostics& diagnostics = standardDiagnostics());
+PlistDictionary currentNANDInfo(Platform& platform, Diagnostics& diagnostics);
 
 }  // namespace tbdaily

@@ -10,6 +10,7 @@ class AnalyticsHistory;
 class AnalyticsHome;
 class AppRegistry;
 class DeviceAnswers;
+class Diagnostics;
 class DriverRegistry;
 class DynamicLoader;
 class FileSystem;
@@ -44,6 +45,7 @@ struct Platform {
   FileSystem& fileSystem;
   DynamicLoader& dynamicLoader;
   MessageDigest& messageDigest;
+  Diagnostics& diagnostics;
   AnalyticsHome& analyticsHome;  // no family of its own: a rule over two of them
 };
 

@@ -36,6 +36,8 @@ Platform platformWith(const Platform& p, Services&... replacements) {
           of(p.appRegistry),       of(p.localeSettings),  of(p.serviceListener),
           of(p.notifications),     of(p.systemLog),       of(p.kernel),
           of(p.fileSystem),        of(p.dynamicLoader),   of(p.messageDigest),
+          of(p.diagnostics),
+
           of(p.analyticsHome)};
 }
 

@@ -23,7 +23,7 @@ TEST(NandRecommendsContentDeletion, NeedsAWholeAnswerThatIsNotZero) {
                {"Other", 1, 4, {}, false, kNoService}};
   for (const auto& [serviceClass, last, filled, statuses, recommended, events] : cases) {
     testing::FakeDriverRegistry registry;
-    testing::CapturedDiagnostics said;
+    testing::FakeDiagnostics said;
     registry.drivers.emplace_back().serviceClass = serviceClass;
     registry.openStatus = statuses[0];
     registry.closeStatus = statuses[2];

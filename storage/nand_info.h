@@ -5,9 +5,9 @@
 #include <optional>
 #include <string_view>
 
+#include "platform/diagnostics.h"
 #include "platform/platform.h"
 #include "platform/plist_value.h"
-#include "storage/diagnostics.h"
 #include "storage/stats_context.h"
 
 namespace tbdaily {
@@ -25,18 +25,16 @@ inline constexpr std::array<std::string_view, 5> kNANDInfoReadsBeforeErasureKeys
 
 // Fetches the controller afresh. When that fails, two entries only: kNANDInfoErrorKey (the string "1") and
 // kNANDInfoErrorMessageKey.
-PlistDictionary CopyNANDInfo(Platform& platform, Diagnostics& diagnostics = standardDiagnostics());
+PlistDictionary CopyNANDInfo(Platform& platform, Diagnostics& diagnostics);
 
 // The dictionary of a parsed buffer. The log variant has no version and demo-mode entries, and is none for a
 // context without an export version, which otherwise gives the two error entries. Unsigned values are stored
 // in signed numbers of the same width.
 std::optional<PlistDictionary> NandInfoFromContext(PreferencesStore& preferences, const StatsContext& context,
-                                                   bool logVariant,
-                                                   Diagnostics& diagnostics = standardDiagnostics());
+                                                   bool logVariant, Diagnostics& diagnostics);
 
 // Fetches the controller and merges the log variant into the target; nothing when the fetch fails.
-void DumpNANDInfo(Platform& platform, PlistDictionary& target,
-                  Diagnostics& diagnostics = standardDiagnostics());
+void DumpNANDInfo(Platform& platform, PlistDictionary& target, Diagnostics& diagnostics);
 
 // Sets one entry of a dictionary; for each entry of another.
 void CopyDictionary(std::string_view key, const PlistValue& value, PlistDictionary& target);
@@ -44,6 +42,6 @@ void CopyDictionary(std::string_view key, const PlistValue& value, PlistDictiona
 // Sets the key to a number of the kind that it was made with. Says "Failed to create PVNumber from value: %p"
 // (without a line end) and sets nothing when there is no memory for it.
 void SetNumberValue(PlistDictionary& dictionary, std::string_view key, const PlistNumber& value,
-                    Diagnostics& diagnostics = standardDiagnostics());
+                    Diagnostics& diagnostics);
 
 }  // namespace tbdaily

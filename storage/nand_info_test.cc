@@ -24,7 +24,7 @@ std::optional<PlistDictionary> infoOf(const StatsBuffer& buffer, bool logVariant
   FakePlatform fake;
   StatsContext context;
   STXParseBufferToCxt(context, buffer.bytes);
-  return NandInfoFromContext(fake.preferences, context, logVariant);
+  return NandInfoFromContext(fake.preferences, context, logVariant, fake.diagnostics);
 }
 
 PlistDictionary errorInfo(const char* message) {
@@ -117,7 +117,7 @@ TEST(NandInfo, DerivesItsOwnValues) {
 
 TEST(NandInfo, IsCopiedFromTheControllerAndMergedIntoALog) {
   FakePlatform fake;
-  testing::CapturedDiagnostics said;
+  testing::FakeDiagnostics said;
   testing::ScriptedController controller(fake.driverRegistry, "STXStorage");
   controller.buffers[13] = full().bytes;
   for (const auto& [demo, number] : {std::pair(PlistValue::boolean(true), 1), {PlistValue::int32(1), 0}}) {

@@ -8,9 +8,9 @@
 #include <memory>
 #include <span>
 
+#include "platform/diagnostics.h"
 #include "platform/driver_handle.h"
 #include "platform/driver_registry.h"
-#include "storage/diagnostics.h"
 #include "storage/exporters.h"
 #include "storage/stx_request.h"
 
@@ -92,14 +92,13 @@ class StorageConnection {
 // provides zero-filled. Always writes the descriptor. True when the buffer was fetched and accepted; the
 // context may hold values after a refusal too.
 bool FetchStatsContext(DriverRegistry& registry, const NandExporter*& descriptor, StatsContext& context,
-                       Diagnostics& diagnostics = standardDiagnostics(),
-                       NandExporterTable exporters = nand_exporters);
+                       Diagnostics& diagnostics, NandExporterTable exporters = nand_exporters);
 
 // FetchStatsContext as an owner: the destructor releases the context through its descriptor, whether the
 // fetch succeeded or not.
 class FetchedStats {
  public:
-  explicit FetchedStats(DriverRegistry& registry, Diagnostics& diagnostics = standardDiagnostics(),
+  explicit FetchedStats(DriverRegistry& registry, Diagnostics& diagnostics,
                         NandExporterTable exporters = nand_exporters);
   ~FetchedStats();
   FetchedStats(const FetchedStats&) = delete;
@@ -116,11 +115,9 @@ class FetchedStats {
 
 // A connection by hand, for callers that keep it open: 0, or a handle that FlashDisconnect closes. Writes the
 // descriptor as findNandExporter does.
-KdHandle FlashConnect(DriverRegistry& registry, const NandExporter*& descriptor,
-                      Diagnostics& diagnostics = standardDiagnostics(),
+KdHandle FlashConnect(DriverRegistry& registry, const NandExporter*& descriptor, Diagnostics& diagnostics,
                       NandExporterTable exporters = nand_exporters);
-void FlashDisconnect(DriverRegistry& registry, KdHandle connection,
-                     Diagnostics& diagnostics = standardDiagnostics());
+void FlashDisconnect(DriverRegistry& registry, KdHandle connection, Diagnostics& diagnostics);
 
 // Service and connection by hand. Zero handles mean none.
 struct StxConnection {
@@ -130,8 +127,7 @@ struct StxConnection {
 };
 
 // Fills a record that holds nothing. False, and nothing held, when there is no controller of this family.
-bool openSTXConnection(DriverRegistry& registry, StxConnection& connection,
-                       Diagnostics& diagnostics = standardDiagnostics(),
+bool openSTXConnection(DriverRegistry& registry, StxConnection& connection, Diagnostics& diagnostics,
                        NandExporterTable exporters = nand_exporters);
 // Closes and releases what the record holds, and zeroes the handles.
 void closeSTXConnection(DriverRegistry& registry, StxConnection& connection);

@@ -58,7 +58,7 @@ struct Fetch {
   testing::ScriptedController controller;
   const NandExporter* descriptor = nullptr;
   StatsContext context;
-  testing::CapturedDiagnostics said;
+  testing::FakeDiagnostics said;
 };
 
 TEST(FetchStatsContext, AsksEachControllerThroughItsOwnMethods) {

@@ -8,19 +8,11 @@
 
 #include "platform/byte_reader.h"
 #include "platform/byte_writer.h"
-#include "storage/diagnostics.h"
+#include "platform/diagnostics.h"
+#include "testing/fake_diagnostics.h"
 #include "testing/fake_drivers.h"
 
 namespace tbdaily::testing {
-
-class CapturedDiagnostics : public Diagnostics {
- public:
-  std::string errors, outputs;
-
- private:
-  void writeError(std::string_view text) override { errors += text; }
-  void writeOutput(std::string_view text) override { outputs += text; }
-};
 
 class StatsBuffer {
  public:

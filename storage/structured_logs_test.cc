@@ -60,7 +60,7 @@ class StructuredLogsTest : public ::testing::Test {
   const std::vector<std::pair<int, PlistDictionary>>& logs() { return fake.logSubmission.structured; }
 
   testing::FakePlatform fake;
-  testing::CapturedDiagnostics diagnostics;
+  testing::FakeDiagnostics diagnostics;
 };
 
 TEST(WriteAmplification, CountsErasedUnitsForEachUnitWritten) {

@@ -9,7 +9,7 @@
 #include <span>
 #include <string_view>
 
-#include "storage/diagnostics.h"
+#include "platform/diagnostics.h"
 
 namespace tbdaily {
 
@@ -58,8 +58,7 @@ ControllerKind controllerKind(std::string_view chipId);
 // From the "manufacturer-id" text: its first five bytes in bits 8 to 47, the rest 0. Decides the layout for
 // ControllerKind::VendorLayouts. Any text gives a key; characters that are no hexadecimal digits are told as
 // by hexStringToByte.
-std::uint64_t nandVendorKey(std::string_view manufacturerId,
-                            Diagnostics& diagnostics = standardDiagnostics());
+std::uint64_t nandVendorKey(std::string_view manufacturerId, Diagnostics& diagnostics);
 
 // Fills a record that the caller provides zero-filled; words that the layout lacks stay 0.
 using NandCounterParser = void (*)(NandCounterBlock block, NandCounterRecord& record);
@@ -77,8 +76,8 @@ void parseOnlyAlgoGenericCountersQ8(NandCounterBlock block, NandCounterRecord& r
 
 // Reads at most two hexadecimal digits of either case. Each other character counts as the digit 0, and
 // "unrecognized hex character: %c" (without a line end) goes to standard output.
-std::uint8_t hexStringToByte(std::string_view text, Diagnostics& diagnostics = standardDiagnostics());
+std::uint8_t hexStringToByte(std::string_view text, Diagnostics& diagnostics);
 // Reads at most eight, in pairs from the left; the last digit of an odd number of them is a byte of its own.
-std::uint32_t hexStringToInt32(std::string_view text, Diagnostics& diagnostics = standardDiagnostics());
+std::uint32_t hexStringToInt32(std::string_view text, Diagnostics& diagnostics);
 
 }  // namespace tbdaily

@@ -39,7 +39,7 @@ TEST(NandCounters, ChooseTheLayoutFromTheTextsOfTheController) {
       {"", "ad8252232200", parseCounters1y},
       {"", "458260DE57", parseCounters1y},
       {"", "", parseCounters1y}};
-  testing::CapturedDiagnostics said;
+  testing::FakeDiagnostics said;
   for (const auto& [chip, manufacturer, parser] : cases)
     EXPECT_EQ(nandCounterParser(controllerKind(chip), nandVendorKey(manufacturer, said)), parser);
   EXPECT_EQ(said.outputs, "unrecognized hex character: xunrecognized hex character: y");

@@ -4,6 +4,7 @@
 #include "platform/analytics_home.h"
 #include "platform/platform.h"
 #include "testing/fake_analytics.h"
+#include "testing/fake_diagnostics.h"
 #include "testing/fake_drivers.h"
 #include "testing/fake_log_submission.h"
 #include "testing/fake_property_list_codec.h"
@@ -34,12 +35,13 @@ struct FakePlatform {
   FakeFileSystem fileSystem;
   FakeDynamicLoader dynamicLoader;
   FakeMessageDigest messageDigest;
+  FakeDiagnostics diagnostics;
   AnalyticsHome analyticsHome{deviceAnswers, fileSystem};
 
   Platform platform{driverRegistry,   preferences,       deviceAnswers, logSubmission, analyticsClient,
                     analyticsHistory, propertyListCodec, stackSnapshot, usageService,  appRegistry,
                     localeSettings,   serviceListener,   notifications, systemLog,     kernel,
-                    fileSystem,       dynamicLoader,     messageDigest, analyticsHome};
+                    fileSystem,       dynamicLoader,     messageDigest, diagnostics,   analyticsHome};
 
   // Puts a property list into a file, through the fake codec.
   void putPlist(std::string_view path, const PlistDictionary& root) {

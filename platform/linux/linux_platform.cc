@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "platform/diagnostics.h"
 #include "platform/linux/linux_app_registry.h"
 #include "platform/linux/linux_device_answers.h"
 #include "platform/linux/linux_dynamic_loader.h"
@@ -52,10 +53,26 @@ struct LinuxPlatform::Families {
   RecordedStackSnapshot stackSnapshot{recordings};
   RecordedUsageService usageService{recordings};  // last: it ends before what its replies use
 
-  Platform services{driverRegistry,   preferences,     deviceAnswers, logSubmission, analyticsClient,
-                    analyticsHistory, codec,           stackSnapshot, usageService,  appRegistry,
-                    localeSettings,   serviceListener, notifications, systemLog,     kernel,
-                    fileSystem,       dynamicLoader,   messageDigest, analyticsHome};
+  Platform services{driverRegistry,
+                    preferences,
+                    deviceAnswers,
+                    logSubmission,
+                    analyticsClient,
+                    analyticsHistory,
+                    codec,
+                    stackSnapshot,
+                    usageService,
+                    appRegistry,
+                    localeSettings,
+                    serviceListener,
+                    notifications,
+                    systemLog,
+                    kernel,
+                    fileSystem,
+                    dynamicLoader,
+                    messageDigest,
+                    standardDiagnostics(),
+                    analyticsHome};
 };
 
 LinuxPlatform::LinuxPlatform(Host host) : families_(std::make_unique<Families>(std::move(host))) {}

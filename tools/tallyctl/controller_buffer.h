@@ -6,8 +6,8 @@
 #include <string_view>
 #include <vector>
 
+#include "platform/diagnostics.h"
 #include "platform/driver_registry.h"
-#include "storage/diagnostics.h"
 #include "storage/exporters.h"
 
 namespace tbdaily {

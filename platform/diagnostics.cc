@@ -1,4 +1,4 @@
-#include "storage/diagnostics.h"
+#include "platform/diagnostics.h"
 
 #include <algorithm>
 #include <array>
