@@ -1,5 +1,12 @@
 # What every target of the project is built with, and the two kinds of target that a folder declares.
 
+find_program(CCACHE ccache)
+if(CCACHE AND NOT CMAKE_CXX_COMPILER_LAUNCHER)
+  # Headers that are read once cannot be told apart by their time.
+  set(CMAKE_CXX_COMPILER_LAUNCHER ${CMAKE_COMMAND} -E env CCACHE_SLOPPINESS=pch_defines,time_macros ${CCACHE})
+  add_compile_options($<$<COMPILE_LANG_AND_ID:CXX,GNU>:-fpch-preprocess>)
+endif()
+
 add_library(tbdaily_options INTERFACE)
 target_compile_options(tbdaily_options INTERFACE
   -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wsign-conversion -Wold-style-cast -Wnon-virtual-dtor -Woverloaded-virtual
@@ -28,6 +35,14 @@ function(tbdaily_test name)
   find_package(GTest REQUIRED)
   add_executable(${name} ${ARG_SOURCES})
   target_link_libraries(${name} PRIVATE ${ARG_DEPENDS} GTest::gmock GTest::gtest_main tbdaily_options)
+  # The fakes and the test framework are read once; fakes_contract_test has made them ready.
+  if(CMAKE_CXX_COMPILER_ID STREQUAL GNU AND "testing" IN_LIST ARG_DEPENDS)
+    if(TARGET fakes_contract_test AND NOT name STREQUAL fakes_contract_test)
+      target_precompile_headers(${name} REUSE_FROM fakes_contract_test)
+    else()
+      target_precompile_headers(${name} PRIVATE <gmock/gmock.h> <testing/fake_platform.h>)
+    endif()
+  endif()
   add_test(NAME ${name} COMMAND ${name})
   set_tests_properties(${name} PROPERTIES TIMEOUT 300)
 endfunction()

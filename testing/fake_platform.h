@@ -13,7 +13,8 @@
 namespace tbdaily::testing {
 
 struct FakePlatform {
-  FakePlatform() = default;
+  FakePlatform();
+  ~FakePlatform();
   FakePlatform(const FakePlatform&) = delete;
   FakePlatform& operator=(const FakePlatform&) = delete;
 
@@ -44,16 +45,9 @@ struct FakePlatform {
                     fileSystem,       dynamicLoader,     messageDigest, diagnostics,   analyticsHome};
 
   // Puts a property list into a file, through the fake codec.
-  void putPlist(std::string_view path, const PlistDictionary& root) {
-    const PlistWriteResult written = propertyListCodec.write(PlistValue::dictionary(root));
-    propertyListCodec.forms.clear();
-    const auto bytes = std::as_bytes(std::span(written.bytes));
-    fileSystem.files[std::string(path)] = {bytes.begin(), bytes.end()};
-  }
+  void putPlist(std::string_view path, const PlistDictionary& root);
   // The value that a log's bytes hold.
-  PlistValue plistOf(const FakeLogSubmission::Log& log) {
-    return propertyListCodec.parse(std::as_bytes(std::span(log.bytes))).value;
-  }
+  PlistValue plistOf(const FakeLogSubmission::Log& log);
 };
 
 }  // namespace tbdaily::testing
