@@ -7,6 +7,8 @@
 
 namespace tbdaily {
 
+using namespace kdreport;
+
 namespace {
 
 constexpr std::int32_t kDailyCategory = 0x100;
@@ -16,7 +18,7 @@ std::uint32_t KeepSimpleChannel(ChannelRecord& channel) {
   return KdReportChannelGetFormat(&channel) == kKdReportSimple ? kKdReportKeep : kKdReportRemove;
 }
 
-std::uint32_t SetDriverMetricScalar(AnalyticsClient& client, ChannelRecord& channel) {
+std::uint32_t SetDriverMetricScalar(AnalyticsClient& client, const ChannelRecord& channel) {
   const auto name = KdReportChannelGetChannelName(&channel);
   if (KdReportChannelGetFormat(&channel) != kKdReportSimple || !name) return kKdReportKeep;
   std::string key(kKeyPrefix);

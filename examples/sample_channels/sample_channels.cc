@@ -5,7 +5,7 @@
 
 #include <iostream>
 
-using namespace tbdaily;
+using namespace kdreport;
 
 namespace {
 
