@@ -12,6 +12,8 @@
 #include "testing/fake_drivers.h"
 
 namespace tbdaily {
+
+using namespace kdreport;
 namespace {
 
 constexpr std::int64_t kFirst = 1'000, kLast = 64'000;

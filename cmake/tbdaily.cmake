@@ -1,4 +1,7 @@
 # What every target of the project is built with, and the two kinds of target that a folder declares.
+#
+# The targets of libraries are called tbdaily_<name>, since the tree may be part of a larger project. DEPENDS names them without
+# the prefix.
 
 find_program(CCACHE ccache)
 if(CCACHE AND NOT CMAKE_CXX_COMPILER_LAUNCHER)
@@ -20,9 +23,13 @@ endif()
 # tbdaily_library(NAME SOURCES ... DEPENDS ...): one folder, one library. DEPENDS says which other folders it may include.
 function(tbdaily_library name)
   cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
-  add_library(${name} STATIC ${ARG_SOURCES})
-  target_link_libraries(${name} PUBLIC ${ARG_DEPENDS} PRIVATE tbdaily_options)
-  target_include_directories(${name} PUBLIC ${PROJECT_SOURCE_DIR})
+  list(TRANSFORM ARG_DEPENDS PREPEND tbdaily_)
+  add_library(tbdaily_${name} STATIC ${ARG_SOURCES})
+  # A library of somebody else that links these objects shows none of their names.
+  set_target_properties(tbdaily_${name} PROPERTIES CXX_VISIBILITY_PRESET hidden VISIBILITY_INLINES_HIDDEN ON)
+  target_link_libraries(tbdaily_${name} PUBLIC ${ARG_DEPENDS} PRIVATE tbdaily_options)
+  # Before the folders that a surrounding project gives to all its targets.
+  target_include_directories(tbdaily_${name} BEFORE PUBLIC ${PROJECT_SOURCE_DIR})
 endfunction()
 
 # tbdaily_test(NAME SOURCES ... DEPENDS ...): a unit-test program that links the library under test, those below it, the fakes
@@ -32,11 +39,12 @@ function(tbdaily_test name)
     return()
   endif()
   cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
+  list(TRANSFORM ARG_DEPENDS PREPEND tbdaily_)
   find_package(GTest REQUIRED)
   add_executable(${name} ${ARG_SOURCES})
   target_link_libraries(${name} PRIVATE ${ARG_DEPENDS} GTest::gmock GTest::gtest_main tbdaily_options)
   # The fakes and the test framework are read once; fakes_contract_test has made them ready.
-  if(CMAKE_CXX_COMPILER_ID STREQUAL GNU AND "testing" IN_LIST ARG_DEPENDS)
+  if(CMAKE_CXX_COMPILER_ID STREQUAL GNU AND "tbdaily_testing" IN_LIST ARG_DEPENDS)
     if(TARGET fakes_contract_test AND NOT name STREQUAL fakes_contract_test)
       target_precompile_headers(${name} REUSE_FROM fakes_contract_test)
     else()

@@ -9,6 +9,8 @@
 
 namespace tbdaily {
 
+using namespace kdreport;
+
 namespace {
 
 constexpr std::int32_t kDailyCategory = 0x100;
@@ -23,7 +25,7 @@ struct DriverMetricScalars {
   std::deque<std::string> keys;  // where they stay while others are added
   std::vector<ScalarFigure> figures;
 
-  std::uint32_t add(ChannelRecord& channel) {
+  std::uint32_t add(const ChannelRecord& channel) {
     const auto name = KdReportChannelGetChannelName(&channel);
     if (KdReportChannelGetFormat(&channel) != kKdReportSimple || !name) return kKdReportKeep;
     std::string& key = keys.emplace_back(kKeyPrefix);

@@ -1,8 +1,9 @@
-#include "drivermetrics/bucket_bounds.h"
+// The bucket configuration of a histogram channel.
 
+#include "drivermetrics/kd_report.h"
 #include "platform/byte_reader.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -15,7 +16,7 @@ struct Segment {
 };
 
 std::optional<Segment> segmentAt(std::span<const std::byte> config, std::size_t index) {
-  const ByteReader reader(config);
+  const tbdaily::ByteReader reader(config);
   const std::size_t at = index * Segment::kSize;
   const auto base = reader.at<std::uint32_t>(at);
   const auto progression = reader.at<std::uint32_t>(at + 4);
@@ -40,8 +41,8 @@ bool appendBounds(std::vector<std::int64_t>& bounds, const Segment& segment, std
 
 }  // namespace
 
-std::optional<std::vector<std::int64_t>> bucketBounds(std::span<const std::byte> config,
-                                                      std::size_t mostBuckets) {
+std::optional<std::vector<std::int64_t>> KdReportCopyBucketBounds(std::span<const std::byte> config,
+                                                                  std::size_t mostBuckets) {
   if (config.size() < Segment::kSize) return std::nullopt;
   std::vector<std::int64_t> bounds;
   for (std::size_t i = 0; const auto segment = segmentAt(config, i); ++i) {
@@ -50,4 +51,4 @@ std::optional<std::vector<std::int64_t>> bucketBounds(std::span<const std::byte>
   return bounds;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -6,7 +6,7 @@
 
 #include "drivermetrics/channel_record.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 // One key of a collection: absent, of the kind that belongs there, or, in one that came from outside, of
 // another.
@@ -87,10 +87,6 @@ std::optional<LegendEntry> usableLegendEntry(const PlistValue& entry, const Lege
 // A new record of a channel.
 KdReportChannel makeChannelRecord(std::shared_ptr<const LegendGroup> group, std::optional<LegendEntry> entry);
 
-// KdReportIterate for who wants to hold on to the records.
-std::uint32_t iterateRecords(const ChannelCollection* collection,
-                             const std::function<std::uint32_t(const KdReportChannel&)>& visitor);
-
 // Answer as KdReportVisitor does. `copy` is a copy of `channel` that goes into the new collection when kept.
 using CloneVisitor = std::function<std::uint32_t(const ChannelRecord& channel, ChannelRecord& copy)>;
 // `partner` is the channel of the earlier collection; `copy` carries its elements with all values invalid.
@@ -106,4 +102,4 @@ KdReportCollection cloneAggregate(const ChannelCollection* collection, const Clo
 KdReportCollection compareAggregates(const ChannelCollection* earlier, const ChannelCollection* later,
                                      const CompareVisitor& visitor);
 
-}  // namespace tbdaily
+}  // namespace kdreport

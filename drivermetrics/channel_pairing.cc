@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-namespace tbdaily {
+namespace kdreport {
 
 std::optional<ChannelPairing::Identity> ChannelPairing::identityOf(const ChannelRecord* channel) {
   ChannelType type;
@@ -46,4 +46,4 @@ void ChannelPairing::buildIndex() {
   std::ranges::sort(places_);
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

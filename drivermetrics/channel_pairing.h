@@ -7,7 +7,7 @@
 
 #include "drivermetrics/channel_record.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 // Pairs the channels of one array, asked for in the order of the later array. A channel pairs with the one at
 // its own index when both have the same driver, identifier and type, else with the next such one behind the
@@ -39,4 +39,4 @@ class ChannelPairing {
   std::vector<std::size_t> unreadable_;  // ascending
 };
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -2,15 +2,11 @@
 
 #include <algorithm>
 
-namespace tbdaily {
+#include "drivermetrics/object_blocks.h"
+
+namespace kdreport {
 
 namespace {
-
-// A number of the legend entry, or none.
-std::optional<PlistNumber> legendNumber(const ChannelRecord* channel, PlistValue LegendEntry::*place) {
-  if (channel == nullptr || !channel->source->legendChannel) return std::nullopt;
-  return ((*channel->source->legendChannel).*place).asNumber();
-}
 
 PlistValue infoValue(const ChannelRecord* channel, std::string_view key) {
   const PlistDictionary* info = channel != nullptr ? channel->group().channelInfo.asDictionary() : nullptr;
@@ -37,15 +33,39 @@ ElementData::ElementData(std::span<const std::byte> bytes)
   std::ranges::copy(bytes, bytes_.get());
 }
 
-const CachedAnswers& ChannelRecord::cached() const {
-  static const CachedAnswers none;
-  return cached_ != nullptr ? *cached_ : none;
+struct AnswerCache::Kept {
+  CachedAnswer answer;
+  PlistValue value;
+  const Kept* before = nullptr;                  // owned
+  mutable std::atomic<std::uint32_t> owners{1};  // caches and the answer kept next
+};
+
+const AnswerCache::Kept* AnswerCache::retained(const Kept* kept) {
+  if (kept != nullptr) kept->owners.fetch_add(1, std::memory_order_relaxed);
+  return kept;
 }
 
-void ChannelRecord::cache(PlistValue CachedAnswers::*answer, PlistValue value) {
-  auto answers = std::make_shared<CachedAnswers>(cached());
-  (*answers).*answer = std::move(value);
-  cached_ = std::move(answers);
+void AnswerCache::release(const Kept* kept) {
+  while (kept != nullptr && kept->owners.fetch_sub(1, std::memory_order_acq_rel) == 1)
+    delete std::exchange(kept, kept->before);
+}
+
+const PlistValue& AnswerCache::find(CachedAnswer answer) const {
+  static const PlistValue none;
+  const Kept* kept = last_.load(std::memory_order_acquire);
+  while (kept != nullptr && kept->answer != answer) kept = kept->before;
+  return kept != nullptr ? kept->value : none;
+}
+
+const PlistValue& AnswerCache::keep(CachedAnswer answer, PlistValue value) {
+  if (value.isNone()) return find(answer);
+  auto kept = std::make_unique<Kept>(answer, std::move(value));
+  kept->before = last_.load(std::memory_order_acquire);
+  while (find(answer).isNone()) {
+    if (last_.compare_exchange_weak(kept->before, kept.get(), std::memory_order_acq_rel))
+      return kept.release()->value;
+  }
+  return find(answer);
 }
 
 std::optional<LegendEntry> legendEntryOf(const PlistValue& value) {
@@ -55,16 +75,24 @@ std::optional<LegendEntry> legendEntryOf(const PlistValue& value) {
   return LegendEntry{place(0), place(1), place(2)};
 }
 
+PlistValue legendType(const ChannelSource& source) {
+  if (!source.legendChannel) return {};
+  const auto found = source.foundType.get();
+  return found ? PlistValue::int64(*found) : source.legendChannel->channelType;
+}
+
 KdStatus getChannelType(const ChannelRecord* channel, ChannelType& type) {
-  const auto number = legendNumber(channel, &LegendEntry::channelType);
-  if (!number) return kKdError;
-  type.bits = static_cast<std::uint64_t>(number->toInt64());
+  if (channel == nullptr || !channel->source->legendChannel) return kKdError;
+  const auto found = channel->source->foundType.get();
+  const auto number = channel->source->legendChannel->channelType.asNumber();
+  if (!found && !number) return kKdError;
+  type.bits = static_cast<std::uint64_t>(found ? *found : number->toInt64());
   return kKdSuccess;
 }
 
 KdStatus setChannelType(ChannelRecord* channel, ChannelType type) {
   if (channel == nullptr || !channel->source->legendChannel) return kKdError;
-  channel->source->legendChannel->channelType = PlistValue::int64(static_cast<std::int64_t>(type.bits));
+  channel->source->foundType.set(static_cast<std::int64_t>(type.bits));
   return kKdSuccess;
 }
 
@@ -86,13 +114,17 @@ std::optional<std::string> _copyPrintableIDString(std::int64_t identifier) {
   return text;
 }
 
+KdReportChannel KdReportRetainChannel(ChannelRecord& channel) {
+  return {channel.block->shared_from_this(), &channel};
+}
+
 std::int64_t KdReportChannelGetDriverID(const ChannelRecord* channel) {
   return channel != nullptr ? integerOrInvalid(channel->group().driverID) : kKdReportInvalid;
 }
 
 std::int64_t KdReportChannelGetChannelID(const ChannelRecord* channel) {
-  const auto number = legendNumber(channel, &LegendEntry::channelID);
-  return number ? number->toInt64() : kKdReportInvalid;
+  if (channel == nullptr || !channel->source->legendChannel) return kKdReportInvalid;
+  return integerOrInvalid(channel->source->legendChannel->channelID);
 }
 
 std::uint8_t KdReportChannelGetFormat(const ChannelRecord* channel) {
@@ -103,6 +135,11 @@ std::uint8_t KdReportChannelGetFormat(const ChannelRecord* channel) {
 std::uint16_t KdReportChannelGetCategories(const ChannelRecord* channel) {
   ChannelType type;
   return getChannelType(channel, type) == kKdSuccess ? type.categories() : kKdReportAllCategories;
+}
+
+std::uint16_t KdReportChannelGetElementCount(const ChannelRecord* channel) {
+  ChannelType type;
+  return getChannelType(channel, type) == kKdSuccess ? type.elementCount() : std::uint16_t{0};
 }
 
 std::optional<std::string_view> KdReportChannelGetGroup(const ChannelRecord* channel) {
@@ -121,19 +158,18 @@ std::int64_t KdReportChannelGetUnit(const ChannelRecord* channel) {
   return integerOrInvalid(infoValue(channel, kd_report_key::kChannelUnit));
 }
 
-std::optional<std::string_view> KdReportChannelGetChannelName(ChannelRecord* channel) {
+std::optional<std::string_view> KdReportChannelGetChannelName(const ChannelRecord* channel) {
   if (channel == nullptr) return std::nullopt;
-  if (channel->cached().channelName.isNone()) {
-    const auto& entry = channel->source->legendChannel;
-    PlistValue name = entry ? entry->channelName : PlistValue();
-    if (!name.asString()) {
-      const auto text = _copyPrintableIDString(KdReportChannelGetChannelID(channel));
-      if (!text) return std::nullopt;
-      name = PlistValue::string(*text);
-    }
-    channel->cache(&CachedAnswers::channelName, std::move(name));
+  const PlistValue& cached = channel->cached(CachedAnswer::ChannelName);
+  if (!cached.isNone()) return cached.asString();
+  const auto& entry = channel->source->legendChannel;
+  PlistValue name = entry ? entry->channelName : PlistValue();
+  if (!name.asString()) {
+    const auto text = _copyPrintableIDString(KdReportChannelGetChannelID(channel));
+    if (!text) return std::nullopt;
+    name = PlistValue::string(*text);
   }
-  return channel->cached().channelName.asString();
+  return channel->cache(CachedAnswer::ChannelName, std::move(name)).asString();
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

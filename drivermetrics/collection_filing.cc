@@ -3,9 +3,10 @@
 #include <limits>
 
 #include "drivermetrics/channel_collection.h"
+#include "drivermetrics/object_blocks.h"
 #include "drivermetrics/report_error.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -42,8 +43,8 @@ KdStatus file(ChannelCollection* collection, const KdReportChannel& channel, std
   return kKdSuccess;
 }
 
-PlistValue textOrNone(const std::optional<std::string>& text) {
-  return text ? PlistValue::string(*text) : PlistValue();
+PlistValue textOrNone(const KdReportOwnedText& text) {
+  return text.get() ? PlistValue::string(*text.get()) : PlistValue();
 }
 
 }  // namespace
@@ -104,8 +105,8 @@ std::optional<LegendEntry> usableLegendEntry(const PlistValue& entry, const Lege
 
 KdReportChannel makeChannelRecord(std::shared_ptr<const LegendGroup> group,
                                   std::optional<LegendEntry> entry) {
-  return std::make_shared<ChannelRecord>(
-      std::make_shared<ChannelSource>(ChannelSource{std::move(group), std::move(entry)}));
+  return ObjectBlocks<ChannelRecord>(1).add(
+      std::make_shared<ChannelSource>(ChannelSource{std::move(group), std::move(entry), {}}));
 }
 
 KdStatus KdReportAddChannelDescription(ChannelCollection* collection,
@@ -113,7 +114,7 @@ KdStatus KdReportAddChannelDescription(ChannelCollection* collection,
                                        KdReportErrorOut error) {
   PlistArray places{PlistValue::int64(description.channelID),
                     PlistValue::int64(static_cast<std::int64_t>(description.channelType.bits))};
-  if (description.channelName) places.push_back(PlistValue::string(*description.channelName));
+  if (description.channelName.get()) places.push_back(textOrNone(description.channelName));
   const bool hasInfo = description.channelInfo.asDictionary() != nullptr;
   const auto group = std::make_shared<const LegendGroup>(
       LegendGroup{PlistValue::int64(description.driverID), textOrNone(description.driverName),
@@ -132,11 +133,12 @@ std::uint32_t KdReportMergeChannels(ChannelCollection* destination, const Channe
     return kKdReportWalkFailed;
   }
   const std::uint32_t options = _getAggregateOpts(destination);
-  return iterateRecords(source,
-                        [destination, options, error](const KdReportChannel& channel) -> std::uint32_t {
-                          const KdStatus status = _addChannel(destination, channel, options, error);
-                          return status == kKdSuccess ? kKdReportKeep : kKdReportStop;
-                        });
+  const std::uint32_t walked = KdReportIterate(source, [&](ChannelRecord& channel) -> std::uint32_t {
+    const KdStatus status = _addChannel(destination, KdReportRetainChannel(channel), options, error);
+    return status == kKdSuccess ? kKdReportKeep : kKdReportStop;
+  });
+  if (walked == kKdReportWalkFailed) setError(error, kKdError);
+  return walked;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -4,7 +4,7 @@
 
 #include "drivermetrics/channel_collection.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -13,43 +13,36 @@ using namespace kd_report_key;
 // A filed collection has four levels: all, driver, group, subgroup.
 constexpr int kMostLevels = 4;
 
-template <typename Part>
-struct Key {
+struct GroupKey {
   std::string_view name;
-  PlistValue Part::*value;
+  PlistValue LegendGroup::*value;
 };
 
-// Functions and no constants: the compiler confuses pointers to members in constant tables.
-std::array<Key<LegendGroup>, 5> groupKeys() {
-  return {{
-      {kDriverID, &LegendGroup::driverID},
-      {kDriverName, &LegendGroup::driverName},
-      {kGroupName, &LegendGroup::groupName},
-      {kSubGroupName, &LegendGroup::subGroupName},
-      {kChannelInfo, &LegendGroup::channelInfo},
-  }};
-}
-std::array<Key<CachedAnswers>, 4> cachedKeys() {
-  return {{
-      {kChannelName, &CachedAnswers::channelName},
-      {kUnitLabel, &CachedAnswers::unitLabel},
-      {kProcessedChannelConfig, &CachedAnswers::processedChannelConfig},
-      {kStateNames, &CachedAnswers::stateNames},
-  }};
-}
+constexpr std::array<GroupKey, 5> kGroupKeys = {{
+    {kDriverID, &LegendGroup::driverID},
+    {kDriverName, &LegendGroup::driverName},
+    {kGroupName, &LegendGroup::groupName},
+    {kSubGroupName, &LegendGroup::subGroupName},
+    {kChannelInfo, &LegendGroup::channelInfo},
+}};
+constexpr std::array<std::pair<std::string_view, CachedAnswer>, 4> kAnswerKeys = {{
+    {kChannelName, CachedAnswer::ChannelName},
+    {kUnitLabel, CachedAnswer::UnitLabel},
+    {kProcessedChannelConfig, CachedAnswer::ProcessedChannelConfig},
+    {kStateNames, CachedAnswer::StateNames},
+}};
 
-PlistValue plistOfLegend(const LegendEntry& entry) {
-  PlistArray places{entry.channelID, entry.channelType, entry.channelName};
+PlistValue plistOfLegend(const ChannelSource& source) {
+  PlistArray places{source.legendChannel->channelID, legendType(source), source.legendChannel->channelName};
   while (!places.empty() && places.back().isNone()) places.pop_back();
   return PlistValue::array(std::move(places));
 }
 
 PlistValue plistOfChannel(const ChannelRecord& channel) {
   PlistDictionary entries;
-  for (const auto& [name, value] : groupKeys()) entries.set(name, channel.group().*value);
-  for (const auto& [name, value] : cachedKeys()) entries.set(name, channel.cached().*value);
-  if (channel.source->legendChannel)
-    entries.set(kLegendChannel, plistOfLegend(*channel.source->legendChannel));
+  for (const auto& [name, value] : kGroupKeys) entries.set(name, channel.group().*value);
+  for (const auto& [name, answer] : kAnswerKeys) entries.set(name, channel.cached(answer));
+  if (channel.source->legendChannel) entries.set(kLegendChannel, plistOfLegend(*channel.source));
   const auto elements = channel.rawElements.bytes();
   if (channel.rawElements) entries.set(kRawElements, PlistValue::data({elements.begin(), elements.end()}));
   return PlistValue::dictionary(std::move(entries));
@@ -59,11 +52,9 @@ KdReportChannel channelOfPlist(const PlistValue& value) {
   const PlistDictionary* entries = value.asDictionary();
   if (entries == nullptr) return nullptr;
   auto group = std::make_shared<LegendGroup>();
-  for (const auto& [name, member] : groupKeys()) (*group).*member = entries->get(name);
+  for (const auto& [name, member] : kGroupKeys) (*group).*member = entries->get(name);
   KdReportChannel channel = makeChannelRecord(std::move(group), legendEntryOf(entries->get(kLegendChannel)));
-  for (const auto& [name, member] : cachedKeys()) {
-    if (const PlistValue* answer = entries->find(name)) channel->cache(member, *answer);
-  }
+  for (const auto& [name, answer] : kAnswerKeys) channel->cache(answer, entries->get(name));
   const PlistValue elements = entries->get(kRawElements);
   if (const auto bytes = elements.asData()) channel->rawElements = ElementData(*bytes);
   return channel;
@@ -139,4 +130,4 @@ KdReportCollection KdReportCreateAggregateFromPropertyList(const PlistValue& val
   return isTooDeep ? nullptr : collection;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -7,12 +7,12 @@
 #include "drivermetrics/object_blocks.h"
 #include "drivermetrics/raw_elements.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
 struct Visit {
-  const std::function<std::uint32_t(const KdReportChannel&)>& visitor;
+  const KdReportVisitor& visitor;
 };
 struct Prune {
   const KdReportVisitor& visitor;
@@ -45,33 +45,40 @@ template <typename Mode>
 std::uint32_t walk(const Mode& mode, Walked<Mode, ChannelCollection>* collection,
                    const ChannelCollection* other, KdReportCollection* result);
 
-// What the records of a large collection refer to lies far apart; it is asked for before its turn comes.
-constexpr std::size_t kPrefetchDistance = 8;
-void prefetchSource(const Channels& channels, std::size_t index) {
-  if (index < channels.size() && channels[index] != nullptr)
-    __builtin_prefetch(channels[index]->source.get());
-}
-
 std::uint32_t visitChannels(const Visit& mode, const Channels& channels) {
   std::uint32_t status = 0;
   for (const KdReportChannel& channel : channels) {
-    const std::uint32_t answer = channel != nullptr ? mode.visitor(channel) : kKdReportWalkFailed;
+    const std::uint32_t answer = channel != nullptr ? mode.visitor(*channel) : kKdReportWalkFailed;
     if (isOdd(answer)) return answer;
     status |= answer;
   }
   return status;
 }
 
+// Channels that are judged in turn: what is removed moves behind what is kept and goes in the end, be it with
+// an exception of the visitor.
+struct Pruning {
+  explicit Pruning(Channels& all) : channels(all) {}
+  ~Pruning() {
+    const auto begin = channels.begin();
+    channels.erase(begin + static_cast<std::ptrdiff_t>(kept), begin + static_cast<std::ptrdiff_t>(next));
+  }
+  Pruning(const Pruning&) = delete;
+  Pruning& operator=(const Pruning&) = delete;
+
+  Channels& channels;
+  std::size_t kept = 0, next = 0;
+};
+
 std::uint32_t pruneChannels(const Prune& mode, Channels& channels) {
   std::uint32_t status = 0, answer = 0;
-  std::size_t kept = 0, next = 0;
-  for (; next < channels.size() && !isOdd(answer); ++next) {
-    answer = channels[next] != nullptr ? mode.visitor(*channels[next]) : kKdReportWalkFailed;
+  Pruning pruning(channels);
+  for (; pruning.next < channels.size() && !isOdd(answer); ++pruning.next) {
+    KdReportChannel& channel = channels[pruning.next];
+    answer = channel != nullptr ? mode.visitor(*channel) : kKdReportWalkFailed;
     status |= answer;
-    if (answer != kKdReportRemove) channels[kept++].swap(channels[next]);
+    if (answer != kKdReportRemove) channels[pruning.kept++].swap(channel);
   }
-  channels.erase(channels.begin() + static_cast<std::ptrdiff_t>(kept),
-                 channels.begin() + static_cast<std::ptrdiff_t>(next));
   return isOdd(answer) ? answer : status;
 }
 
@@ -82,7 +89,6 @@ std::uint32_t cloneChannels(const Clone& mode, const Channels& channels, Channel
   for (std::size_t i = 0; i < channels.size(); ++i) {
     const KdReportChannel& channel = channels[i];
     if (channel == nullptr) return kKdReportWalkFailed;
-    prefetchSource(channels, i + kPrefetchDistance);
     KdReportChannel copy = memory.add(*channel);
     const std::uint32_t answer = mode.visitor(*channel, *copy);
     if (isOdd(answer)) return answer;
@@ -101,7 +107,6 @@ std::uint32_t compareChannels(const Compare& mode, const Channels& channels, con
   copies.reserve(channels.size());
   for (std::size_t i = 0; i < channels.size(); ++i) {
     if (channels[i] == nullptr) return kKdReportWalkFailed;
-    prefetchSource(channels, i + kPrefetchDistance);
     KdReportChannel copy = memory.add(*channels[i]);
     const auto [isReadable, partner] = pairing.partnerOf(*channels[i], i);
     if (!isReadable) return kKdReportWalkFailed;
@@ -189,13 +194,7 @@ std::uint32_t walk(const Mode& mode, Walked<Mode, ChannelCollection>* collection
 }  // namespace
 
 std::uint32_t KdReportIterate(const ChannelCollection* collection, const KdReportVisitor& visitor) {
-  if (!visitor) return kKdReportWalkFailed;
-  return iterateRecords(collection, [&visitor](const KdReportChannel& channel) { return visitor(*channel); });
-}
-
-std::uint32_t iterateRecords(const ChannelCollection* collection,
-                             const std::function<std::uint32_t(const KdReportChannel&)>& visitor) {
-  return walk(Visit{visitor}, collection, nullptr, nullptr);
+  return visitor ? walk(Visit{visitor}, collection, nullptr, nullptr) : kKdReportWalkFailed;
 }
 
 std::uint32_t KdReportPrune(ChannelCollection* collection, const KdReportVisitor& visitor) {
@@ -222,4 +221,4 @@ KdReportCollection compareAggregates(const ChannelCollection* earlier, const Cha
   return walk(Compare{visitor}, later, earlier, &result) != 0 ? nullptr : result;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

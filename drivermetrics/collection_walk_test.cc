@@ -3,11 +3,12 @@
 #include <cstdlib>
 #include <new>
 #include <random>
+#include <stdexcept>
 
 #include "drivermetrics/metrics_test_support.h"
 
 namespace {
-std::size_t allocations = 0;
+thread_local std::size_t allocations = 0;
 }
 
 // Counts what this program takes from the heap.
@@ -28,7 +29,7 @@ std::size_t allocations = 0;
   std::free(memory);
 }
 
-namespace tbdaily {
+namespace kdreport {
 namespace {
 
 using testing::channelOf, testing::channelsIn, testing::channelType, testing::collectionOf;
@@ -188,6 +189,38 @@ TEST(CollectionWalk, StopsAtAnOddAnswer) {
   EXPECT_EQ(KdReportGetChannelCount(filed.get()), 1U);
 }
 
+TEST(CollectionWalk, PrunesInOrderUntilTheVisitorThrows) {
+  const KdReportCollection flat =
+      collectionOf({channelOf(1, 1), channelOf(1, 2), channelOf(1, 3), channelOf(1, 4), channelOf(1, 5)});
+  const KdReportVisitor removeOddUntilFour = [](ChannelRecord& channel) -> std::uint32_t {
+    const std::int64_t identifier = KdReportChannelGetChannelID(&channel);
+    if (identifier == 4) throw std::runtime_error("four");
+    return identifier % 2 != 0 ? kKdReportRemove : kKdReportKeep;
+  };
+  EXPECT_THROW(KdReportPrune(flat.get(), removeOddUntilFour), std::runtime_error);
+  std::vector<std::int64_t> left;
+  for (const ChannelRecord* channel : channelsIn(flat.get()))
+    left.push_back(KdReportChannelGetChannelID(channel));
+  EXPECT_THAT(left, ElementsAre(2, 4, 5));
+}
+
+TEST(CollectionWalk, RecordsOutliveTheirCollectionWhenHeld) {
+  RandomChannels random;
+  std::vector<KdReportChannel> held;
+  std::vector<std::string> names;
+  {
+    const KdReportCollection filed = collectionOf(random.make(20), 3);
+    const KdReportCollection copy = cloneAggregate(filed.get(), [](const auto&, auto&) { return 0U; });
+    KdReportIterate(copy.get(), [&](ChannelRecord& channel) -> std::uint32_t {
+      held.push_back(KdReportRetainChannel(channel));
+      names.push_back(KdReportChannelCopyDescription(&channel, 0, nullptr).value());
+      return kKdReportKeep;
+    });
+  }
+  for (std::size_t i = 0; i < held.size(); ++i)
+    EXPECT_EQ(KdReportChannelCopyDescription(held[i].get(), 0, {}), names[i]);
+}
+
 TEST(CollectionWalk, FailsOnMalformedCollections) {
   const PlistValue number = PlistValue::int64(1);
   const auto with = [](const char* key, PlistValue value) {
@@ -210,7 +243,9 @@ TEST(CollectionWalk, FailsOnMalformedCollections) {
       EXPECT_EQ(KdReportPrune(bad.get(), [](ChannelRecord&) { return 0U; }), kKdReportWalkFailed);
       EXPECT_EQ(cloneAggregate(bad.get(), [](const auto&, auto&) { return 0U; }), nullptr);
       EXPECT_EQ(KdReportCreateSamplesDelta(good.get(), bad.get()), nullptr);
-      EXPECT_EQ(KdReportMergeChannels(good.get(), bad.get()), kKdReportWalkFailed);
+      std::optional<ReportError> error;
+      EXPECT_EQ(KdReportMergeChannels(good.get(), bad.get(), &error), kKdReportWalkFailed);
+      EXPECT_EQ(error.value().code, kKdError) << key;
     }
   }
   // A channel without a readable type fails a comparison on either side; so does a level that the other
@@ -233,4 +268,4 @@ TEST(CollectionWalk, PropertyListsReadBack) {
 }
 
 }  // namespace
-}  // namespace tbdaily
+}  // namespace kdreport

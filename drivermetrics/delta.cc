@@ -1,10 +1,11 @@
 // Differences between two samples of the same channels, by format.
 
 #include "drivermetrics/channel_collection.h"
+#include "drivermetrics/object_blocks.h"
 #include "drivermetrics/report_error.h"
 #include "drivermetrics/values.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -126,7 +127,7 @@ KdReportChannel KdReportSampleCreateDelta(const ChannelRecord* earlier, const Ch
     return nullptr;
   };
   if (earlier == nullptr || later == nullptr) return fail(kKdBadArgument, std::nullopt);
-  auto result = std::make_shared<ChannelRecord>(*earlier);
+  KdReportChannel result = ObjectBlocks<ChannelRecord>(1).add(*earlier);
   const KdStatus cloned = cloneElements(*result, *earlier, ElementValues::Keep);
   if (cloned != kKdSuccess) return fail(cloned, std::nullopt);
   const DeltaResult failure = channelDelta(*earlier, *later, *result);
@@ -148,4 +149,4 @@ KdReportCollection KdReportCreateSamplesDelta(const ChannelCollection* earlier,
   return result;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -1,11 +1,12 @@
 // Channels and samples as readable text.
 
+#include <limits>
+
 #include "drivermetrics/text_format.h"
-#include "drivermetrics/units.h"
 #include "drivermetrics/values.h"
 #include "platform/utf8.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -21,16 +22,16 @@ std::string objectText(const std::optional<std::string_view>& text) {
 
 // What the lines of one sample have in common.
 struct Line {
-  ChannelRecord& channel;
+  const ChannelRecord& channel;
   std::string prefix, name, unitLabel;
   // Of state channels: all states have names, or none has.
   bool hasStateNames = false;
-  double residency = 0;  // of all states
+  std::vector<double> shares = {};  // of the states; empty when they cannot be read
 };
 
-std::string displayName(ChannelRecord& channel, const RawElements& elements) {
+std::string displayName(const ChannelRecord& channel, const RawElements& elements) {
   const auto name = KdReportChannelGetChannelName(&channel);
-  if (name && isUtf8(*name)) return std::string(*name);
+  if (name && tbdaily::isUtf8(*name)) return std::string(*name);
   return alternateHexadecimal(static_cast<std::uint64_t>(elements.channelID())).substr(0, kLongestChannelID);
 }
 
@@ -51,11 +52,14 @@ LineText stateLine(const Line& line, std::int32_t index) {
                  .substr(0, kLongestStateID);
   const std::int64_t residency = KdReportStateGetResidency(&line.channel, index);
   const double seconds =
-      KdReportScaleValue(unsignedOf(residency), KdReportChannelGetUnit(&line.channel), kSecondsUnit);
+      KdReportScaleValue(unsignedOf(residency), KdReportChannelGetUnit(&line.channel), kKdReportSeconds);
+  const auto place = static_cast<std::size_t>(index);
+  const double share =
+      place < line.shares.size() ? line.shares[place] : std::numeric_limits<double>::quiet_NaN();
   return formatText("%s%20s[%8s] = { # %-8llu %9.3e %s / %4.1f%% }\n", line.prefix.c_str(), line.name.c_str(),
                     state.c_str(),
                     static_cast<unsigned long long>(KdReportStateGetInTransitions(&line.channel, index)),
-                    seconds, "s", shareOfResidency(residency, line.residency) * kPercent);
+                    seconds, "s", share * kPercent);
 }
 
 LineText histogramLine(const Line& line, std::int32_t bucket) {
@@ -97,11 +101,11 @@ LineText elementLine(const Line& line, std::uint8_t format, std::int32_t element
 
 }  // namespace
 
-std::optional<std::string> KdReportChannelCopyDescription(ChannelRecord* channel, std::uint64_t /*reserved*/,
-                                                          std::optional<std::string_view> prefix) {
+std::optional<std::string> KdReportChannelCopyDescription(const ChannelRecord* channel,
+                                                          std::uint64_t /*reserved*/, KdReportText prefix) {
   ChannelType type;
   if (getChannelType(channel, type) != kKdSuccess) return std::nullopt;
-  std::string text(prefix.value_or(""));
+  std::string text(prefix.get().value_or(""));
   text += objectText(KdReportChannelGetDriverName(channel)) + ' ';
   text += objectText(KdReportChannelGetChannelName(channel)) + " < ";
   text += alternateHexadecimal(static_cast<std::uint64_t>(KdReportChannelGetChannelID(channel)));
@@ -114,16 +118,16 @@ std::optional<std::string> KdReportChannelCopyDescription(ChannelRecord* channel
   return text;
 }
 
-std::optional<std::string> KdReportSampleCopyDescription(ChannelRecord* channel, std::uint64_t /*reserved*/,
-                                                         std::optional<std::string_view> prefix) {
+std::optional<std::string> KdReportSampleCopyDescription(const ChannelRecord* channel,
+                                                         std::uint64_t /*reserved*/, KdReportText prefix) {
   const std::uint8_t format = KdReportChannelGetFormat(channel);
   const auto elements = getRawElements(channel, format);
   if (!elements) return std::nullopt;
-  Line line{*channel, std::string(prefix.value_or("")), displayName(*channel, *elements),
+  Line line{*channel, std::string(prefix.get().value_or("")), displayName(*channel, *elements),
             objectText(KdReportChannelGetUnitLabel(channel))};
   if (format == kKdReportState) {
     line.hasStateNames = KdReportStateGetNameForIndex(channel, 0).has_value();
-    line.residency = residencyOfAllStates(channel);
+    line.shares = KdReportStateCopyDutyCycles(channel);
   }
   std::string text;
   for (std::int32_t element = 0; element < std::int32_t{elements->count()}; ++element) {
@@ -134,4 +138,4 @@ std::optional<std::string> KdReportSampleCopyDescription(ChannelRecord* channel,
   return text;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

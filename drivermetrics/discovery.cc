@@ -4,9 +4,8 @@
 #include "drivermetrics/object_blocks.h"
 #include "drivermetrics/report_error.h"
 #include "drivermetrics/text_format.h"
-#include "platform/driver_handle.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -64,7 +63,7 @@ KdStatus addGroupChannels(ChannelCollection& collection, Publisher& publisher,
     if (value.asArray() == nullptr) break;
     auto entry = usableLegendEntry(value, *group, nullptr);
     if (!entry) return kKdError;
-    const KdReportChannel channel = records.add(ChannelRecord(sources.add({group, std::move(entry)})));
+    const KdReportChannel channel = records.add(sources.add(ChannelSource{group, std::move(entry), {}}));
     if (_addChannel(&collection, channel, options) != kKdSuccess) return kKdError;
   }
   return kKdSuccess;
@@ -143,7 +142,8 @@ KdReportCollection KdReportCopyChannelsForDriver(DriverRegistry& registry, KdHan
 KdReportCollection KdReportCopyAllChannels(DriverRegistry& registry, std::uint32_t options,
                                            KdReportErrorOut error) {
   const PlistDictionary isPublic{{std::string(kd_report_key::kLegendPublic), PlistValue::boolean(true)}};
-  const PlistValue matching = PlistValue::dictionary({{"KdPropertyMatch", PlistValue::dictionary(isPublic)}});
+  const PlistValue matching = PlistValue::dictionary(
+      {{std::string(kd_matching_key::kPropertyMatch), PlistValue::dictionary(isPublic)}});
   const KdReportCollection all = KdReportCreateAggregate(options);
   bool isExplained = false;
   const KdStatus status = walkMatchingDrivers(registry, matching, [&](KdHandle driver) {
@@ -194,4 +194,4 @@ KdReportCollection KdReportCopyChannelsWithID(DriverRegistry& registry, const Pl
   return collectionOrError(status, all, isExplained, error);
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -3,7 +3,7 @@
 #include "drivermetrics/metrics_test_support.h"
 #include "drivermetrics/report_error.h"
 
-namespace tbdaily {
+namespace kdreport {
 namespace {
 
 using testing::channelOf, testing::channelsIn, testing::channelType, testing::FakeDriver;
@@ -73,7 +73,8 @@ TEST_F(Discovery, ReadsALegendUntilItIsMalformed) {
        failed},
       {PlistValue::array({good, group("G", nullptr, {entry(kKdReportInvalid, 1)}), last}), failed},
   };
-  for (const auto& [legend, expected] : cases) EXPECT_EQ(read(legend), expected);
+  for (std::size_t row = 0; row < cases.size(); ++row)
+    EXPECT_EQ(read(cases[row].first), cases[row].second) << "row " << row;
 
   registry_.drivers[0].properties.remove("KdReportLegendPublic");
   const KdHandle handle = registry_.KdServiceGetMatchingService(registry_.KdServiceMatching("Driver"));
@@ -144,11 +145,19 @@ TEST_F(Discovery, NamesDriversThatFailAndGoesOn) {
   const KdReportCollection all = KdReportCopyAllChannels(registry_, 0);
   EXPECT_EQ(::testing::internal::GetCapturedStderr(), "Bad <id 0x1>: bad legend\n");
   EXPECT_EQ(channelsIn(all.get()).size(), 1U);
+  std::string said;
+  KdReportSetLogSink([&said](std::string_view line) { said += line; });
+  (void)KdReportCopyAllChannels(registry_, 0);
+  KdReportSetLogSink(nullptr);
+  EXPECT_EQ(said, "Bad <id 0x1>: bad legend");
 
   std::optional<ReportError> error;
   const PlistValue matching = registry_.KdServiceMatching("Driver");
   EXPECT_EQ(KdReportCopyChannelsForDrivers(registry_, matching, 0, &error), nullptr);
   EXPECT_EQ(error->code, kKdError);
+  EXPECT_FALSE(KdReportErrorHasReason(*error));
+  EXPECT_EQ(KdReportCopyStatusText(error->code), "general failure");
+  EXPECT_EQ(KdReportCopyStatusText(7), "status 0x00000007");
   EXPECT_EQ(KdReportCopyChannelsForDrivers(registry_, {}, 0, &error), nullptr);
   EXPECT_EQ(error->reason, "no matching dict");
 
@@ -182,12 +191,14 @@ TEST_F(Discovery, SelectsByCategoryFormatUnitAndGroup) {
   EXPECT_EQ(names(KdReportCopyChannelsInCategories(registry_, 0x100, 3)), "AD");
   EXPECT_EQ(names(KdReportCopyChannelsOfFormat(registry_, 0x102, 0)), "BC");
   EXPECT_EQ(names(KdReportCopyChannelsWithUnit(registry_, 0x64'00000000000000, 0)), "ABCD");
-  EXPECT_EQ(names(KdReportCopyChannelsInGroup(registry_, "G", {}, 3)), "CAB");
-  EXPECT_EQ(names(KdReportCopyChannelsInGroup(registry_, {}, "S", 0)), "ABD");
+  const char* const none = nullptr;
+  EXPECT_EQ(names(KdReportCopyChannelsInGroup(registry_, "G", none, 3)), "CAB");
+  EXPECT_EQ(names(KdReportCopyChannelsInGroup(registry_, nullptr, std::string("S"), 0)), "ABD");
   EXPECT_EQ(names(KdReportCopyChannelsInGroup(registry_, "G", "S", 0)), "AB");
   std::optional<ReportError> error;
   EXPECT_EQ(KdReportCopyChannelsInGroup(registry_, {}, {}, 0, &error), nullptr);
   EXPECT_EQ(error->reason, "no group or subgroup!");
+  EXPECT_TRUE(KdReportErrorHasReason(*error));
   EXPECT_EQ(KdReportSelectChannelsInGroup(nullptr, "G", {}, &error), 1U);
   EXPECT_EQ(error->reason, "channel pruning failed");
 }
@@ -214,7 +225,9 @@ TEST(ChannelRecords, AnswerForWhatIsMissing) {
                 {.driverID = 7, .driverName = "D", .channelID = 8, .channelType = channelType(4, 3)}),
             kKdSuccess);
   EXPECT_EQ(KdReportChannelGetFormat(channelsIn(byDriver.get())[0]), 4);
+  const char* const none = nullptr;
+  EXPECT_EQ(KdReportAddChannelDescription(byDriver.get(), {.driverName = none, .channelID = 8}), kKdError);
 }
 
 }  // namespace
-}  // namespace tbdaily
+}  // namespace kdreport

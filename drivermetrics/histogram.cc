@@ -1,9 +1,8 @@
 // Reading histogram channels: the values of their buckets, and the bounds that the configuration gives.
 
-#include "drivermetrics/bucket_bounds.h"
 #include "drivermetrics/values.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -12,7 +11,7 @@ PlistValue boundsOf(const ChannelRecord& channel) {
   const std::uint32_t buckets = announcedElements(&channel, kKdReportHistogram);
   const auto config = getChannelConfig(&channel);
   if (buckets == kKdReportNoIndex || !config) return {};
-  const auto bounds = bucketBounds(*config, buckets);
+  const auto bounds = KdReportCopyBucketBounds(*config, buckets);
   if (!bounds) return {};
   PlistArray numbers;
   numbers.reserve(bounds->size());
@@ -66,12 +65,13 @@ std::int64_t KdReportHistogramGetMaxValue(const ChannelRecord* channel) {
   return kKdReportInvalid;
 }
 
-KdStatus KdReportHistogramGetBucketBounds(ChannelRecord* channel, std::int32_t bucket, std::int64_t* lower,
-                                          std::int64_t* upper) {
+KdStatus KdReportHistogramGetBucketBounds(const ChannelRecord* channel, std::int32_t bucket,
+                                          std::int64_t* lower, std::int64_t* upper) {
   if (channel == nullptr) return kKdError;
-  if (channel->cached().processedChannelConfig.isNone())
-    channel->cache(&CachedAnswers::processedChannelConfig, boundsOf(*channel));
-  const PlistArray* bounds = channel->cached().processedChannelConfig.asArray();
+  const PlistValue& cached = channel->cached(CachedAnswer::ProcessedChannelConfig);
+  const PlistArray* bounds =
+      (cached.isNone() ? channel->cache(CachedAnswer::ProcessedChannelConfig, boundsOf(*channel)) : cached)
+          .asArray();
   if (bounds == nullptr || bucket < 0 || static_cast<std::size_t>(bucket) >= bounds->size()) return kKdError;
   const auto place = static_cast<std::size_t>(bucket);
   const std::int64_t above = integerOrInvalid((*bounds)[place]);
@@ -83,4 +83,4 @@ KdStatus KdReportHistogramGetBucketBounds(ChannelRecord* channel, std::int32_t b
   return kKdSuccess;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -5,7 +5,9 @@
 #include "drivermetrics/raw_elements.h"
 #include "testing/fake_drivers.h"
 
-namespace tbdaily::testing {
+namespace kdreport::testing {
+
+using namespace tbdaily::testing;
 
 inline ChannelType channelType(unsigned format, unsigned elements = 1, unsigned categories = 0) {
   return {std::uint64_t{format} | std::uint64_t{categories} << 16 | std::uint64_t{elements} << 32};
@@ -37,7 +39,7 @@ inline LegendGroup& groupOf(ChannelRecord& channel) {
 inline KdReportCollection collectionOf(const std::vector<KdReportChannel>& channels,
                                        std::uint32_t options = kKdReportFlat) {
   KdReportCollection collection = KdReportCreateAggregate(options);
-  for (const KdReportChannel& channel : channels) _addChannel(collection.get(), channel, options);
+  for (const KdReportChannel& channel : channels) (void)_addChannel(collection.get(), channel, options);
   return collection;
 }
 
@@ -80,4 +82,4 @@ inline KdReportChannel sampled(ChannelType type, const std::vector<Element>& ele
   return channel;
 }
 
-}  // namespace tbdaily::testing
+}  // namespace kdreport::testing

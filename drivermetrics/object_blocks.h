@@ -8,7 +8,12 @@
 
 #include "drivermetrics/channel_record.h"
 
-namespace tbdaily {
+namespace kdreport {
+
+template <typename T>
+struct ObjectBlock : std::enable_shared_from_this<ObjectBlock<T>> {
+  std::vector<T> objects;  // never grows beyond what it reserved: its objects stay
+};
 
 template <typename T>
 class ObjectBlocks {
@@ -16,21 +21,24 @@ class ObjectBlocks {
   // So many objects will be asked for, or another number.
   explicit ObjectBlocks(std::size_t expected) : expected_(expected) {}
 
-  std::shared_ptr<T> add(T object) {
-    if (block_ == nullptr || block_->size() == block_->capacity()) {
-      block_ = std::make_shared<std::vector<T>>();
-      block_->reserve(std::clamp<std::size_t>(expected_ - std::min(made_, expected_), 1, kMostInBlock));
+  template <typename From>
+  std::shared_ptr<T> add(From&& from) {
+    if (block_ == nullptr || block_->objects.size() == block_->objects.capacity()) {
+      block_ = std::make_shared<ObjectBlock<T>>();
+      block_->objects.reserve(
+          std::clamp<std::size_t>(expected_ - std::min(made_, expected_), 1, kMostInBlock));
     }
     ++made_;
-    block_->push_back(std::move(object));
-    return {block_, &block_->back()};
+    T& object = block_->objects.emplace_back(std::forward<From>(from));
+    if constexpr (requires { object.block; }) object.block = block_.get();
+    return {block_, &object};
   }
 
  private:
   static constexpr std::size_t kMostInBlock = 256;
 
   std::size_t expected_, made_ = 0;
-  std::shared_ptr<std::vector<T>> block_;  // never grows beyond what it reserved: its objects stay
+  std::shared_ptr<ObjectBlock<T>> block_;
 };
 
 class ElementBlocks {
@@ -54,4 +62,4 @@ class ElementBlocks {
   std::size_t size_ = 0, used_ = 0;
 };
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -5,7 +5,7 @@
 #include "drivermetrics/object_blocks.h"
 #include "platform/byte_reader.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -15,7 +15,7 @@ void writeLittleEndian64(std::span<std::byte> bytes, std::size_t offset, std::ui
 }
 
 std::uint64_t read64(std::span<const std::byte> bytes, std::size_t offset) {
-  return ByteReader(bytes).at<std::uint64_t>(offset).value_or(0);
+  return tbdaily::ByteReader(bytes).at<std::uint64_t>(offset).value_or(0);
 }
 
 std::size_t wordOffset(std::size_t element, std::size_t word) {
@@ -50,7 +50,8 @@ bool RawElements::copyFrom(const RawElements& other) {
 std::optional<RawElements> getRawElements(const ChannelRecord* channel, std::uint8_t format) {
   if (channel == nullptr) return std::nullopt;
   const std::span<std::byte> bytes = channel->rawElements.bytes();
-  if (bytes.size() < kElementSize || ByteReader(bytes).at<std::uint8_t>(element_offset::kType) != format)
+  if (bytes.size() < kElementSize ||
+      tbdaily::ByteReader(bytes).at<std::uint8_t>(element_offset::kType) != format)
     return std::nullopt;
   return RawElements(bytes, static_cast<std::uint16_t>(bytes.size() / kElementSize));
 }
@@ -70,4 +71,4 @@ KdStatus cloneElements(ChannelRecord& destination, const ChannelRecord& source, 
   return kKdSuccess;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

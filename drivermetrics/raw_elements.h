@@ -1,25 +1,11 @@
-// The 64-byte elements in which the hub and every sample carry values: who it is about, when it was updated,
-// and four value words. All numbers are little-endian.
+// The 64-byte elements in which the hub and every sample carry values.
 #pragma once
-
-#include <array>
 
 #include "drivermetrics/channel_record.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 class ElementBlocks;
-
-inline constexpr std::size_t kElementSize = 64;
-inline constexpr std::size_t kElementWords = 4;
-
-namespace element_offset {
-inline constexpr std::size_t kProvider = 0;  // the driver's registry entry identifier
-inline constexpr std::size_t kChannel = 8;
-inline constexpr std::size_t kType = 16;   // ChannelType
-inline constexpr std::size_t kStamp = 24;  // grows with each update
-inline constexpr std::size_t kWords = 32;
-}  // namespace element_offset
 
 // Elements over bytes that somebody else owns; `count` of them can be read. A number outside reads as 0.
 class RawElements {
@@ -52,4 +38,4 @@ enum class ElementValues : std::uint8_t { Keep, Invalidate };
 KdStatus cloneElements(ChannelRecord& destination, const ChannelRecord& source, ElementValues values,
                        ElementBlocks* memory = nullptr);
 
-}  // namespace tbdaily
+}  // namespace kdreport

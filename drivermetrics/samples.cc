@@ -12,7 +12,7 @@
 #include "drivermetrics/subscription.h"
 #include "platform/byte_reader.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -81,7 +81,7 @@ class SampleBuffer {
   }
 
   std::uint64_t fieldAt(std::size_t element, std::size_t offset) const {
-    return *ByteReader(buffer_).at<std::uint64_t>(element * kElementSize + offset);
+    return *tbdaily::ByteReader(buffer_).at<std::uint64_t>(element * kElementSize + offset);
   }
   ChannelType typeAt(std::size_t element) const { return {fieldAt(element, element_offset::kType)}; }
   Identifiers identifiersAt(std::size_t element) const {
@@ -172,4 +172,4 @@ KdReportCollection KdReportCreateSamplesRaw(const ChannelCollection* channels,
   return samples;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -7,7 +7,7 @@
 #include "platform/byte_reader.h"
 #include "testing/scripted_hub.h"
 
-namespace tbdaily {
+namespace kdreport {
 namespace {
 
 using testing::channelOf, testing::channelsIn, testing::channelType, testing::collectionOf;
@@ -141,7 +141,7 @@ TEST(Samples, ReadBuffersAsASearchFromTheirStartWould) {
     const std::size_t end = buffer.size() / kElementSize * kElementSize;
     for (std::uint64_t id = 0; id < 4 && !isStopped; ++id) {
       std::size_t at = 0, count = 0;
-      const ByteReader reader(buffer);
+      const tbdaily::ByteReader reader(buffer);
       for (; at < end; at += count * kElementSize) {
         count = *reader.at<std::uint16_t>(at + 20);
         if (count == 0 || *reader.at<std::uint64_t>(at + 8) == id) break;
@@ -158,4 +158,4 @@ TEST(Samples, ReadBuffersAsASearchFromTheirStartWould) {
 }
 
 }  // namespace
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -3,7 +3,7 @@
 #include "drivermetrics/channel_collection.h"
 #include "drivermetrics/report_error.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -55,29 +55,27 @@ KdReportCollection KdReportCopyChannelsWithUnit(DriverRegistry& registry, std::i
   return copyAndPrune(registry, options, keepWhen(hasUnit), error);
 }
 
-std::uint32_t KdReportSelectChannelsInGroup(ChannelCollection* collection,
-                                            std::optional<std::string_view> group,
-                                            std::optional<std::string_view> subGroup,
-                                            KdReportErrorOut error) {
-  if (!group && !subGroup) {
+std::uint32_t KdReportSelectChannelsInGroup(ChannelCollection* collection, KdReportText group,
+                                            KdReportText subGroup, KdReportErrorOut error) {
+  const auto wantedGroup = group.get(), wantedSubGroup = subGroup.get();
+  if (!wantedGroup && !wantedSubGroup) {
     setError(error, kKdBadArgument, "no group or subgroup!");
     return kKdReportStop;
   }
-  const auto isInGroup = [group, subGroup](const ChannelRecord& channel) {
-    return (!group || KdReportChannelGetGroup(&channel) == group) &&
-           (!subGroup || KdReportChannelGetSubGroup(&channel) == subGroup);
+  const auto isInGroup = [&](const ChannelRecord& channel) {
+    return (!wantedGroup || KdReportChannelGetGroup(&channel) == wantedGroup) &&
+           (!wantedSubGroup || KdReportChannelGetSubGroup(&channel) == wantedSubGroup);
   };
   return prune(collection, keepWhen(isInGroup), error);
 }
 
-KdReportCollection KdReportCopyChannelsInGroup(DriverRegistry& registry,
-                                               std::optional<std::string_view> group,
-                                               std::optional<std::string_view> subGroup,
-                                               std::uint32_t options, KdReportErrorOut error) {
+KdReportCollection KdReportCopyChannelsInGroup(DriverRegistry& registry, KdReportText group,
+                                               KdReportText subGroup, std::uint32_t options,
+                                               KdReportErrorOut error) {
   KdReportCollection channels = KdReportCopyAllChannels(registry, options, error);
   if (channels == nullptr) return nullptr;
   const std::uint32_t status = KdReportSelectChannelsInGroup(channels.get(), group, subGroup, error);
   return (status & 1) == 0 ? channels : nullptr;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

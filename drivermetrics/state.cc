@@ -4,7 +4,7 @@
 
 #include "drivermetrics/values.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -25,6 +25,19 @@ PlistValue namesOf(const ChannelRecord& channel) {
     names.push_back(PlistValue::string(*name));
   }
   return PlistValue::array(std::move(names));
+}
+
+constexpr double kNoShare = std::numeric_limits<double>::quiet_NaN();
+
+// Not a number when there is none or one cannot be read.
+double residencyOfAllStates(const RawElements& states) {
+  double all = 0;
+  for (std::size_t i = 0; i < states.count(); ++i) {
+    const std::int64_t residency = states.word(i, state_word::kResidency);
+    if (residency == kKdReportInvalid) return kNoShare;
+    all += static_cast<double>(residency);
+  }
+  return all != 0 ? all : kNoShare;
 }
 
 }  // namespace
@@ -53,33 +66,33 @@ std::uint32_t KdReportStateGetIndexForID(const ChannelRecord* channel, std::int6
   return kKdReportNoIndex;
 }
 
-std::optional<std::string_view> KdReportStateGetNameForIndex(ChannelRecord* channel, std::int32_t index) {
+std::optional<std::string_view> KdReportStateGetNameForIndex(const ChannelRecord* channel,
+                                                             std::int32_t index) {
   if (channel == nullptr) return std::nullopt;
-  if (channel->cached().stateNames.isNone()) channel->cache(&CachedAnswers::stateNames, namesOf(*channel));
-  const PlistArray* names = channel->cached().stateNames.asArray();
+  const PlistValue& cached = channel->cached(CachedAnswer::StateNames);
+  const PlistArray* names =
+      (cached.isNone() ? channel->cache(CachedAnswer::StateNames, namesOf(*channel)) : cached).asArray();
   if (names == nullptr || index < 0 || static_cast<std::size_t>(index) >= names->size()) return std::nullopt;
   return (*names)[static_cast<std::size_t>(index)].asString();
 }
 
-double residencyOfAllStates(const ChannelRecord* channel) {
-  constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
-  const auto states = announcedRawElements(channel, kKdReportState);
-  double all = 0;
-  for (std::size_t i = 0; states && i < states->count(); ++i) {
-    const std::int64_t residency = states->word(i, state_word::kResidency);
-    if (residency == kKdReportInvalid) return kNone;
-    all += static_cast<double>(residency);
-  }
-  return all != 0 ? all : kNone;
-}
-
-double shareOfResidency(std::int64_t residency, double all) {
-  if (residency == kKdReportInvalid) return std::numeric_limits<double>::quiet_NaN();
-  return static_cast<double>(residency) / all;
-}
-
 double KdReportStateGetDutyCycle(const ChannelRecord* channel, std::int32_t index) {
-  return shareOfResidency(KdReportStateGetResidency(channel, index), residencyOfAllStates(channel));
+  const std::int64_t residency = KdReportStateGetResidency(channel, index);
+  if (residency == kKdReportInvalid) return kNoShare;
+  return static_cast<double>(residency) /
+         residencyOfAllStates(*announcedRawElements(channel, kKdReportState));
+}
+
+std::vector<double> KdReportStateCopyDutyCycles(const ChannelRecord* channel) {
+  const auto states = announcedRawElements(channel, kKdReportState);
+  if (!states) return {};
+  const double all = residencyOfAllStates(*states);
+  std::vector<double> shares(states->count(), kNoShare);
+  for (std::size_t i = 0; i < shares.size(); ++i) {
+    const std::int64_t residency = states->word(i, state_word::kResidency);
+    if (residency != kKdReportInvalid) shares[i] = static_cast<double>(residency) / all;
+  }
+  return shares;
 }
 
 std::uint32_t KdReportStateGetCurrent(const ChannelRecord* channel) {
@@ -94,4 +107,4 @@ std::uint32_t KdReportStateGetCurrent(const ChannelRecord* channel) {
   return current;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -6,9 +6,8 @@
 
 #include "drivermetrics/channel_collection.h"
 #include "drivermetrics/report_error.h"
-#include "platform/driver_handle.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -163,4 +162,4 @@ std::shared_ptr<KdReportSubscription> KdReportCreateSubscription(
   return subscription;
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -5,7 +5,7 @@
 
 #include "drivermetrics/kd_report.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 // What of the hub is held: released, and the buffer unmapped, with the last reference.
 class KdReportSubscription {
@@ -47,4 +47,4 @@ std::optional<std::vector<std::byte>> createInterestList(const ChannelCollection
 // The hub's update status; kKdBadArgument without a subscription.
 KdStatus updateKernelBuffer(KdReportSubscription* subscription, KdReportErrorOut error);
 
-}  // namespace tbdaily
+}  // namespace kdreport

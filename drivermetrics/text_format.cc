@@ -3,7 +3,7 @@
 #include <cstdarg>
 #include <cstdio>
 
-namespace tbdaily {
+namespace kdreport {
 
 std::string formatText(const char* format, ...) {
   std::va_list arguments, again;
@@ -21,4 +21,4 @@ std::string alternateHexadecimal(std::uint64_t value) {
   return formatText("%#llx", static_cast<unsigned long long>(value));
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <string>
 
-namespace tbdaily {
+namespace kdreport {
 
 // As printf would write it, at its whole length.
 [[gnu::format(printf, 1, 2)]] std::string formatText(const char* format, ...);
@@ -12,4 +12,4 @@ namespace tbdaily {
 // "0x1f"; 0 has no prefix.
 std::string alternateHexadecimal(std::uint64_t value);
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -8,11 +8,12 @@
 #include "drivermetrics/text_format.h"
 #include "platform/utf8.h"
 
-namespace tbdaily {
+namespace kdreport {
 
-KdStatus KdReportWriteStringUTF8(int fd, std::optional<std::string_view> text) {
+KdStatus KdReportWriteStringUTF8(int fd, KdReportText borrowed) {
+  const auto text = borrowed.get();
   if (!text) return kKdBadArgument;
-  if (!isUtf8(*text)) return kKdNoMemory;
+  if (!tbdaily::isUtf8(*text)) return kKdNoMemory;
   const ssize_t written = ::write(fd, text->data(), text->size());
   if (written < 0) return kKdIOError;
   return static_cast<std::size_t>(written) == text->size() ? kKdSuccess : kKdUnderrun;
@@ -22,4 +23,4 @@ std::string KdReportCopyCurrentProcessName() {
   return formatText("%s <pid %d>", program_invocation_short_name, static_cast<int>(::getpid()));
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

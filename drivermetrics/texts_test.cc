@@ -5,9 +5,8 @@
 #include <cmath>
 
 #include "drivermetrics/metrics_test_support.h"
-#include "drivermetrics/units.h"
 
-namespace tbdaily {
+namespace kdreport {
 namespace {
 
 using testing::channelType, testing::sampled;
@@ -16,21 +15,54 @@ constexpr std::int64_t kNanoseconds = 0x0100007600000000, kTicks = 0x01010000000
 
 TEST(Units, HaveLabels) {
   const std::vector<std::pair<std::uint64_t, const char*>> labels = {
-      {0x0100000000000000, "s"},
-      {0x0100007600000000, "ns"},
-      {0x09008C0000000004, "4KiB"},
-      {0x0900890000000000, "Ki"},
+      // Quantities, without a scale.
       {0, ""},
-      {0x6400000000000000, "events"},
+      {0x0100000000000000, "s"},
+      {0x0200000000000000, "W"},
+      {0x0300000000000000, "J"},
+      {0x0400000000000000, "A"},
+      {0x0500000000000000, "V"},
+      {0x0600000000000000, "F"},
+      {0x0700000000000000, "H"},
+      {0x0800000000000000, "Hz"},
+      {0x0900000000000000, "b"},
+      {0x0900820000000000, "B"},
+      {0x0900810000000000, ""},
+      {0x0A00000000000000, "C"},
+      {0x0B00000000000000, "??"},
       {0x3700000000000000, "??"},
+      {0x6400000000000000, "events"},
+      {0x6500000000000000, "packets"},
+      // Prefixes.
+      {0x0100007300000000, "ps"},
+      {0x0100007600000000, "ns"},
+      {0x0100007900000000, "us"},
+      {0x0100007C00000000, "ms"},
       {0x6500008200000000, "kpackets"},
+      {0x0800008500000000, "MHz"},
+      {0x0800008800000000, "GHz"},
+      {0x0800008B00000000, "THz"},
+      {0x0900890000000000, "Ki"},
+      {0x09008C0000000000, "KiB"},
+      {0x09008C0000000004, "4KiB"},
+      {0x09008C0000000008, "8KiB"},
+      {0x6400930000000000, "Mievents"},
+      {0x0900960000000000, "MiB"},
+      {0x09009D0000000000, "Gi"},
+      {0x0900A00000000000, "GiB"},
+      {0x0900A70000000000, "Ti"},
+      {0x0900AA0000000000, "TiB"},
+      {0x0100007500000000, "s"},  // a scale without a prefix
+      // Whole labels, whatever the quantity.
       {0x0100007980000018, "24Mticks"},
       {0x0900007600000001, "1Gticks"},
       {0x0101000000000000, "hwticks?"},
       {0x0902000000000000, "hwpage?"},
+      {0x0103000000000000, "s"},
   };
-  for (const auto& [unit, label] : labels) EXPECT_EQ(copyUnitLabel(static_cast<std::int64_t>(unit)), label);
-  EXPECT_EQ(copyUnitLabel(kKdReportInvalid), std::nullopt);
+  for (const auto& [unit, label] : labels)
+    EXPECT_EQ(KdReportCopyUnitLabel(static_cast<std::int64_t>(unit)), label) << std::hex << unit;
+  EXPECT_EQ(KdReportCopyUnitLabel(kKdReportInvalid), std::nullopt);
 }
 
 TEST(Units, HaveExactFactors) {
@@ -52,14 +84,15 @@ TEST(Units, HaveExactFactors) {
   };
   for (const Row& row : rows) {
     std::uint64_t numerator = 9, denominator = 9;
-    EXPECT_EQ(getFactorsFromScale(row.scale, numerator, denominator), kKdSuccess);
+    EXPECT_EQ(KdReportUnitGetScale(static_cast<std::int64_t>(row.scale), numerator, denominator), kKdSuccess);
     EXPECT_EQ(std::pair(numerator, denominator), std::pair(row.numerator, row.denominator))
         << std::hex << row.scale;
   }
-  EXPECT_DOUBLE_EQ(KdReportScaleValue(1500, kNanoseconds, kSecondsUnit), 1.5e-6);
-  EXPECT_EQ(KdReportScaleValue(~std::uint64_t{0}, kSecondsUnit, kSecondsUnit), 18446744073709551616.0);
-  EXPECT_TRUE(std::isnan(KdReportScaleValue(1, kSecondsUnit, 0x0900000000000000)));
-  EXPECT_TRUE(std::isnan(KdReportScaleValue(1, kTicks, kSecondsUnit)));
+  EXPECT_DOUBLE_EQ(KdReportScaleValue(1500, kNanoseconds, kKdReportSeconds), 1.5e-6);
+  EXPECT_EQ(KdReportScaleValue(~std::uint64_t{0}, kKdReportSeconds, kKdReportSeconds),
+            18446744073709551616.0);
+  EXPECT_TRUE(std::isnan(KdReportScaleValue(1, kKdReportSeconds, 0x0900000000000000)));
+  EXPECT_TRUE(std::isnan(KdReportScaleValue(1, kTicks, kKdReportSeconds)));
 }
 
 PlistDictionary unit(std::int64_t code) {
@@ -118,7 +151,8 @@ TEST(Texts, AreWrittenInOneCall) {
   std::array<int, 2> ends{};
   ASSERT_EQ(::pipe(ends.data()), 0);
   EXPECT_EQ(KdReportWriteStringUTF8(ends[1], "gr\xC3\xBC\xC3\x9F"), kKdSuccess);
-  EXPECT_EQ(KdReportWriteStringUTF8(ends[1], {}), kKdBadArgument);
+  for (const KdReportText none : {KdReportText(), KdReportText(nullptr), KdReportText(std::nullopt)})
+    EXPECT_EQ(KdReportWriteStringUTF8(ends[1], none), kKdBadArgument);
   EXPECT_EQ(KdReportWriteStringUTF8(ends[1], "\xFF"), kKdNoMemory);
   EXPECT_EQ(KdReportWriteStringUTF8(-1, "x"), kKdIOError);
   std::array<char, 16> read{};
@@ -130,4 +164,4 @@ TEST(Texts, AreWrittenInOneCall) {
 }
 
 }  // namespace
-}  // namespace tbdaily
+}  // namespace kdreport

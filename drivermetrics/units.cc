@@ -1,4 +1,4 @@
-#include "drivermetrics/units.h"
+// Unit codes: a quantity and a scale in 64 bits, taken apart into labels and exact factors.
 
 #include <algorithm>
 #include <array>
@@ -7,7 +7,7 @@
 
 #include "drivermetrics/channel_record.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 namespace {
 
@@ -20,27 +20,26 @@ constexpr unsigned kExponentBias = 127;
 constexpr std::uint64_t kDivides = std::uint64_t{1} << 31;
 constexpr std::uint64_t kFactorMask = kDivides - 1;
 
-constexpr unsigned kInformation = 9;  // the quantity of bits and bytes
 constexpr std::uint64_t kBitScale = 0;
 constexpr std::uint64_t kByteScale = 0x820000000000;  // eight bits
 
 struct QuantityLabel {
-  unsigned quantity;
+  std::uint8_t quantity;
   std::string_view label;
 };
 constexpr std::array<QuantityLabel, 12> kQuantityLabels = {{
-    {0, ""},
-    {1, "s"},
-    {2, "W"},
-    {3, "J"},
-    {4, "A"},
-    {5, "V"},
-    {6, "F"},
-    {7, "H"},
-    {8, "Hz"},
-    {10, "C"},
-    {100, "events"},
-    {101, "packets"},
+    {kKdReportCount, ""},
+    {kKdReportTime, "s"},
+    {kKdReportPower, "W"},
+    {kKdReportEnergy, "J"},
+    {kKdReportCurrent, "A"},
+    {kKdReportVoltage, "V"},
+    {kKdReportCapacitance, "F"},
+    {kKdReportInductance, "H"},
+    {kKdReportFrequency, "Hz"},
+    {kKdReportTemperature, "C"},
+    {kKdReportEvents, "events"},
+    {kKdReportPackets, "packets"},
 }};
 constexpr std::string_view kUnknownQuantity = "??";
 
@@ -82,14 +81,14 @@ const ScaleLabel* findScale(const std::array<ScaleLabel, N>& labels, std::uint64
   return found != labels.end() ? &*found : nullptr;
 }
 
-std::string_view quantityLabel(unsigned quantity, std::uint64_t scale) {
-  if (quantity == kInformation) return scale == kByteScale ? "B" : scale == kBitScale ? "b" : "";
+std::string_view quantityLabel(std::uint8_t quantity, std::uint64_t scale) {
+  if (quantity == kKdReportInformation) return scale == kByteScale ? "B" : scale == kBitScale ? "b" : "";
   const auto found = std::ranges::find(kQuantityLabels, quantity, &QuantityLabel::quantity);
   return found != kQuantityLabels.end() ? found->label : kUnknownQuantity;
 }
 
-unsigned quantityOf(std::int64_t unit) {
-  return static_cast<unsigned>(static_cast<std::uint64_t>(unit) >> kQuantityShift);
+std::uint8_t quantityOf(std::int64_t unit) {
+  return static_cast<std::uint8_t>(static_cast<std::uint64_t>(unit) >> kQuantityShift);
 }
 
 std::uint64_t scaleOf(std::int64_t unit) {
@@ -113,7 +112,7 @@ std::uint64_t shiftedLeft(std::uint64_t value, int bits) {
 
 }  // namespace
 
-std::optional<std::string> copyUnitLabel(std::int64_t unit) {
+std::optional<std::string> KdReportCopyUnitLabel(std::int64_t unit) {
   if (unit == kKdReportInvalid) return std::nullopt;
   const std::uint64_t scale = scaleOf(unit);
   if (const ScaleLabel* whole = findScale(kWholeLabels, scale)) return std::string(whole->label);
@@ -122,22 +121,26 @@ std::optional<std::string> copyUnitLabel(std::int64_t unit) {
   return label.append(quantityLabel(quantityOf(unit), scale));
 }
 
-std::optional<std::string_view> KdReportChannelGetUnitLabel(ChannelRecord* channel) {
+std::optional<std::string_view> KdReportChannelGetUnitLabel(const ChannelRecord* channel) {
   if (channel == nullptr) return std::nullopt;
-  if (channel->cached().unitLabel.isNone()) {
-    const auto label = copyUnitLabel(KdReportChannelGetUnit(channel));
-    if (!label) return std::nullopt;
-    channel->cache(&CachedAnswers::unitLabel, PlistValue::string(*label));
-  }
-  return channel->cached().unitLabel.asString();
+  const PlistValue& cached = channel->cached(CachedAnswer::UnitLabel);
+  if (!cached.isNone()) return cached.asString();
+  const auto label = KdReportCopyUnitLabel(KdReportChannelGetUnit(channel));
+  if (!label) return std::nullopt;
+  return channel->cache(CachedAnswer::UnitLabel, PlistValue::string(*label)).asString();
 }
 
 PlistValue KdReportCreateUnitInfo(std::int64_t unit) {
   return PlistValue::dictionary({{std::string(kd_report_key::kChannelUnit), PlistValue::int64(unit)}});
 }
 
-KdStatus getFactorsFromScale(std::uint64_t scale, std::uint64_t& numerator, std::uint64_t& denominator) {
-  if ((scale & kScaleMask) >> kNotNumericShift != 0) return kKdBadArgument;
+std::uint8_t KdReportUnitGetQuantity(std::int64_t unit) {
+  return quantityOf(unit);
+}
+
+KdStatus KdReportUnitGetScale(std::int64_t unit, std::uint64_t& numerator, std::uint64_t& denominator) {
+  const std::uint64_t scale = scaleOf(unit);
+  if (scale >> kNotNumericShift != 0) return kKdBadArgument;
   const std::uint64_t factor = std::max<std::uint64_t>(scale & kFactorMask, 1);
   const bool divides = (scale & kDivides) != 0;
   numerator = divides ? 1 : factor;
@@ -158,8 +161,8 @@ double KdReportScaleValue(std::uint64_t value, std::int64_t fromUnit, std::int64
   constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
   std::uint64_t fromNumerator = 0, fromDenominator = 0, toNumerator = 0, toDenominator = 0;
   if (quantityOf(fromUnit) != quantityOf(toUnit) ||
-      getFactorsFromScale(scaleOf(fromUnit), fromNumerator, fromDenominator) != kKdSuccess ||
-      getFactorsFromScale(scaleOf(toUnit), toNumerator, toDenominator) != kKdSuccess) {
+      KdReportUnitGetScale(fromUnit, fromNumerator, fromDenominator) != kKdSuccess ||
+      KdReportUnitGetScale(toUnit, toNumerator, toDenominator) != kKdSuccess) {
     return kNone;
   }
   const double scaled = static_cast<double>(value) * static_cast<double>(fromNumerator) /
@@ -168,4 +171,4 @@ double KdReportScaleValue(std::uint64_t value, std::int64_t fromUnit, std::int64
   return std::isnan(scaled) ? kNone : scaled;  // one kind of NaN, so that its text has no sign
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

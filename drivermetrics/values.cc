@@ -2,7 +2,7 @@
 
 #include "drivermetrics/values.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 std::uint32_t announcedElements(const ChannelRecord* channel, std::uint8_t format) {
   ChannelType type;
@@ -38,4 +38,9 @@ std::int64_t KdReportArrayGetValueAtIndex(const ChannelRecord* channel, std::int
   return element < elements->count() ? elements->word(element, word) : kKdReportInvalid;
 }
 
-}  // namespace tbdaily
+std::uint32_t KdReportArrayGetCount(const ChannelRecord* channel) {
+  const auto elements = getRawElements(channel, kKdReportArray);
+  return elements ? elements->count() * std::uint32_t{kElementWords} : kKdReportNoIndex;
+}
+
+}  // namespace kdreport

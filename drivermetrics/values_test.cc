@@ -4,7 +4,7 @@
 
 #include "drivermetrics/metrics_test_support.h"
 
-namespace tbdaily {
+namespace kdreport {
 namespace {
 
 using testing::channelType, testing::Element, testing::sampled;
@@ -32,7 +32,9 @@ TEST(Values, SimpleAndArray) {
   const std::vector<std::pair<std::int32_t, std::int64_t>> places = {
       {0, 1}, {7, 8}, {8, kNone}, {-1, kNone}, {INT32_MAX, kNone}};
   for (const auto& [index, value] : places)
-    EXPECT_EQ(KdReportArrayGetValueAtIndex(array.get(), index), value);
+    EXPECT_EQ(KdReportArrayGetValueAtIndex(array.get(), index), value) << index;
+  EXPECT_EQ(KdReportArrayGetCount(array.get()), 8U);
+  EXPECT_EQ(KdReportArrayGetCount(simple.get()), kKdReportNoIndex);
   EXPECT_EQ(KdReportArrayGetValueAtIndex(simple.get(), 0), kNone);
 }
 
@@ -74,7 +76,9 @@ TEST(Values, HistogramBounds) {
       {{{0xFFFFFFFF, 1, 2}}, {}},  // the second bound is negative
       {{}, {}},
   };
-  for (const auto& [segments, bounds] : cases) {
+  for (std::size_t row = 0; row < cases.size(); ++row) {
+    const auto& [segments, bounds] = cases[row];
+    SCOPED_TRACE("row " + std::to_string(row));
     const auto histogram = sampled(channelType(3, 5), std::vector<Element>(5),
                                    {{"KdReportChannelConfig", PlistValue::data(bucketConfig(segments))}});
     std::vector<std::int64_t> found;
@@ -85,7 +89,7 @@ TEST(Values, HistogramBounds) {
       found.push_back(upper);
     }
     EXPECT_EQ(found, bounds);
-    EXPECT_EQ(histogram->cached().processedChannelConfig.isNone(), bounds.empty())
+    EXPECT_EQ(histogram->cached(CachedAnswer::ProcessedChannelConfig).isNone(), bounds.empty())
         << "only what is right is cached";
     EXPECT_EQ(KdReportHistogramGetBucketBounds(histogram.get(), -1, nullptr, nullptr), kKdError);
   }
@@ -97,6 +101,7 @@ TEST(Values, States) {
   EXPECT_EQ(KdReportStateGetIndexForID(states.get(), kOff), 2U);
   EXPECT_EQ(KdReportStateGetCurrent(states.get()), 1U);
   EXPECT_EQ(KdReportStateGetDutyCycle(states.get(), 1), 0.75);
+  EXPECT_THAT(KdReportStateCopyDutyCycles(states.get()), ::testing::ElementsAre(0.25, 0.75, 0));
   EXPECT_EQ(KdReportStateGetNameForIndex(states.get(), 0), "OFF");
 
   const auto idle = sampled(channelType(2, 2), {{0, {kOn, 0, 0}}, {0, {1, 0, 0}}});
@@ -104,7 +109,7 @@ TEST(Values, States) {
   EXPECT_TRUE(std::isnan(KdReportStateGetDutyCycle(idle.get(), 0)));
   EXPECT_EQ(KdReportStateGetNameForIndex(idle.get(), 0), std::nullopt)
       << "one state without a name, no names";
-  EXPECT_TRUE(idle->cached().stateNames.isNone());
+  EXPECT_TRUE(idle->cached(CachedAnswer::StateNames).isNone());
 }
 
 TEST(Values, OfElementsOfEveryLengthAndFormat) {
@@ -124,6 +129,8 @@ TEST(Values, OfElementsOfEveryLengthAndFormat) {
           const bool isComplete = isReadable && elements == announced;
           const auto is = [format](unsigned f, bool condition) { return format == f && condition; };
           const ChannelRecord* c = channel.get();
+          SCOPED_TRACE("format " + std::to_string(format) + ", announced " + std::to_string(announced) +
+                       ", carried " + std::to_string(carried) + ", length " + std::to_string(length));
           EXPECT_EQ(KdReportSimpleGetIntegerValue(c) != kNone, carried == 1 && elements == 1);
           EXPECT_EQ(KdReportArrayGetValueAtIndex(c, 4) != kNone, carried == 4 && elements > 1);
           EXPECT_EQ(KdReportHistogramGetBucketHits(c, 0) != kNone, is(3, isComplete));
@@ -176,7 +183,9 @@ TEST(Deltas, FollowTheRulesOfEachFormat) {
       {make(0, {{}}), make(4, {{}}), {}, none, kKdBadArgument},
       {make(5, {{}}), make(5, {{}}), {}, "unknown report format", kKdUnsupportedMode},
   };
-  for (const DeltaCase& c : cases) {
+  for (std::size_t row = 0; row < cases.size(); ++row) {
+    const DeltaCase& c = cases[row];
+    SCOPED_TRACE("row " + std::to_string(row));
     const auto before = wordsOf(c.earlier.get()), after = wordsOf(c.later.get());
     std::optional<ReportError> error;
     const KdReportChannel delta = KdReportSampleCreateDelta(c.earlier.get(), c.later.get(), &error);
@@ -190,4 +199,4 @@ TEST(Deltas, FollowTheRulesOfEachFormat) {
 }
 
 }  // namespace
-}  // namespace tbdaily
+}  // namespace kdreport

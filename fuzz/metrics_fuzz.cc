@@ -16,6 +16,7 @@
 #include "testing/fake_drivers.h"
 
 using namespace tbdaily;
+using namespace kdreport;
 
 namespace {
 

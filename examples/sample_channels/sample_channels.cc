@@ -1,18 +1,19 @@
 // Prints the value of every simple channel that the drivers of the device under TBDAILY_ROOT publish.
 
-#include <drivermetrics/kd_report.h>
-#include <platform/linux/replay/host_registry.h>
+#include <kdreport/host_registry.h>
+#include <kdreport/kd_report.h>
 
 #include <iostream>
 
-using namespace tbdaily;
+using namespace kdreport;
 
 namespace {
 
 std::optional<ReportError> error;
 
 int fail() {
-  std::cerr << "sample_channels: " << error->reason << " (status " << error->code << ")\n";
+  std::cerr << "sample_channels: "
+            << (KdReportErrorHasReason(*error) ? error->reason : KdReportCopyStatusText(error->code)) << '\n';
   return 1;
 }
 
@@ -29,6 +30,11 @@ std::uint32_t print(ChannelRecord& channel) {
 int main() {
   const auto registry = openHostRegistry();
   const auto channels = KdReportCopyChannelsOfFormat(*registry, kKdReportSimple, kKdReportFlat, &error);
+  if (channels == nullptr && error->code == kKdNotFound) {
+    std::cerr << "sample_channels: no drivers here; make a device with \"tallyctl --root DIR init\" and set "
+                 "TBDAILY_ROOT=DIR\n";
+    return 1;
+  }
   if (channels == nullptr) return fail();
   KdReportCollection subscribed;
   const auto subscription =

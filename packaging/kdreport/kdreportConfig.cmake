@@ -1,4 +1,35 @@
+# Components: core (kdreport::kdreport, kdreport::shared), host (kdreport::host, kdreport::host_shared) and testing
+# (kdreport::testing). Without any named: all that are installed.
 include(CMakeFindDependencyMacro)
-find_dependency(EXPAT)
-find_dependency(Threads)
-include(${CMAKE_CURRENT_LIST_DIR}/kdreportTargets.cmake)
+
+set(_kdreport_wanted ${kdreport_FIND_COMPONENTS})
+if(NOT _kdreport_wanted)
+  foreach(_kdreport_component core host testing)
+    if(EXISTS ${CMAKE_CURRENT_LIST_DIR}/kdreport_${_kdreport_component}.cmake)
+      list(APPEND _kdreport_wanted ${_kdreport_component})
+    endif()
+  endforeach()
+endif()
+
+foreach(_kdreport_component ${_kdreport_wanted})
+  set(kdreport_${_kdreport_component}_FOUND FALSE)
+  if(_kdreport_component MATCHES "^(core|host|testing)$" AND
+     EXISTS ${CMAKE_CURRENT_LIST_DIR}/kdreport_${_kdreport_component}.cmake)
+    set(kdreport_${_kdreport_component}_FOUND TRUE)
+  elseif(kdreport_FIND_REQUIRED_${_kdreport_component})
+    set(kdreport_FOUND FALSE)
+    set(kdreport_NOT_FOUND_MESSAGE "kdreport has no component \"${_kdreport_component}\" here")
+    return()
+  endif()
+endforeach()
+
+if(kdreport_host_FOUND)
+  find_dependency(EXPAT)
+  find_dependency(Threads)
+endif()
+include(${CMAKE_CURRENT_LIST_DIR}/kdreport_core.cmake)
+foreach(_kdreport_component host testing)
+  if(kdreport_${_kdreport_component}_FOUND)
+    include(${CMAKE_CURRENT_LIST_DIR}/kdreport_${_kdreport_component}.cmake)
+  endif()
+endforeach()

@@ -7,7 +7,9 @@
 #include "platform/linux/replay/recordings.h"
 #include "platform/plist/codec.h"
 
-namespace tbdaily {
+namespace kdreport {
+
+using namespace tbdaily;
 
 namespace {
 
@@ -33,4 +35,4 @@ std::unique_ptr<DriverRegistry> openHostRegistry(std::string_view deviceRoot) {
   return std::make_unique<HostRegistry>(Host(deviceRoot, fromEnvironment.live()));
 }
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -1,4 +1,5 @@
-// The driver registry of a Linux host for a program of its own: nothing else of the platform comes with it.
+// The driver registry of a Linux host, for programs that link the driver metrics library: nothing else of the
+// platform comes with it.
 #pragma once
 
 #include <memory>
@@ -6,10 +7,11 @@
 
 #include "platform/driver_registry.h"
 
-namespace tbdaily {
+namespace kdreport {
 
 // What is recorded under a device root (registry.plist, hub.plist). Without a root: the one that TBDAILY_ROOT
-// names, else "/". Answers as an absent registry where nothing is recorded. For one thread.
-std::unique_ptr<DriverRegistry> openHostRegistry(std::string_view deviceRoot = {});
+// names, else "/". Answers as an absent registry where nothing is recorded. Different
+// subscriptions of it may be sampled in different threads.
+[[nodiscard]] std::unique_ptr<tbdaily::DriverRegistry> openHostRegistry(std::string_view deviceRoot = {});
 
-}  // namespace tbdaily
+}  // namespace kdreport

@@ -63,8 +63,7 @@ KdHandle RecordedDriverRegistry::nextMatch(const PlistValue& entries, const Plis
   while (from < list->size()) {
     const PlistValue& entry = (*list)[from++];
     if (entry.asDictionary() == nullptr || !matches(*entry.asDictionary(), *wanted)) continue;
-    entries_.emplace(++lastHandle_, entry);
-    return lastHandle_;
+    return add(entries_, entry);
   }
   return 0;
 }
@@ -80,30 +79,28 @@ KdStatus RecordedDriverRegistry::KdServiceGetMatchingServices(const PlistValue& 
   PlistValue entries = recordedEntries();
   if (entries.asArray() == nullptr) return kKdNotFound;
   if (matching.asDictionary() == nullptr) return kKdBadArgument;
-  iterators_.emplace(++lastHandle_, Iterator{matching, std::move(entries), 0});
-  iterator = lastHandle_;
+  iterator = add(iterators_, Iterator{matching, std::move(entries), 0});
   return kKdSuccess;
 }
 
 KdHandle RecordedDriverRegistry::KdIteratorNext(KdHandle iterator) {
-  const auto found = iterators_.find(iterator);
-  return found != iterators_.end()
-             ? nextMatch(found->second.entries, found->second.matching, found->second.next)
-             : 0;
+  Iterator* walk = find(iterators_, iterator);
+  return walk != nullptr ? nextMatch(walk->entries, walk->matching, walk->next) : 0;
 }
 
 bool RecordedDriverRegistry::KdIteratorIsValid(KdHandle iterator) {
-  const auto found = iterators_.find(iterator);
-  return found != iterators_.end() && found->second.entries == recordedEntries();
+  const Iterator* walk = find(iterators_, iterator);
+  return walk != nullptr && walk->entries == recordedEntries();
 }
 
 KdStatus RecordedDriverRegistry::KdObjectRelease(KdHandle object) {
+  const std::lock_guard guard(mutex_);
   return entries_.erase(object) + iterators_.erase(object) != 0 ? kKdSuccess : kKdBadArgument;
 }
 
-const PlistDictionary* RecordedDriverRegistry::entryOf(KdHandle handle) const {
-  const auto found = entries_.find(handle);
-  return found != entries_.end() ? found->second.asDictionary() : nullptr;
+const PlistDictionary* RecordedDriverRegistry::entryOf(KdHandle handle) {
+  const PlistValue* entry = find(entries_, handle);
+  return entry != nullptr ? entry->asDictionary() : nullptr;
 }
 
 std::uint32_t RecordedDriverRegistry::KdObjectGetUserRetainCount(KdHandle object) {
@@ -165,23 +162,23 @@ KdStatus RecordedDriverRegistry::KdServiceOpen(KdHandle service, std::uint32_t, 
                                  [&](const ClientKind& k) { return kindName.asString() == k.name; });
   if (kind == std::end(kClientKinds)) return kKdNotFound;
   if (const KdStatus status = recordedStatus(*client, "openStatus"); status != kKdSuccess) return status;
-  connections_.emplace(++lastHandle_,
-                       Connection{kind->make(*client, recordings_), recordedStatus(*client, "closeStatus")});
-  connection = lastHandle_;
+  connection =
+      add(connections_, Connection{kind->make(*client, recordings_), recordedStatus(*client, "closeStatus")});
   return kKdSuccess;
 }
 
 KdStatus RecordedDriverRegistry::KdServiceClose(KdHandle connection) {
-  const auto found = connections_.find(connection);
-  if (found == connections_.end()) return kKdBadArgument;
-  const KdStatus status = found->second.closeStatus;
-  connections_.erase(found);
-  return status;
+  Handles<Connection>::node_type closed;
+  {
+    const std::lock_guard guard(mutex_);
+    closed = connections_.extract(connection);
+  }
+  return closed.empty() ? kKdBadArgument : closed.mapped().closeStatus;
 }
 
 RecordedClient* RecordedDriverRegistry::clientOf(KdHandle connection) {
-  const auto found = connections_.find(connection);
-  return found != connections_.end() ? found->second.client.get() : nullptr;
+  const Connection* found = find(connections_, connection);
+  return found != nullptr ? found->client.get() : nullptr;
 }
 
 KdStatus RecordedDriverRegistry::KdConnectCallStructMethod(KdHandle connection, std::uint32_t method,

@@ -1,10 +1,11 @@
 // The driver registry of a recording, registry.plist: entries with properties and parents, and user clients
-// that answer as they were recorded. Without the recording everything answers as absent. For the main thread
-// only.
+// that answer as they were recorded. Without the recording everything answers as absent. Any thread may call;
+// an object or connection is for one thread at a time.
 #pragma once
 
 #include <map>
 #include <memory>
+#include <mutex>
 
 #include "platform/driver_registry.h"
 #include "platform/linux/replay/recorded_client.h"
@@ -44,7 +45,10 @@ class RecordedDriverRegistry : public DriverRegistry {
                                 std::span<std::byte> memory) override;
 
   // Objects, iterators and connections that nobody has given back.
-  std::size_t openHandles() const { return entries_.size() + iterators_.size() + connections_.size(); }
+  std::size_t openHandles() const {
+    const std::lock_guard guard(mutex_);
+    return entries_.size() + iterators_.size() + connections_.size();
+  }
 
  private:
   struct Iterator {
@@ -57,18 +61,38 @@ class RecordedDriverRegistry : public DriverRegistry {
     KdStatus closeStatus = kKdSuccess;
   };
 
+  // What a handle stands for stays where it is until the handle is given back.
+  template <typename T>
+  using Handles = std::map<KdHandle, T>;
+
+  // A new handle.
+  template <typename T>
+  KdHandle add(Handles<T>& handles, T value) {
+    const std::lock_guard guard(mutex_);
+    handles.emplace(++lastHandle_, std::move(value));
+    return lastHandle_;
+  }
+  // Null when there is no such handle of this kind.
+  template <typename T>
+  T* find(Handles<T>& handles, KdHandle handle) {
+    const std::lock_guard guard(mutex_);
+    const auto found = handles.find(handle);
+    return found != handles.end() ? &found->second : nullptr;
+  }
+
   PlistValue recordedEntries();
   // A handle for the next entry from `from` on that matches, or 0; `from` then is the place behind it.
   KdHandle nextMatch(const PlistValue& entries, const PlistValue& matching, std::size_t& from);
   // Null when the handle is no registry entry.
-  const PlistDictionary* entryOf(KdHandle handle) const;
+  const PlistDictionary* entryOf(KdHandle handle);
   RecordedClient* clientOf(KdHandle connection);
 
   Recordings& recordings_;
+  mutable std::mutex mutex_;  // of what follows
   KdHandle lastHandle_ = 0;
-  std::map<KdHandle, PlistValue> entries_;
-  std::map<KdHandle, Iterator> iterators_;
-  std::map<KdHandle, Connection> connections_;
+  Handles<PlistValue> entries_;
+  Handles<Iterator> iterators_;
+  Handles<Connection> connections_;
 };
 
 }  // namespace tbdaily

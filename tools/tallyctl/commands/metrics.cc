@@ -3,7 +3,6 @@
 #include <CLI/CLI.hpp>
 #include <cmath>
 
-#include "drivermetrics/units.h"
 #include "platform/number_text.h"
 #include "tools/tallyctl/metrics/advance.h"
 #include "tools/tallyctl/metrics/sampler.h"
@@ -11,6 +10,8 @@
 #include "tools/tallyctl/tool.h"
 
 namespace tbdaily {
+
+using namespace kdreport;
 
 namespace {
 
@@ -30,12 +31,9 @@ void sample(Tool& tool, const MetricsRequest& request) {
 }
 
 std::string_view whyNotScaled(std::int64_t from, std::int64_t to) {
-  constexpr unsigned kQuantityShift = 56;
-  const auto quantityOf = [](std::int64_t unit) {
-    return static_cast<std::uint64_t>(unit) >> kQuantityShift;
-  };
-  return quantityOf(from) != quantityOf(to) ? "the two units measure different quantities"
-                                            : "a scale of the units has no number";
+  return KdReportUnitGetQuantity(from) != KdReportUnitGetQuantity(to)
+             ? "the two units measure different quantities"
+             : "a scale of the units has no number";
 }
 
 void scale(Tool& tool, const std::vector<std::string>& words) {

@@ -6,10 +6,12 @@
 #include <optional>
 #include <vector>
 
-#include "drivermetrics/values.h"
+#include "drivermetrics/kd_report.h"
 #include "tools/tallyctl/metrics/hub_legends.h"
 
 namespace tbdaily {
+
+using namespace kdreport;
 
 namespace {
 
@@ -20,8 +22,10 @@ constexpr std::uint64_t kTicksPerSecond = 24'000'000;
 // together.
 constexpr std::uint64_t kMostStretches = 64;
 
-// Quantities that are measured rather than counted: W, A, V, F, H, Hz, C.
-constexpr std::array<std::uint8_t, 7> kMeasuredQuantities = {2, 4, 5, 6, 7, 8, 10};
+// Quantities that are measured rather than counted.
+constexpr std::array<std::uint8_t, 7> kMeasuredQuantities = {
+    kKdReportPower,      kKdReportCurrent,   kKdReportVoltage,    kKdReportCapacitance,
+    kKdReportInductance, kKdReportFrequency, kKdReportTemperature};
 
 constexpr std::size_t kStateWords = state_word::kResidency + 1;
 

@@ -1,27 +1,26 @@
 #include "tools/tallyctl/metrics/hub_legends.h"
 
-#include "drivermetrics/bucket_bounds.h"
-#include "drivermetrics/channel_record.h"
-#include "drivermetrics/units.h"
+#include "drivermetrics/kd_report.h"
 
 namespace tbdaily {
 
-std::optional<std::uint64_t> ChannelMeaning::unit() const {
+using namespace kdreport;
+
+std::optional<std::int64_t> ChannelMeaning::unit() const {
   const PlistDictionary* info = info_.asDictionary();
   const auto recorded = info != nullptr ? info->get(kd_report_key::kChannelUnit).asInteger() : std::nullopt;
   if (!recorded || *recorded == kKdReportInvalid) return std::nullopt;
-  return static_cast<std::uint64_t>(*recorded);
+  return recorded;
 }
 
 std::optional<std::uint8_t> ChannelMeaning::quantity() const {
   const auto code = unit();
-  return code ? std::optional(static_cast<std::uint8_t>(*code >> 56)) : std::nullopt;
+  return code ? std::optional(KdReportUnitGetQuantity(*code)) : std::nullopt;
 }
 
 std::optional<std::uint64_t> ChannelMeaning::unitsIn(std::uint64_t seconds) const {
-  constexpr std::uint8_t kTime = 1;
   std::uint64_t numerator = 0, denominator = 0;
-  if (quantity() != kTime || getFactorsFromScale(*unit(), numerator, denominator) != kKdSuccess ||
+  if (quantity() != kKdReportTime || KdReportUnitGetScale(*unit(), numerator, denominator) != kKdSuccess ||
       numerator == 0)
     return std::nullopt;
   return seconds * denominator / numerator;
@@ -31,7 +30,7 @@ std::vector<std::int64_t> ChannelMeaning::bucketBounds(std::size_t buckets) cons
   const PlistDictionary* info = info_.asDictionary();
   const PlistValue config = info != nullptr ? info->get(kd_report_key::kChannelConfig) : PlistValue();
   const auto bytes = config.asData().value_or(std::span<const std::byte>());
-  return tbdaily::bucketBounds(bytes, buckets).value_or(std::vector<std::int64_t>());
+  return KdReportCopyBucketBounds(bytes, buckets).value_or(std::vector<std::int64_t>());
 }
 
 HubLegends::HubLegends(const PlistValue& registryRoot) {

@@ -27,7 +27,7 @@ class ChannelMeaning {
   std::vector<std::int64_t> bucketBounds(std::size_t buckets) const;
 
  private:
-  std::optional<std::uint64_t> unit() const;
+  std::optional<std::int64_t> unit() const;
   PlistValue info_;  // a dictionary, or none
 };
 

@@ -4,6 +4,8 @@
 
 namespace tbdaily {
 
+using namespace kdreport;
+
 namespace {
 
 PlistValue number(std::int64_t value) {

@@ -9,6 +9,8 @@
 
 namespace tbdaily {
 
+using namespace kdreport;
+
 namespace {
 
 // Without what could drive a terminal in the text's lines.

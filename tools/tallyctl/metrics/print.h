@@ -20,10 +20,10 @@ struct MetricsRequest {
 bool hasNothingToShow(Tool& tool, const MetricsRequest& request, const ChannelSelection& selection);
 
 // The library's own descriptions one after another, on a terminal without what could drive it.
-std::string descriptionsText(const ChannelCollection* collection, ChannelContents contents);
+std::string descriptionsText(const kdreport::ChannelCollection* collection, ChannelContents contents);
 
 // As descriptions, JSON or a tree. A collection that cannot be walked is said to have failed.
-void printChannels(Tool& tool, const MetricsRequest& request, const ChannelCollection* collection,
+void printChannels(Tool& tool, const MetricsRequest& request, const kdreport::ChannelCollection* collection,
                    ChannelContents contents);
 
 }  // namespace tbdaily

@@ -3,11 +3,11 @@
 #include <array>
 #include <cstdio>
 
-#include "drivermetrics/report_error.h"
-#include "platform/driver_handle.h"
 #include "tools/tallyctl/tool.h"
 
 namespace tbdaily {
+
+using namespace kdreport;
 
 namespace {
 
@@ -37,8 +37,7 @@ std::string_view whatIsMissing(DriverRegistry& registry) {
 void failMetrics(Tool& tool, std::string_view what, const std::optional<ReportError>& error) {
   std::string line(what);
   if (error) {
-    const bool hasReason = error->reason != createPVErr(error->code, std::nullopt).reason;
-    if (hasReason) line += ": " + printable(error->reason);
+    if (KdReportErrorHasReason(*error)) line += ": " + printable(error->reason);
     line += " (" + statusText(error->code) + ")";
     // What the library answers where the registry or the hub itself is not there.
     if (error->code == kKdNotFound || error->code == kKdNoMemory)

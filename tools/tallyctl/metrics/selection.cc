@@ -9,6 +9,8 @@
 
 namespace tbdaily {
 
+using namespace kdreport;
+
 namespace {
 
 template <typename T>

@@ -32,7 +32,8 @@ bool setCategories(ChannelFilter& filter, std::string_view text);  // a mask, of
 void setUnit(ChannelFilter& filter, const std::string& text);      // a code, else a label
 
 struct ChannelSelection {
-  KdReportCollection channels;  // filed by driver and group; null when a call failed, which is said then
+  kdreport::KdReportCollection
+      channels;                 // filed by driver and group; null when a call failed, which is said then
   std::uint32_t published = 0;  // before the filter
   std::uint32_t selected = 0;
 };

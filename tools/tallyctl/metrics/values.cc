@@ -4,10 +4,9 @@
 #include <array>
 #include <cmath>
 
-#include "drivermetrics/units.h"
-#include "drivermetrics/values.h"
-
 namespace tbdaily {
+
+using namespace kdreport;
 
 namespace {
 
@@ -17,7 +16,7 @@ std::optional<std::string> owned(std::optional<std::string_view> text) {
   return text ? std::optional<std::string>(*text) : std::nullopt;
 }
 
-ChannelValues readDescription(ChannelRecord& channel) {
+ChannelValues readDescription(const ChannelRecord& channel) {
   ChannelValues values;
   values.driver = owned(KdReportChannelGetDriverName(&channel));
   values.driverID = KdReportChannelGetDriverID(&channel);
@@ -27,16 +26,15 @@ ChannelValues readDescription(ChannelRecord& channel) {
   values.channelID = KdReportChannelGetChannelID(&channel);
   values.format = KdReportChannelGetFormat(&channel);
   values.categories = KdReportChannelGetCategories(&channel);
-  if (ChannelType type; getChannelType(&channel, type) == kKdSuccess)
-    values.elementCount = type.elementCount();
+  values.elementCount = KdReportChannelGetElementCount(&channel);
   values.unit = KdReportChannelGetUnit(&channel);
   values.unitLabel = owned(KdReportChannelGetUnitLabel(&channel));
   return values;
 }
 
-void readStates(ChannelRecord& channel, ChannelValues& values) {
+void readStates(const ChannelRecord& channel, ChannelValues& values) {
   values.states.resize(values.elementCount);
-  const double all = residencyOfAllStates(&channel);
+  const std::vector<double> shares = KdReportStateCopyDutyCycles(&channel);
   bool named = true;  // all states have names, or none has
   for (std::int32_t i = 0; i < values.elementCount; ++i) {
     StateValues& state = values.states[static_cast<std::size_t>(i)];
@@ -45,12 +43,12 @@ void readStates(ChannelRecord& channel, ChannelValues& values) {
     named = state.name.has_value();
     state.entries = KdReportStateGetInTransitions(&channel, i);
     state.residency = KdReportStateGetResidency(&channel, i);
-    state.dutyCycle = shareOfResidency(state.residency, all);
+    if (!shares.empty()) state.dutyCycle = shares[static_cast<std::size_t>(i)];
   }
   values.currentState = KdReportStateGetCurrent(&channel);
 }
 
-void readBuckets(ChannelRecord& channel, ChannelValues& values) {
+void readBuckets(const ChannelRecord& channel, ChannelValues& values) {
   values.buckets.resize(values.elementCount);
   bool bounded = true;  // bounds are for the first buckets; behind one without there are none
   for (std::int32_t i = 0; i < values.elementCount; ++i) {
@@ -71,14 +69,14 @@ void readBuckets(ChannelRecord& channel, ChannelValues& values) {
 }
 
 void readArray(const ChannelRecord& channel, ChannelValues& values) {
-  const auto elements = getRawElements(&channel, kKdReportArray);
-  if (!elements) return;
-  values.array.resize(elements->count() * kElementWords);
+  const std::uint32_t count = KdReportArrayGetCount(&channel);
+  if (count == kKdReportNoIndex) return;
+  values.array.resize(count);
   for (std::size_t i = 0; i < values.array.size(); ++i)
     values.array[i] = KdReportArrayGetValueAtIndex(&channel, static_cast<std::int32_t>(i));
 }
 
-void readValues(ChannelRecord& channel, ChannelValues& values) {
+void readValues(const ChannelRecord& channel, ChannelValues& values) {
   switch (values.format) {
     case kKdReportSimple:
       values.value = KdReportSimpleGetIntegerValue(&channel);
@@ -127,7 +125,7 @@ std::optional<double> residencySeconds(const ChannelValues& channel, std::int64_
   // Scaling takes unsigned values; a residency that went back between two samples is negative.
   const bool negative = residency < 0;
   const auto magnitude = static_cast<std::uint64_t>(negative ? -residency : residency);
-  const double seconds = KdReportScaleValue(magnitude, channel.unit, kSecondsUnit);
+  const double seconds = KdReportScaleValue(magnitude, channel.unit, kKdReportSeconds);
   if (!std::isfinite(seconds)) return std::nullopt;
   return negative ? -seconds : seconds;
 }

@@ -2,7 +2,7 @@
 
 #include <gmock/gmock.h>
 
-#include "drivermetrics/metrics_test_support.h"
+#include "platform/byte_writer.h"
 #include "platform/plist/json.h"
 #include "tools/tallyctl/metrics/json.h"
 #include "tools/tallyctl/metrics/selection.h"
@@ -11,12 +11,35 @@
 namespace tbdaily::testing {
 namespace {
 
+using namespace kdreport;
 using ::testing::HasSubstr;
 
 constexpr std::int64_t kNanoseconds = 0x0100007600000000;
 
-std::vector<ChannelValues> valuesOf(const std::vector<KdReportChannel>& channels) {
-  return readChannels(collectionOf(channels).get(), ChannelContents::Values).value();
+struct Element {
+  std::uint64_t stamp = 0;
+  std::vector<std::int64_t> words;
+};
+
+// A channel of a sample, which may carry other elements than its type announces.
+std::vector<ChannelValues> valuesOf(std::uint64_t format, std::uint64_t announced,
+                                    const std::vector<Element>& elements) {
+  const auto type = static_cast<std::int64_t>(format | announced << 32);
+  PlistData bytes;
+  for (Element element : elements) {
+    element.words.resize(kElementWords);
+    for (const auto number :
+         {std::int64_t{1}, std::int64_t{2}, type, static_cast<std::int64_t>(element.stamp)})
+      appendLittleEndian(bytes, static_cast<std::uint64_t>(number));
+    for (const std::int64_t word : element.words) appendLittleEndian(bytes, static_cast<std::uint64_t>(word));
+  }
+  const PlistDictionary record{
+      {std::string(kd_report_key::kLegendChannel),
+       PlistValue::array({PlistValue::int64(2), PlistValue::int64(type)})},
+      {std::string(kd_report_key::kRawElements), elements.empty() ? PlistValue() : PlistValue::data(bytes)}};
+  const auto samples = KdReportCreateAggregateFromPropertyList(PlistValue::dictionary(
+      {{std::string(kd_report_key::kChannels), PlistValue::array({PlistValue::dictionary(record)})}}));
+  return readChannels(samples.get(), ChannelContents::Values).value();
 }
 
 TEST(MetricsValuesTest, CodesAreDecimalNegativeOrHexadecimal) {
@@ -35,17 +58,17 @@ TEST(MetricsValuesTest, CodesAreDecimalNegativeOrHexadecimal) {
 
 // A channel that runs over the end of the hub's buffer keeps its place without elements.
 TEST(MetricsValuesTest, ChannelsWithoutTheElementsThatTheirTypeAnnounces) {
-  const auto json = [](const KdReportChannel& channel) {
-    return jsonText(channelsAsJson(valuesOf({channel}), ChannelContents::Values));
+  const auto json = [](std::uint64_t format, std::uint64_t announced, const std::vector<Element>& elements) {
+    return jsonText(channelsAsJson(valuesOf(format, announced, elements), ChannelContents::Values));
   };
-  EXPECT_THAT(json(sampled(channelType(1, 1), {})), HasSubstr(R"("value": null})"));
-  EXPECT_THAT(json(sampled(channelType(1, 2), {{1, {5}}, {1, {6}}})), HasSubstr(R"("value": null})"));
-  EXPECT_THAT(json(sampled(channelType(4, 3), {{1, {5}}})), HasSubstr(R"("values": [5, 0, 0, 0]})"));
-  EXPECT_THAT(json(sampled(channelType(4, 3), {})), HasSubstr(R"("values": []})"));
-  EXPECT_THAT(json(sampled(channelType(2, 2), {{1, {5, 6, 7}}})),
+  EXPECT_THAT(json(1, 1, {}), HasSubstr(R"("value": null})"));
+  EXPECT_THAT(json(1, 2, {{1, {5}}, {1, {6}}}), HasSubstr(R"("value": null})"));
+  EXPECT_THAT(json(4, 3, {{1, {5}}}), HasSubstr(R"("values": [5, 0, 0, 0]})"));
+  EXPECT_THAT(json(4, 3, {}), HasSubstr(R"("values": []})"));
+  EXPECT_THAT(json(2, 2, {{1, {5, 6, 7}}}),
               HasSubstr(R"("states": [{"id": null, "name": null, "entries": null, "residency": null, )"
                         R"("dutyCycle": null}, {"id": null, )"));
-  EXPECT_THAT(json(sampled(channelType(3, 1), {})),
+  EXPECT_THAT(json(3, 1, {}),
               HasSubstr(R"("buckets": [{"lower": null, "upper": null, "hits": null, "minimum": null, )"
                         R"("maximum": null, "sum": null}], "minimum": null, "maximum": null})"));
 }
@@ -55,7 +78,7 @@ TEST(MetricsValuesTest, ChannelsWithoutTheElementsThatTheirTypeAnnounces) {
 TEST(MetricsValuesTest, AsManyStatesAsThereCanBe) {
   std::vector<Element> elements(65535, {1, {0x4F4E, 1, 1}});
   elements.back() = {2, {0x01, 1, 65536}};
-  const auto channels = valuesOf({sampled(channelType(2, 65535), elements)});
+  const auto channels = valuesOf(2, 65535, elements);
   ASSERT_EQ(channels[0].states.size(), 65535U);
   EXPECT_EQ(channels[0].states[0].name, std::nullopt);
   EXPECT_EQ(channels[0].states.back().dutyCycle, 65536.0 / (65534 + 65536));

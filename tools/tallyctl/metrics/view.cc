@@ -10,6 +10,8 @@
 
 namespace tbdaily {
 
+using namespace kdreport;
+
 namespace {
 
 std::string sixDigits(double value) {

@@ -19,6 +19,8 @@
 
 namespace tbdaily {
 
+using namespace kdreport;
+
 namespace {
 
 using Clock = std::chrono::steady_clock;

@@ -8,11 +8,13 @@
 #include <string_view>
 #include <vector>
 
-#include "drivermetrics/raw_elements.h"
+#include "drivermetrics/kd_report.h"
 #include "platform/byte_writer.h"
 #include "tools/tallyctl/metrics/hub_legends.h"
 
 namespace tbdaily {
+
+using namespace kdreport;
 
 namespace {
 
