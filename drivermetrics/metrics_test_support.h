@@ -3,6 +3,7 @@
 
 #include "drivermetrics/channel_collection.h"
 #include "drivermetrics/raw_elements.h"
+#include "platform/byte_writer.h"
 #include "testing/fake_drivers.h"
 
 namespace kdreport::testing {
@@ -57,18 +58,14 @@ struct Element {
   std::vector<std::int64_t> words;
 };
 
-inline void append64(PlistData& bytes, std::uint64_t value) {
-  for (unsigned shift = 0; shift < 64; shift += 8)
-    bytes.push_back(static_cast<std::byte>(value >> shift & 0xFF));
-}
-
 inline void appendElement(PlistData& bytes, std::int64_t driver, std::int64_t identifier, ChannelType type,
                           const Element& element = {}) {
   for (const std::uint64_t field :
        {static_cast<std::uint64_t>(driver), static_cast<std::uint64_t>(identifier), type.bits, element.stamp})
-    append64(bytes, field);
+    tbdaily::appendLittleEndian(bytes, field);
   for (std::size_t i = 0; i < kElementWords; ++i)
-    append64(bytes, i < element.words.size() ? static_cast<std::uint64_t>(element.words[i]) : 0);
+    tbdaily::appendLittleEndian(bytes,
+                                i < element.words.size() ? static_cast<std::uint64_t>(element.words[i]) : 0);
 }
 
 // A channel with elements in it, as a sample holds it.

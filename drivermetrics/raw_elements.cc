@@ -4,14 +4,14 @@
 
 #include "drivermetrics/object_blocks.h"
 #include "platform/byte_reader.h"
+#include "platform/byte_writer.h"
 
 namespace kdreport {
 
 namespace {
 
-void writeLittleEndian64(std::span<std::byte> bytes, std::size_t offset, std::uint64_t value) {
-  for (std::size_t i = 0; i < sizeof value; ++i)
-    bytes[offset + i] = static_cast<std::byte>(value >> (8 * i) & 0xFF);
+void write64(std::span<std::byte> bytes, std::size_t offset, std::uint64_t value) {
+  tbdaily::writeLittleEndian(bytes.subspan(offset, sizeof value), value);
 }
 
 std::uint64_t read64(std::span<const std::byte> bytes, std::size_t offset) {
@@ -37,8 +37,7 @@ std::int64_t RawElements::channelID() const {
 }
 
 void RawElements::setWord(std::size_t element, std::size_t word, std::int64_t value) {
-  if (element < count_)
-    writeLittleEndian64(bytes_, wordOffset(element, word), static_cast<std::uint64_t>(value));
+  if (element < count_) write64(bytes_, wordOffset(element, word), static_cast<std::uint64_t>(value));
 }
 
 bool RawElements::copyFrom(const RawElements& other) {

@@ -5,6 +5,7 @@
 #include "drivermetrics/metrics_test_support.h"
 #include "drivermetrics/subscription.h"
 #include "platform/byte_reader.h"
+#include "platform/byte_writer.h"
 #include "testing/scripted_hub.h"
 
 namespace kdreport {
@@ -49,7 +50,7 @@ TEST(Subscription, TellsTheHubWhatIsWantedAndSamplesItsBuffer) {
     PlistData expected;
     for (const std::uint64_t word : {std::uint64_t{2}, std::uint64_t{5}, std::uint64_t{6}, type.bits,
                                      std::uint64_t{5}, std::uint64_t{7}, std::uint64_t{0}})
-      testing::append64(expected, word);
+      tbdaily::appendLittleEndian(expected, word);
     EXPECT_EQ(device.hub.interestList, expected);
 
     const KdReportCollection before = KdReportCreateSamples(subscription.get(), subscribed.get());

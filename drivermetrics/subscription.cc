@@ -6,6 +6,7 @@
 
 #include "drivermetrics/channel_collection.h"
 #include "drivermetrics/report_error.h"
+#include "platform/byte_writer.h"
 
 namespace kdreport {
 
@@ -20,11 +21,6 @@ constexpr std::size_t kInterestHeaderSize = 8;  // the count, and as many bytes 
 constexpr std::size_t kInterestSize = 24;
 constexpr std::uint32_t kMostInterests = 89478477;  // keep the list below 2^31 bytes
 
-void appendLittleEndian(std::vector<std::byte>& bytes, std::uint64_t value) {
-  for (unsigned shift = 0; shift < 64; shift += 8)
-    bytes.push_back(static_cast<std::byte>(value >> shift & 0xFF));
-}
-
 }  // namespace
 
 std::optional<std::size_t> interestListSize(std::uint32_t count) {
@@ -38,7 +34,7 @@ std::optional<std::vector<std::byte>> createInterestList(const ChannelCollection
   if (!size) return std::nullopt;
   std::vector<std::byte> list;
   list.reserve(*size);
-  appendLittleEndian(list, count);
+  tbdaily::appendLittleEndian(list, std::uint64_t{count});
   const std::uint32_t status =
       KdReportIterate(channels, [&list, &size](ChannelRecord& channel) -> std::uint32_t {
         const std::int64_t driver = KdReportChannelGetDriverID(&channel);
@@ -48,9 +44,9 @@ std::optional<std::vector<std::byte>> createInterestList(const ChannelCollection
             getChannelType(&channel, type) != kKdSuccess || list.size() == *size) {
           return kKdReportStop;
         }
-        appendLittleEndian(list, static_cast<std::uint64_t>(driver));
-        appendLittleEndian(list, static_cast<std::uint64_t>(identifier));
-        appendLittleEndian(list, type.bits);
+        tbdaily::appendLittleEndian(list, static_cast<std::uint64_t>(driver));
+        tbdaily::appendLittleEndian(list, static_cast<std::uint64_t>(identifier));
+        tbdaily::appendLittleEndian(list, type.bits);
         return kKdReportKeep;
       });
   if (status != 0 || list.size() != *size) return std::nullopt;

@@ -5,6 +5,7 @@
 #include <cmath>
 
 #include "drivermetrics/metrics_test_support.h"
+#include "platform/byte_writer.h"
 
 namespace kdreport {
 namespace {
@@ -125,8 +126,8 @@ TEST(Descriptions, OfSamples) {
   PlistDictionary info = unit(kNanoseconds);
   info.set("KdReportChannelConfig", PlistValue::data([] {
              PlistData config;
-             testing::append64(config, 10);
-             testing::append64(config, std::uint64_t{2} << 32);
+             tbdaily::appendLittleEndian(config, std::uint64_t{10});
+             tbdaily::appendLittleEndian(config, std::uint64_t{2} << 32);
              return config;
            }()));
   EXPECT_EQ(describe(sampled(channelType(3, 2), {{1, {2, 3, 9, 12}}, {1, {0, 0, 0, 0}}}, info)),

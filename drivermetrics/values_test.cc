@@ -3,6 +3,7 @@
 #include <cmath>
 
 #include "drivermetrics/metrics_test_support.h"
+#include "platform/byte_writer.h"
 
 namespace kdreport {
 namespace {
@@ -55,8 +56,8 @@ struct Segment {
 PlistData bucketConfig(const std::vector<Segment>& segments) {
   PlistData bytes;
   for (const Segment& segment : segments) {
-    testing::append64(bytes, segment.base | std::uint64_t{segment.progression} << 32);
-    testing::append64(bytes, 0xFFFFFFFF | std::uint64_t{segment.buckets} << 32);
+    tbdaily::appendLittleEndian(bytes, segment.base | std::uint64_t{segment.progression} << 32);
+    tbdaily::appendLittleEndian(bytes, 0xFFFFFFFF | std::uint64_t{segment.buckets} << 32);
   }
   return bytes;
 }

@@ -3,13 +3,8 @@
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
-#include <limits>
 
 namespace tbdaily {
-
-PlistValue jsonNull() {
-  return PlistValue::float64(std::numeric_limits<double>::quiet_NaN());
-}
 
 LinuxPlatform& Tool::platform() {
   if (!platform_) {

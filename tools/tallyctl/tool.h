@@ -21,10 +21,6 @@ namespace tbdaily {
 // Exit statuses of the program.
 enum ExitStatus : int { kDone = 0, kFailed = 1, kWrongUsage = 2 };
 
-// A value that prints as null. A dictionary cannot hold an absent value; a number that is not finite has no
-// other text in JSON.
-PlistValue jsonNull();
-
 class Tool {
  public:
   // What the common options say. An empty root means TBDAILY_ROOT, else "/".

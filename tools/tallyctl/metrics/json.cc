@@ -1,99 +1,94 @@
 #include "tools/tallyctl/metrics/json.h"
 
-#include "tools/tallyctl/tool.h"
-
 namespace tbdaily {
 
 using namespace kdreport;
 
 namespace {
 
-PlistValue number(std::int64_t value) {
-  return value != kKdReportInvalid ? PlistValue::int64(value) : jsonNull();
+// Null for the invalid number.
+std::optional<std::int64_t> number(std::int64_t value) {
+  return value != kKdReportInvalid ? std::optional(value) : std::nullopt;
 }
 
-PlistValue text(const std::optional<std::string>& value) {
-  return value ? PlistValue::string(*value) : jsonNull();
-}
-
-PlistValue statesAsJson(const std::vector<StateValues>& states) {
-  PlistArray array;
-  array.reserve(states.size());
-  for (const StateValues& state : states) {
-    array.push_back(PlistValue::dictionary({{"id", number(state.id)},
-                                            {"name", text(state.name)},
-                                            {"entries", number(state.entries)},
-                                            {"residency", number(state.residency)},
-                                            {"dutyCycle", PlistValue::float64(state.dutyCycle)}}));
+void writeStates(JsonWriter& json, const ChannelValues& channel) {
+  {
+    const auto states = json.array("states");
+    for (const StateValues& state : channel.states) {
+      const auto entry = json.object();
+      json.add("id", number(state.id));
+      json.add("name", state.name);
+      json.add("entries", number(state.entries));
+      json.add("residency", number(state.residency));
+      json.add("dutyCycle", state.dutyCycle);
+    }
   }
-  return PlistValue::array(std::move(array));
+  json.add("current",
+           channel.currentState != kKdReportNoIndex ? std::optional(channel.currentState) : std::nullopt);
 }
 
-PlistValue bucketsAsJson(const std::vector<BucketValues>& buckets) {
-  PlistArray array;
-  array.reserve(buckets.size());
-  for (const BucketValues& bucket : buckets) {
-    array.push_back(PlistValue::dictionary({{"lower", number(bucket.lower)},
-                                            {"upper", number(bucket.upper)},
-                                            {"hits", number(bucket.hits)},
-                                            {"minimum", number(bucket.minimum)},
-                                            {"maximum", number(bucket.maximum)},
-                                            {"sum", number(bucket.sum)}}));
+void writeBuckets(JsonWriter& json, const ChannelValues& channel) {
+  {
+    const auto buckets = json.array("buckets");
+    for (const BucketValues& bucket : channel.buckets) {
+      const auto entry = json.object();
+      json.add("lower", number(bucket.lower));
+      json.add("upper", number(bucket.upper));
+      json.add("hits", number(bucket.hits));
+      json.add("minimum", number(bucket.minimum));
+      json.add("maximum", number(bucket.maximum));
+      json.add("sum", number(bucket.sum));
+    }
   }
-  return PlistValue::array(std::move(array));
+  json.add("minimum", number(channel.minimum));
+  json.add("maximum", number(channel.maximum));
 }
 
-PlistValue arrayAsJson(const std::vector<std::int64_t>& values) {
-  PlistArray array;
-  array.reserve(values.size());
-  for (const std::int64_t value : values) array.push_back(number(value));
-  return PlistValue::array(std::move(array));
+void writeArray(JsonWriter& json, const ChannelValues& channel) {
+  const auto values = json.array("values");
+  for (const std::int64_t value : channel.array) json.add(number(value));
 }
 
-void addValues(const ChannelValues& channel, PlistDictionary& json) {
+void writeValues(JsonWriter& json, const ChannelValues& channel) {
   switch (channel.format) {
     case kKdReportSimple:
-      json.set("value", number(channel.value));
+      json.add("value", number(channel.value));
       break;
     case kKdReportState:
-      json.set("states", statesAsJson(channel.states));
-      json.set("current", channel.currentState != kKdReportNoIndex ? PlistValue::int64(channel.currentState)
-                                                                   : jsonNull());
+      writeStates(json, channel);
       break;
     case kKdReportHistogram:
-      json.set("buckets", bucketsAsJson(channel.buckets));
-      json.set("minimum", number(channel.minimum));
-      json.set("maximum", number(channel.maximum));
+      writeBuckets(json, channel);
       break;
     case kKdReportArray:
-      json.set("values", arrayAsJson(channel.array));
+      writeArray(json, channel);
       break;
     default:
       break;
   }
 }
 
+void writeChannel(JsonWriter& json, const ChannelValues& channel, ChannelContents contents) {
+  const auto entry = json.object();
+  json.add("driver", channel.driver);
+  json.add("driverID", number(channel.driverID));
+  json.add("group", channel.group);
+  json.add("subgroup", channel.subGroup);
+  json.add("name", channel.name);
+  json.add("channelID", number(channel.channelID));
+  json.add("format", channel.format);
+  json.add("categories", channel.categories);
+  json.add("elements", channel.elementCount);
+  json.add("unit", number(channel.unit));
+  json.add("unitLabel", channel.unitLabel);
+  if (contents == ChannelContents::Values) writeValues(json, channel);
+}
+
 }  // namespace
 
-PlistValue channelsAsJson(const std::vector<ChannelValues>& channels, ChannelContents contents) {
-  PlistArray array;
-  array.reserve(channels.size());
-  for (const ChannelValues& channel : channels) {
-    PlistDictionary json{{"driver", text(channel.driver)},
-                         {"driverID", number(channel.driverID)},
-                         {"group", text(channel.group)},
-                         {"subgroup", text(channel.subGroup)},
-                         {"name", text(channel.name)},
-                         {"channelID", number(channel.channelID)},
-                         {"format", PlistValue::int64(channel.format)},
-                         {"categories", PlistValue::int64(channel.categories)},
-                         {"elements", PlistValue::int64(channel.elementCount)},
-                         {"unit", number(channel.unit)},
-                         {"unitLabel", text(channel.unitLabel)}};
-    if (contents == ChannelContents::Values) addValues(channel, json);
-    array.push_back(PlistValue::dictionary(std::move(json)));
-  }
-  return PlistValue::array(std::move(array));
+void writeChannels(JsonWriter& json, const std::vector<ChannelValues>& channels, ChannelContents contents) {
+  const auto root = json.array();
+  for (const ChannelValues& channel : channels) writeChannel(json, channel, contents);
 }
 
 }  // namespace tbdaily

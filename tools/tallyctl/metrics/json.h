@@ -3,12 +3,12 @@
 
 #include <vector>
 
-#include "platform/plist_value.h"
+#include "platform/plist/json_writer.h"
 #include "tools/tallyctl/metrics/values.h"
 
 namespace tbdaily {
 
-// An array with a dictionary for each channel; what is missing is null.
-PlistValue channelsAsJson(const std::vector<ChannelValues>& channels, ChannelContents contents);
+// An array with an object for each channel; what is missing is null.
+void writeChannels(JsonWriter& json, const std::vector<ChannelValues>& channels, ChannelContents contents);
 
 }  // namespace tbdaily

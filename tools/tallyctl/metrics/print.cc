@@ -51,10 +51,7 @@ void printChannels(Tool& tool, const MetricsRequest& request, const ChannelColle
   if (request.describe) return tool.out().print(descriptionsText(collection, contents));
   const auto channels = readChannels(collection, contents);
   if (!channels) return failMetrics(tool, "the channels cannot be read", std::nullopt);
-  if (tool.options.json) {
-    tool.printedAsJson(channelsAsJson(*channels, contents));
-    return;
-  }
+  if (tool.printedAsJson([&](JsonWriter& json) { writeChannels(json, *channels, contents); })) return;
   if (channels->empty()) return tool.out().line("the hub has no values of these channels");
   contents == ChannelContents::Values ? printValueTree(tool.out(), *channels)
                                       : printChannelTree(tool.out(), *channels);

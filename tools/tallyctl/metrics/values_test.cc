@@ -59,7 +59,9 @@ TEST(MetricsValuesTest, CodesAreDecimalNegativeOrHexadecimal) {
 // A channel that runs over the end of the hub's buffer keeps its place without elements.
 TEST(MetricsValuesTest, ChannelsWithoutTheElementsThatTheirTypeAnnounces) {
   const auto json = [](std::uint64_t format, std::uint64_t announced, const std::vector<Element>& elements) {
-    return jsonText(channelsAsJson(valuesOf(format, announced, elements), ChannelContents::Values));
+    JsonWriter writer(JsonLayout::OneLine);
+    writeChannels(writer, valuesOf(format, announced, elements), ChannelContents::Values);
+    return writer.take();
   };
   EXPECT_THAT(json(1, 1, {}), HasSubstr(R"("value": null})"));
   EXPECT_THAT(json(1, 2, {{1, {5}}, {1, {6}}}), HasSubstr(R"("value": null})"));

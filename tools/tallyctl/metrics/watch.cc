@@ -10,7 +10,6 @@
 #include "platform/calendar.h"
 #include "platform/kernel.h"
 #include "platform/platform.h"
-#include "platform/plist/json.h"
 #include "tools/tallyctl/metrics/json.h"
 #include "tools/tallyctl/metrics/sampler.h"
 #include "tools/tallyctl/metrics/view.h"
@@ -112,7 +111,11 @@ class SampleStream {
       failMetrics(tool_, "the channels cannot be read", std::nullopt);
       return WaitEnd::Stopped;
     }
-    if (tool_.options.json) return print(jsonText(channelsAsJson(*channels, ChannelContents::Values)) + "\n");
+    if (tool_.options.json) {
+      JsonWriter json(JsonLayout::OneLine);
+      writeChannels(json, *channels, ChannelContents::Values);
+      return print(json.take() + "\n");
+    }
     const PlistDate now = tool_.platform().services().kernel.currentTime();
     if (!redraws_) return print(valuesLine(now, *channels) + "\n");
     tool_.out().print(kClearScreen);
