@@ -41,7 +41,8 @@ void nandInfo(benchmark::State& state) {
   testing::FakePlatform fake;
   StatsContext context;
   STXParseBufferToCxt(context, buffer(1));
-  for (auto _ : state) benchmark::DoNotOptimize(NandInfoFromContext(fake.preferences, context, false));
+  for (auto _ : state)
+    benchmark::DoNotOptimize(NandInfoFromContext(fake.preferences, context, false, fake.diagnostics));
   state.SetItemsProcessed(state.iterations() * static_cast<std::int64_t>(context.nodes.size()));
 }
 BENCHMARK(nandInfo)->Unit(benchmark::kMicrosecond);
@@ -62,7 +63,7 @@ void telemetryList(benchmark::State& state) {
                               {"num-bus", PlistValue::int64(channels)}});
   for (auto _ : state) {
     const FetchedList list{bytes, bytes.size(), characteristics, "VelmoraEmbeddedNVMeController"};
-    benchmark::DoNotOptimize(HandleTelemetryList(platform, list, standardDiagnostics()));
+    benchmark::DoNotOptimize(HandleTelemetryList(platform, list, platform.diagnostics));
   }
   state.SetBytesProcessed(state.iterations() * static_cast<std::int64_t>(bytes.size()));
 }

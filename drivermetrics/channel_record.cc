@@ -34,6 +34,8 @@ ElementData::ElementData(std::span<const std::byte> bytes)
 }
 
 struct AnswerCache::Kept {
+  Kept(CachedAnswer of, PlistValue kept) : answer(of), value(std::move(kept)) {}
+
   CachedAnswer answer;
   PlistValue value;
   const Kept* before = nullptr;                  // owned

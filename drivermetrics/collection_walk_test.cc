@@ -1,6 +1,7 @@
 #include <gmock/gmock.h>
 
 #include <cstdlib>
+#include <map>
 #include <new>
 #include <random>
 #include <stdexcept>
@@ -67,7 +68,7 @@ std::vector<ChannelRecord*> inWalkOrder(const std::vector<KdReportChannel>& chan
            channels.begin();
   };
   using Key = std::vector<std::ptrdiff_t>;
-  std::vector<std::pair<Key, ChannelRecord*>> keyed;
+  std::multimap<Key, ChannelRecord*> keyed;  // equal keys stay in the order of the list
   for (const KdReportChannel& channel : channels) {
     const auto driver = [](const ChannelRecord& c) { return c.group().driverID; };
     const auto group = [](const ChannelRecord& c) {
@@ -79,9 +80,8 @@ std::vector<ChannelRecord*> inWalkOrder(const std::vector<KdReportChannel>& chan
     Key key{rank(driver, channel.get()), -1, -1};
     if (channel->group().groupName) key[1] = rank(group, channel.get());
     if (channel->group().groupName && channel->group().subGroupName) key[2] = rank(subGroup, channel.get());
-    keyed.emplace_back(key, channel.get());
+    keyed.emplace(key, channel.get());
   }
-  std::ranges::stable_sort(keyed, {}, &std::pair<Key, ChannelRecord*>::first);
   std::vector<ChannelRecord*> ordered;
   for (const auto& [key, channel] : keyed) ordered.push_back(channel);
   return ordered;

@@ -1,13 +1,5 @@
 // Fuzzer of the driver metrics library: property lists as legends and as collections, and bytes as a hub's
-// buffer. Built as a program of its own with clang, from the top of the tree (bash):
-//
-//   parts=(plist_{binary_reader,builder,scalar_text,xml_reader,xml_writer} property_list_codec)
-//   parts+=(base64 xml_doctype ../utf8 ../number_text ../plist_value)
-//   flags="-std=c++20 -g -O1 -fsanitize=fuzzer,address,undefined -I."
-//   library=$(ls drivermetrics/*.cc | grep -v _test.cc)
-//   clang++ $flags fuzz/metrics_fuzz.cc $library $(printf 'platform/linux/%s.cc ' ${parts[@]}) -lexpat
-//   ./a.out -max_len=8192 CORPUS
-
+// buffer.
 #include <cstddef>
 #include <cstdint>
 

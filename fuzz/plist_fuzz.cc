@@ -1,11 +1,5 @@
-// Feeds arbitrary bytes to the property-list codec: whatever reads, writes, and what is written in the exact
-// form reads back equal. Built as a program of its own with clang, from the top of the tree (bash):
-//
-//   parts=(plist_{binary_reader,builder,json,scalar_text,xml_reader,xml_writer} property_list_codec)
-//   parts+=(base64 utf8 xml_doctype ../number_text ../plist_value)
-//   flags="-std=c++20 -g -O1 -fsanitize=fuzzer,address,undefined -I."
-//   clang++ $flags fuzz/plist_fuzz.cc $(printf 'platform/linux/%s.cc ' ${parts[@]}) -lexpat -o plist_fuzz
-//   ./plist_fuzz -max_len=4096 CORPUS
+// Fuzzer of the property-list codec and of JSON: whatever reads, writes, and what is written in the exact
+// form reads back equal.
 #include <cstddef>
 #include <cstdint>
 #include <cstdlib>
