@@ -1,0 +1,53 @@
+#include "platform/linux/linux_kernel.h"
+
+#include <gtest/gtest.h>
+
+#include "platform/kernel.h"
+#include "platform/linux/host_test_support.h"
+#include "platform/platform.h"
+#include "platform/plist_text.h"
+
+namespace tbdaily {
+namespace {
+
+using testing::TestPlatform;
+
+TEST(LinuxKernelTest, FillsSysctlsFromIntegersErrorsAndEvents) {
+  TestPlatform device;
+  Kernel& kernel = device.services.kernel;
+  const auto read = [&](const char* name, std::size_t room) {
+    PlistData buffer(room);
+    std::size_t length = room;
+    const int error = kernel.sysctlByName(name, buffer, length);
+    if (error != 0) return "errno " + std::to_string(error);
+    buffer.resize(length);
+    return plistText(PlistValue::data(buffer));
+  };
+  device.record("kernel.plist", "sysctl", device.json(R"({"int": -2, "text": "x", "bad": "x"})"));
+  device.record(
+      "kernel.plist", "eccEvents",
+      PlistValue::array({PlistValue::data(PlistData(3, std::byte{1})), PlistValue::data(PlistData(1))}));
+  const auto setErrors = [&](const std::string& number) {
+    device.record("kernel.plist", "errno",
+                  device.json(R"({"bad": )" + number + R"(, "kern.next_ecc_event": )" + number + "}"));
+  };
+  setErrors("5");
+  EXPECT_EQ(read("int", 4), "<feffffff>");
+  EXPECT_EQ(read("int", 8), "<feffffffffffffff>");
+  EXPECT_EQ(read("int", 5), "errno 22");
+  EXPECT_EQ(read("text", 8), "errno 2");
+  EXPECT_EQ(read("bad", 8), "errno 5");
+  EXPECT_EQ(read("vm.swapusage", 32), "errno 2");
+  EXPECT_EQ(read("kern.next_ecc_event", 8), "<010101>");
+  EXPECT_EQ(read("kern.next_ecc_event", 8), "<00>");
+  EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 5");
+  setErrors("1099511627776");  // no error number
+  EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 2");
+
+  TestPlatform live(true);
+  live.record("clock.plist", "numerator", device.json("4294967296"));
+  EXPECT_EQ(live.services.kernel.timebase()->numerator, 1U);
+}
+
+}  // namespace
+}  // namespace tbdaily
