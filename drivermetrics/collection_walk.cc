@@ -86,8 +86,7 @@ std::uint32_t cloneChannels(const Clone& mode, const Channels& channels, Channel
   std::uint32_t status = 0;
   ObjectBlocks<ChannelRecord> memory(channels.size());
   copies.reserve(channels.size());
-  for (std::size_t i = 0; i < channels.size(); ++i) {
-    const KdReportChannel& channel = channels[i];
+  for (const KdReportChannel& channel : channels) {
     if (channel == nullptr) return kKdReportWalkFailed;
     KdReportChannel copy = memory.add(*channel);
     const std::uint32_t answer = mode.visitor(*channel, *copy);
