@@ -12,6 +12,7 @@
 #include <string>
 #include <vector>
 
+#include "platform/app_registry.h"
 #include "platform/linux/linux_platform.h"
 #include "platform/linux/replay/recordings.h"
 #include "platform/plist/codec.h"
@@ -65,6 +66,22 @@ struct TestHost {
     record(recording::kClock, "now", PlistValue(PlistDate::fromUnixSeconds(unixSeconds)));
   }
 };
+
+// Each text with a space behind it.
+inline std::string joined(const std::vector<std::string>& texts) {
+  std::string all;
+  for (const std::string& t : texts) all += t + " ";
+  return all;
+}
+
+// The types of the applications, in byte order.
+inline std::string bundleTypes(Platform& host) {
+  std::vector<std::string> types;
+  host.appRegistry.enumerateBundles(BundleKind::Application,
+                                    [&](std::string_view t) { types.emplace_back(t); });
+  std::ranges::sort(types);
+  return joined(types);
+}
 
 // Lowers a limit of the process for as long as it lives. What then does not fit a file fails, without a
 // signal.

@@ -11,22 +11,9 @@ namespace {
 
 namespace fs = std::filesystem;
 using namespace std::string_literals;
+using testing::bundleTypes;
+using testing::joined;
 using testing::TestPlatform;
-using Texts = std::vector<std::string>;
-
-std::string joined(const Texts& texts) {
-  std::string all;
-  for (const std::string& t : texts) all += t + " ";
-  return all;
-}
-
-std::string bundleTypes(Platform& host) {
-  Texts types;
-  host.appRegistry.enumerateBundles(BundleKind::Application,
-                                    [&](std::string_view t) { types.emplace_back(t); });
-  std::ranges::sort(types);
-  return joined(types);
-}
 
 TEST(LinuxAppRegistryTest, CountsTheApplicationsAmongTheDesktopEntries) {
   TestPlatform device(true);

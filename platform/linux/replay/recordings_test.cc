@@ -10,25 +10,13 @@ namespace tbdaily {
 namespace {
 
 namespace fs = std::filesystem;
+using testing::bundleTypes;
+using testing::joined;
 using testing::TestPlatform;
 using Texts = std::vector<std::string>;
 
 PlistValue text(const char* t) {
   return PlistValue::string(t);
-}
-
-std::string joined(const Texts& texts) {
-  std::string all;
-  for (const std::string& t : texts) all += t + " ";
-  return all;
-}
-
-std::string bundleTypes(Platform& host) {
-  Texts types;
-  host.appRegistry.enumerateBundles(BundleKind::Application,
-                                    [&](std::string_view t) { types.emplace_back(t); });
-  std::ranges::sort(types);
-  return joined(types);
 }
 
 TEST(RecordingsTest, AnswerBeforeTheLiveHostEachForItself) {
