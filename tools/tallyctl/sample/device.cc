@@ -1,0 +1,227 @@
+#include "tools/tallyctl/sample/device.h"
+
+#include <cerrno>
+#include <filesystem>
+#include <vector>
+
+#include "driver/daily_tasks.h"
+#include "platform/analytics_home.h"
+#include "platform/linux/file_io.h"
+#include "platform/linux/host_notes.h"
+#include "platform/linux/store/analytics_store.h"
+#include "platform/preferences_store.h"
+#include "platform/property_list_codec.h"
+#include "report/tb_config.h"
+#include "tools/tallyctl/sample/controller.h"
+#include "tools/tallyctl/sample/history.h"
+#include "tools/tallyctl/sample/metrics.h"
+#include "tools/tallyctl/sample/whitelist.h"
+
+namespace tbdaily {
+
+namespace fs = std::filesystem;
+
+namespace {
+
+constexpr std::string_view kSupportLibrary =
+    "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
+
+constexpr std::string_view kStackSnapshot = "/System/Device/snapshot.kcdata";
+
+PlistValue text(std::string_view t) {
+  return PlistValue::string(std::string(t));
+}
+
+PlistArray texts(std::initializer_list<const char*> list) {
+  PlistArray array;
+  for (const char* element : list) array.push_back(text(element));
+  return array;
+}
+
+PlistDictionary sampleAnswers(const SampleProfile& profile) {
+  return {{"InternalBuild", PlistValue::boolean(false)},
+          {"MultiUser", PlistValue::boolean(false)},
+          {"DiskUsage", PlistValue::dictionary({{"TotalDiskCapacity", PlistValue::int64(255'866'126'336)},
+                                                {"TotalDataAvailable", PlistValue::int64(96'481'509'376)}})},
+          {"InverseDeviceID", text("b41c77e0a9d24d0c8f5e61d27a3f9c10")},
+          {"ProductBuildVersion", text("4N117")},
+          {"ProductVersion", text("4.2.1")},
+          {"SystemVersion", text("Nimbos 4.2.1 (4N117)")},
+          {"SystemIdentifier", text("f2d8c0c75b3a4cd8a4a1c1b6d8a1f7e3")},
+          {"HardwareModel", text(profile.hardwareModel)}};
+}
+
+PlistDictionary sampleKernel() {
+  PlistData swap(32, std::byte{0});  // total 1 GiB, all of it available
+  swap[3] = std::byte{0x40};
+  swap[11] = std::byte{0x40};
+  swap[25] = std::byte{0x40};  // pages of 16 KiB
+  return {{"sysctl", PlistValue::dictionary(
+                         {{"kern.memorystatus_freeze_count", PlistValue::int64(37)},
+                          {"kern.memorystatus_freeze_pageouts", PlistValue::int64(812'334)},
+                          {"kern.memorystatus_freeze_budget_pages_remaining", PlistValue::int64(51'200)},
+                          {"kern.memorystatus_thaw_count", PlistValue::int64(29)},
+                          {"vm.swapusage", PlistValue::data(std::move(swap))}})},
+          {"eccEvents", PlistValue::array(sampleEccEvents())}};
+}
+
+PlistDictionary sampleLocale() {
+  return {{"preferredLanguages", PlistValue::array(texts({"de-AT", "en-GB"}))},
+          {"systemLanguages", PlistValue::array(texts({"en", "de", "fr", "es", "ja"}))},
+          {"countryCode", text("AT")}};
+}
+
+PlistDictionary sampleBundles() {
+  PlistArray bundles;
+  for (const SampleApp& app : sampleApps()) {
+    bundles.push_back(PlistValue::dictionary(
+        {{"identifier", text(app.identifier)}, {"type", text(app.isUserApp ? "User" : "System")}}));
+  }
+  return {{"bundles", PlistValue::array(std::move(bundles))}};
+}
+
+// Scheduled, not yet applied: keeps one group of the whitelist switched off and another one on.
+PlistDictionary sampleTasking() {
+  const auto item = [](std::string_view key, PlistValue value) {
+    return PlistValue::dictionary({{"Domain", text(preference_domain::kTaskingValues)},
+                                   {"Key", text(key)},
+                                   {"Value", std::move(value)}});
+  };
+  return {{"TaskingID", text("sample-tasking-1")},
+          {"TaskingDigest", text("6f1ed002ab5595859014ebf0951522d9")},
+          {"TaskingPayload", PlistValue::array({item("Experiments", PlistValue::boolean(false)),
+                                                item("Network", PlistValue::boolean(true))})}};
+}
+
+// The storage controller's entries, then those of the drivers that publish metrics.
+PlistDictionary sampleDrivers(const SampleProfile& profile) {
+  PlistDictionary registry = sampleRegistry(profile.name);
+  PlistArray entries = *registry.get("entries").asArray();
+  for (PlistValue& entry : sampleMetricsEntries()) entries.push_back(std::move(entry));
+  registry.set("entries", PlistValue::array(std::move(entries)));
+  return registry;
+}
+
+// A property list that the sample device begins with.
+struct SampleFile {
+  std::string path;  // as the device sees it
+  PlistDictionary root;
+};
+
+std::vector<SampleFile> sampleFiles(const SampleProfile& profile, DayNumber today) {
+  const auto preferences = [](std::string_view domain) {
+    return "/var/mobile/Library/Preferences/" + std::string(domain) + ".plist";
+  };
+  return {{std::string(kWhitelistPath), sampleWhitelist()},
+          {"/System/Device/answers.plist", sampleAnswers(profile)},
+          {"/System/Device/kernel.plist", sampleKernel()},
+          {"/System/Device/locale.plist", sampleLocale()},
+          {"/System/Device/apps.plist", sampleBundles()},
+          {"/System/Device/registry.plist", sampleDrivers(profile)},
+          {"/System/Device/hub.plist", sampleHub()},
+          {"/System/Device/usage.plist", {{"records", PlistValue::array(sampleUsageRecords(today))}}},
+          {preferences(preference_domain::kLogSubmission),
+           {{"DiagnosticLogSubmissionEnabled", PlistValue::boolean(true)},
+            {"ScheduledTasking", PlistValue::dictionary(sampleTasking())}}},
+          {preferences(preference_domain::kTaskingValues), {{"Experiments", PlistValue::boolean(false)}}},
+          {preferences(preference_domain::kAnalytics), {{"DatabaseCorruptionCount", PlistValue::int32(1)}}}};
+}
+
+// Beside the program in a build tree, in the library folder of an installation.
+fs::path builtSupportLibrary() {
+  std::error_code error;
+  const fs::path program = fs::read_symlink("/proc/self/exe", error);
+  for (const fs::path& place :
+       {program.parent_path() / "FaultdeskSupport",
+        program.parent_path().parent_path() / TBDAILY_SUPPORT_LIBRARY_FOLDER / "FaultdeskSupport"}) {
+    if (fs::exists(place, error)) return place;
+  }
+  return {};
+}
+
+class SampleDevice {
+ public:
+  SampleDevice(LinuxPlatform& platform, const SampleProfile& profile)
+      : platform_(platform), profile_(profile), host_(platform.host()) {}
+
+  Outcome<Nothing> make() {
+    if (const int error = makeFolders(host_.root()); error != 0) {
+      return Failure{host_.root().native() + " cannot be made: " + errorText(error)};
+    }
+    const DayNumber today = platform_.services().analyticsClient.currentDayNumber();
+    const std::vector<SampleFile> files = sampleFiles(profile_, today);
+    const fs::path store = host_.devicePath(analyticsDatabasePath("/var/mobile"));
+    if (const std::string taken = firstTaken(files, store); !taken.empty()) {
+      return Failure{
+          taken + " is already there; a sample device is never made over another one: choose an empty root"};
+    }
+    for (const SampleFile& file : files) {
+      if (auto written = writePlist(file); !written) return written;
+    }
+    if (auto written = writeStackSnapshot(); !written) return written;
+    if (auto placed = placeSupportLibrary(); !placed) return placed;
+    if (const int failure = host_.makeFolders(store.parent_path()); failure != 0)
+      return Failure{store.native() + ": " + errorText(failure)};
+    AnalyticsStore analytics(store);
+    if (auto reason = addSampleHistory(analytics, dayBefore(today))) return Failure{std::move(*reason)};
+    return Nothing{};
+  }
+
+ private:
+  std::string firstTaken(const std::vector<SampleFile>& files, const fs::path& store) const {
+    std::vector<fs::path> places{store, host_.devicePath(kSupportLibrary), host_.devicePath(kStackSnapshot)};
+    for (const SampleFile& file : files) places.push_back(host_.devicePath(file.path));
+    for (const fs::path& place : places) {
+      std::error_code ignored;
+      if (fs::exists(fs::symlink_status(place, ignored))) return place.native();
+    }
+    return {};
+  }
+
+  Outcome<Nothing> writePlist(const SampleFile& file) const {
+    const PlistWriteResult written =
+        platform_.services().propertyListCodec.write(PlistValue::dictionary(file.root));
+    if (!written.ok) return Failure{file.path + ": " + written.error};
+    return writeBytes(file.path, written.bytes);
+  }
+
+  Outcome<Nothing> writeBytes(std::string_view path, std::string_view bytes) const {
+    const fs::path place = host_.devicePath(path);
+    int error = host_.makeFolders(place.parent_path());
+    if (error == 0) error = replaceFile(place, bytes);
+    if (error != 0) return Failure{place.native() + ": " + errorText(error)};
+    return Nothing{};
+  }
+
+  Outcome<Nothing> writeStackSnapshot() const {
+    const PlistData snapshot = sampleStackSnapshot();
+    return writeBytes(kStackSnapshot, {reinterpret_cast<const char*>(snapshot.data()), snapshot.size()});
+  }
+
+  Outcome<Nothing> placeSupportLibrary() const {
+    const fs::path built = builtSupportLibrary();
+    if (built.empty())
+      return Failure{
+          "the support library FaultdeskSupport is missing beside tallyctl; build or install it again"};
+    const fs::path place = host_.devicePath(kSupportLibrary);
+    if (const int error = host_.makeFolders(place.parent_path()); error != 0)
+      return Failure{place.native() + ": " + errorText(error)};
+    std::error_code error;
+    fs::copy_file(built, place, error);
+    if (!error) fs::permissions(place, fs::perms::owner_read | fs::perms::owner_write, error);
+    if (error) return Failure{place.native() + ": " + error.message()};
+    return Nothing{};
+  }
+
+  LinuxPlatform& platform_;
+  const SampleProfile& profile_;
+  const Host& host_;
+};
+
+}  // namespace
+
+Outcome<Nothing> makeSampleDevice(LinuxPlatform& platform, const SampleProfile& profile) {
+  return SampleDevice(platform, profile).make();
+}
+
+}  // namespace tbdaily

@@ -1,0 +1,22 @@
+// A complete sample device in a device root.
+#pragma once
+
+#include <array>
+
+#include "platform/linux/linux_platform.h"
+#include "tools/tallyctl/outcome.h"
+
+namespace tbdaily {
+
+// The controllers that a sample device can have, and the model that carries each.
+struct SampleProfile {
+  const char* name;
+  const char* hardwareModel;
+};
+inline constexpr std::array<SampleProfile, 2> kSampleProfiles = {{{"nvme", "TP9,3"}, {"stx", "TP4,1"}}};
+
+// Whitelist, preferences with submission enabled, recordings of every family, the support library, and
+// yesterday's rows. Fails where any of its files is there already; nothing is overwritten.
+Outcome<Nothing> makeSampleDevice(LinuxPlatform& platform, const SampleProfile& profile);
+
+}  // namespace tbdaily
