@@ -60,29 +60,28 @@ constexpr std::array<Field, 5> kFields = {{
 
 }  // namespace
 
-AppRecords appRecordsForMessage(const PlistValue& value) {
+Outcome<PlistValue> appRecordsForMessage(const PlistValue& value) {
   const PlistArray* records = value.asArray();
-  if (records == nullptr) return {{}, "it is no array of app records"};
+  if (records == nullptr) return Failure{"it is no array of app records"};
   PlistArray elements;
   for (const PlistValue& record : *records) {
     const std::string number = std::to_string(elements.size() + 1);
     const PlistDictionary* given = record.asDictionary();
-    if (given == nullptr) return {{}, "app record " + number + " is no dictionary"};
+    if (given == nullptr) return Failure{"app record " + number + " is no dictionary"};
     PlistDictionary element;
     for (const Field& field : kFields) {
       const PlistValue* found = given->find(field.wireName);
       if (found == nullptr) found = given->find(field.reportName);
       PlistValue converted = found != nullptr ? field.convert(*found) : PlistValue();
       if (converted.isNone()) {
-        return {{},
-                "app record " + number + " needs " + std::string(field.expected) + " as \"" +
-                    std::string(field.wireName) + "\""};
+        return Failure{"app record " + number + " needs " + std::string(field.expected) + " as \"" +
+                       std::string(field.wireName) + "\""};
       }
       element.set(field.wireName, std::move(converted));
     }
     elements.push_back(PlistValue::dictionary(std::move(element)));
   }
-  return {PlistValue::array(std::move(elements)), {}};
+  return PlistValue::array(std::move(elements));
 }
 
 }  // namespace tbdaily

@@ -9,6 +9,7 @@
 #include "platform/diagnostics.h"
 #include "platform/driver_registry.h"
 #include "storage/exporters.h"
+#include "tools/tallyctl/outcome.h"
 
 namespace tbdaily {
 
@@ -27,11 +28,6 @@ inline constexpr BufferKind kBufferKinds[] = {
     {"snapshot-header", &NandExporter::snapshotHeaderSelectors},
 };
 
-struct ControllerBuffer {
-  std::vector<std::byte> bytes;
-  std::string error;  // one line; empty on success
-};
-
 // The companion says what went wrong in one line of its own; the storage modules' texts are for the job.
 class QuietDiagnostics : public Diagnostics {
   void writeError(std::string_view) override {}
@@ -39,7 +35,7 @@ class QuietDiagnostics : public Diagnostics {
 };
 
 // Asks the controller for its size and fetches it. `kind` is one of kBufferKinds' names.
-ControllerBuffer fetchControllerBuffer(DriverRegistry& registry, std::string_view kind,
-                                       std::uint16_t list = 0);
+Outcome<std::vector<std::byte>> fetchControllerBuffer(DriverRegistry& registry, std::string_view kind,
+                                                      std::uint16_t list = 0);
 
 }  // namespace tbdaily

@@ -12,20 +12,23 @@ namespace tbdaily {
 
 namespace {
 
+using Bytes = std::vector<std::byte>;
+
 // Pipes too, so that the shell's substitutions work.
-InputFile readStream(std::FILE* stream, const std::string& name) {
-  InputFile input;
+Outcome<Bytes> readStream(std::FILE* stream, const std::string& name) {
+  Bytes bytes;
   std::array<std::byte, 65536> chunk;
   while (const std::size_t count = std::fread(chunk.data(), 1, chunk.size(), stream)) {
-    input.bytes.insert(input.bytes.end(), chunk.begin(), chunk.begin() + static_cast<std::ptrdiff_t>(count));
+    bytes.insert(bytes.end(), chunk.begin(), chunk.begin() + static_cast<std::ptrdiff_t>(count));
   }
-  if (std::ferror(stream) != 0) input.error = name + ": " + errorText(errno);
-  return input;
+  if (std::ferror(stream) != 0) return Failure{name + ": " + errorText(errno)};
+  return bytes;
 }
 
-PlistParseResult withFileName(PlistParseResult result, const std::string& path) {
-  if (!result.error.empty()) result.error = path + ": " + result.error;
-  return result;
+template <typename Parsed>
+Outcome<PlistValue> valueOf(Parsed parsed, const std::string& path) {
+  if (!parsed.error.empty()) return Failure{path + ": " + parsed.error};
+  return std::move(parsed.value);
 }
 
 bool looksLikePropertyList(std::string_view text) {
@@ -35,28 +38,27 @@ bool looksLikePropertyList(std::string_view text) {
 
 }  // namespace
 
-InputFile readInput(const std::string& path) {
+Outcome<Bytes> readInput(const std::string& path) {
   if (path == "-") return readStream(stdin, "standard input");
   std::FILE* file = std::fopen(path.c_str(), "re");
-  if (file == nullptr) return {{}, path + ": " + errorText(errno)};
-  InputFile input = readStream(file, path);
+  if (file == nullptr) return Failure{path + ": " + errorText(errno)};
+  Outcome<Bytes> bytes = readStream(file, path);
   std::fclose(file);
-  return input;
+  return bytes;
 }
 
-PlistParseResult readPlistFile(PropertyListCodec& codec, const std::string& path) {
-  const InputFile input = readInput(path);
-  if (!input.error.empty()) return {{}, input.error};
-  return withFileName(codec.parse(input.bytes), path);
+Outcome<PlistValue> readPlistFile(PropertyListCodec& codec, const std::string& path) {
+  const auto bytes = readInput(path);
+  if (!bytes) return Failure{bytes.reason()};
+  return valueOf(codec.parse(*bytes), path);
 }
 
-PlistParseResult readPlistOrJsonFile(PropertyListCodec& codec, const std::string& path) {
-  const InputFile input = readInput(path);
-  if (!input.error.empty()) return {{}, input.error};
-  const std::string_view text(reinterpret_cast<const char*>(input.bytes.data()), input.bytes.size());
-  if (looksLikePropertyList(text)) return withFileName(codec.parse(input.bytes), path);
-  PlistJsonResult json = plistFromJson(text);
-  return withFileName({std::move(json.value), std::move(json.error)}, path);
+Outcome<PlistValue> readPlistOrJsonFile(PropertyListCodec& codec, const std::string& path) {
+  const auto bytes = readInput(path);
+  if (!bytes) return Failure{bytes.reason()};
+  const std::string_view text(reinterpret_cast<const char*>(bytes->data()), bytes->size());
+  if (looksLikePropertyList(text)) return valueOf(codec.parse(*bytes), path);
+  return valueOf(plistFromJson(text), path);
 }
 
 }  // namespace tbdaily

@@ -123,14 +123,14 @@ std::string whyNothing(const CapturedLog& log, DayNumber day) {
 
 }  // namespace
 
-ReportPreview previewReport(LinuxPlatform& linux, std::optional<DayNumber> day) {
+Outcome<PlistValue> previewReport(LinuxPlatform& linux, std::optional<DayNumber> day) {
   Platform& real = linux.services();
   const std::string* home = real.analyticsHome.find().path;
   const std::string storePath = home != nullptr ? analyticsDatabasePath(*home) : "";
   const StoreCopy copy(home != nullptr ? linux.host().devicePath(storePath) : std::filesystem::path());
-  if (!copy.error().empty()) return {{}, copy.error()};
+  if (!copy.error().empty()) return Failure{copy.error()};
   if (const std::string fault = checkpointCopy(copy, linux.host().devicePath(storePath)); !fault.empty())
-    return {{}, fault};
+    return Failure{fault};
 
   CapturedLog log;
   ReadOnlyPreferences preferences(real.preferences);
@@ -142,9 +142,10 @@ ReportPreview previewReport(LinuxPlatform& linux, std::optional<DayNumber> day) 
 
   const DayNumber wanted = day ? *day : dayBefore(real.analyticsClient.currentDayNumber());
   TBReport(preview, storeProbes(preview)).writeLogForYesterdayWithAppInfo(wanted, PlistValue());
-  if (submission.output.bytes.empty()) return {{}, whyNothing(log, wanted)};
+  if (submission.output.bytes.empty()) return Failure{whyNothing(log, wanted)};
   PlistParseResult parsed = real.propertyListCodec.parse(submission.output.bytes);
-  return {std::move(parsed.value), std::move(parsed.error)};
+  if (!parsed.error.empty()) return Failure{std::move(parsed.error)};
+  return std::move(parsed.value);
 }
 
 }  // namespace tbdaily

@@ -8,17 +8,13 @@
 #include "platform/analytics_client.h"
 #include "platform/linux/linux_platform.h"
 #include "platform/plist_value.h"
+#include "tools/tallyctl/outcome.h"
 
 namespace tbdaily {
-
-struct ReportPreview {
-  PlistValue root;    // none when no report would be written
-  std::string error;  // why that is, in one line
-};
 
 // Builds the report of the day (default: yesterday) as the next run would write it at this moment. Every file
 // of the device root stays as it is: the analytics store is read from a copy, and preferences, logs and
 // notifications go nowhere.
-ReportPreview previewReport(LinuxPlatform& platform, std::optional<DayNumber> day);
+Outcome<PlistValue> previewReport(LinuxPlatform& platform, std::optional<DayNumber> day);
 
 }  // namespace tbdaily

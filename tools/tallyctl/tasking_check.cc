@@ -11,7 +11,7 @@ namespace {
 
 constexpr std::array<std::string_view, 3> kEntries = {"TaskingID", "TaskingDigest", "TaskingPayload"};
 
-std::string itemFault(const PlistValue& element) {
+std::optional<std::string> itemFault(const PlistValue& element) {
   if (element.asDictionary() == nullptr) return "is no dictionary";
   const PlistValue domain = element.get("Domain");
   const PlistValue key = element.get("Key");
@@ -21,30 +21,30 @@ std::string itemFault(const PlistValue& element) {
   }
   if (!key.asString() || key.asString()->empty()) return "has no text as \"Key\"";
   if (element.get("Value").isNone()) return "has no \"Value\"";
-  return {};
+  return std::nullopt;
 }
 
 }  // namespace
 
-std::string taskingFault(const PlistValue& tasking) {
+Outcome<Nothing> checkTasking(const PlistValue& tasking) {
   const PlistDictionary* root = tasking.asDictionary();
-  if (root == nullptr) return "a tasking is a dictionary";
+  if (root == nullptr) return Failure{"a tasking is a dictionary"};
   const PlistValue id = root->get("TaskingID");
-  if (!id.asString() || id.asString()->empty()) return "a tasking needs a text as \"TaskingID\"";
+  if (!id.asString() || id.asString()->empty()) return Failure{"a tasking needs a text as \"TaskingID\""};
   for (const auto& [name, value] : *root) {
     if (std::find(kEntries.begin(), kEntries.end(), name) == kEntries.end()) {
-      return "a tasking has no entry \"" + name +
-             "\"; it has \"TaskingID\", \"TaskingDigest\" and \"TaskingPayload\"";
+      return Failure{"a tasking has no entry \"" + name +
+                     "\"; it has \"TaskingID\", \"TaskingDigest\" and \"TaskingPayload\""};
     }
   }
   const PlistValue* payload = root->find("TaskingPayload");
-  if (payload == nullptr) return {};
-  if (payload->asArray() == nullptr) return "\"TaskingPayload\" is an array of items";
+  if (payload == nullptr) return Nothing{};
+  if (payload->asArray() == nullptr) return Failure{"\"TaskingPayload\" is an array of items"};
   for (std::size_t i = 0; i < payload->asArray()->size(); ++i) {
-    const std::string fault = itemFault((*payload->asArray())[i]);
-    if (!fault.empty()) return "item " + std::to_string(i + 1) + " of the payload " + fault;
+    if (const auto fault = itemFault((*payload->asArray())[i]))
+      return Failure{"item " + std::to_string(i + 1) + " of the payload " + *fault};
   }
-  return {};
+  return Nothing{};
 }
 
 }  // namespace tbdaily

@@ -1,13 +1,12 @@
 // Whether a tasking is well-formed.
 #pragma once
 
-#include <string>
-
 #include "platform/plist_value.h"
+#include "tools/tallyctl/outcome.h"
 
 namespace tbdaily {
 
-// Why the job would ignore the tasking or a part of it, in one line; empty when it is well-formed.
-std::string taskingFault(const PlistValue& tasking);
+// Fails for a tasking that the job would ignore, whole or in part.
+Outcome<Nothing> checkTasking(const PlistValue& tasking);
 
 }  // namespace tbdaily

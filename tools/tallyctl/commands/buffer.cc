@@ -18,32 +18,30 @@ namespace {
 // From the file when one is named, else from the controller; says why not, and answers nothing then.
 std::optional<std::vector<std::byte>> bufferOf(Tool& tool, const std::string& file, std::string_view kind) {
   if (!file.empty()) {
-    InputFile input = readInput(file);
-    if (input.error.empty()) return std::move(input.bytes);
-    tool.fail(input.error);
+    auto input = readInput(file);
+    if (input) return std::move(*input);
+    tool.fail(input.reason());
     return std::nullopt;
   }
-  ControllerBuffer buffer = fetchControllerBuffer(tool.platform().services().driverRegistry, kind);
-  if (buffer.error.empty()) return std::move(buffer.bytes);
-  tool.fail(buffer.error);
+  auto buffer = fetchControllerBuffer(tool.platform().services().driverRegistry, kind);
+  if (buffer) return std::move(*buffer);
+  tool.fail(buffer.reason());
   return std::nullopt;
 }
 
 void saveBuffer(Tool& tool, const std::string& kind, std::uint16_t list, const std::string& file) {
   if (!tool.hasUsableRoot()) return;
-  const ControllerBuffer buffer =
-      fetchControllerBuffer(tool.platform().services().driverRegistry, kind, list);
-  if (!buffer.error.empty()) return tool.fail(kind + ": " + buffer.error);
+  const auto buffer = fetchControllerBuffer(tool.platform().services().driverRegistry, kind, list);
+  if (!buffer) return tool.fail(kind + ": " + buffer.reason());
   const std::filesystem::path place = std::filesystem::absolute(file);
-  const int error =
-      replaceFile(place, {reinterpret_cast<const char*>(buffer.bytes.data()), buffer.bytes.size()});
+  const int error = replaceFile(place, {reinterpret_cast<const char*>(buffer->data()), buffer->size()});
   if (error != 0) return tool.fail(file + ": " + errorText(error));
   if (tool.printedAsJson(PlistValue::dictionary(
           {{"file", PlistValue::string(file)},
-           {"bytes", PlistValue::int64(static_cast<std::int64_t>(buffer.bytes.size()))}}))) {
+           {"bytes", PlistValue::int64(static_cast<std::int64_t>(buffer->size()))}}))) {
     return;
   }
-  tool.out().line("wrote " + std::to_string(buffer.bytes.size()) + " bytes to " + file);
+  tool.out().line("wrote " + std::to_string(buffer->size()) + " bytes to " + file);
 }
 
 struct ContextField {
@@ -155,11 +153,9 @@ void showSnapshots(Tool& tool, const SnapshotArguments& arguments) {
   }
   // Records of a file go with the header that is named; those of the controller with its own, where it has
   // one.
-  const ControllerBuffer own =
-      arguments.records.empty()
-          ? fetchControllerBuffer(tool.platform().services().driverRegistry, "snapshot-header")
-          : ControllerBuffer{};
-  own.bytes.empty() ? renderFixed(tool, *records) : renderDescribed(tool, *records, own.bytes);
+  if (!arguments.records.empty()) return renderFixed(tool, *records);
+  const auto own = fetchControllerBuffer(tool.platform().services().driverRegistry, "snapshot-header");
+  own && !own->empty() ? renderDescribed(tool, *records, *own) : renderFixed(tool, *records);
 }
 
 }  // namespace

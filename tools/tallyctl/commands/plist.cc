@@ -11,10 +11,10 @@ namespace {
 
 void printPlist(Tool& tool, const std::string& path) {
   PropertyListCodec& codec = tool.platform().services().propertyListCodec;
-  const PlistParseResult parsed = readPlistFile(codec, path);
-  if (!parsed.error.empty()) return tool.fail(parsed.error);
-  if (tool.printedAsJson(parsed.value)) return;
-  const PlistWriteResult written = codec.write(parsed.value, PlistForm::Exact);
+  const auto value = readPlistFile(codec, path);
+  if (!value) return tool.fail(value.reason());
+  if (tool.printedAsJson(*value)) return;
+  const PlistWriteResult written = codec.write(*value, PlistForm::Exact);
   if (!written.ok) return tool.fail(path + ": " + written.error);
   tool.out().print(written.bytes);
 }

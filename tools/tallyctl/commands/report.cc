@@ -68,16 +68,14 @@ void showFile(Tool& tool, std::string file) {
                        "; run tbdaily -f, or look at what it would write with --preview");
     }
   }
-  const PlistParseResult parsed = readPlistFile(tool.platform().services().propertyListCodec, file);
-  if (!parsed.error.empty()) return tool.fail(parsed.error);
-  show(tool, parsed.value);
+  const auto report = readPlistFile(tool.platform().services().propertyListCodec, file);
+  report ? show(tool, *report) : tool.fail(report.reason());
 }
 
 void showPreview(Tool& tool, std::optional<DayNumber> day) {
   if (!tool.hasUsableRoot()) return;
-  const ReportPreview preview = previewReport(tool.platform(), day);
-  if (!preview.error.empty()) return tool.fail(preview.error);
-  show(tool, preview.root);
+  const auto preview = previewReport(tool.platform(), day);
+  preview ? show(tool, *preview) : tool.fail(preview.reason());
 }
 
 }  // namespace

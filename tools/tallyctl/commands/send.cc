@@ -61,11 +61,11 @@ void sendMessage(Tool& tool, Operation operation, const PlistDictionary& fields)
 }
 
 void sendAppInfo(Tool& tool, const std::string& path) {
-  const PlistParseResult parsed = readPlistOrJsonFile(tool.platform().services().propertyListCodec, path);
-  if (!parsed.error.empty()) return tool.fail(parsed.error);
-  const AppRecords records = appRecordsForMessage(parsed.value);
-  if (!records.error.empty()) return tool.fail(path + ": " + records.error);
-  sendMessage(tool, Operation::ActivatedAppInfo, {{"app_data", records.elements}});
+  const auto given = readPlistOrJsonFile(tool.platform().services().propertyListCodec, path);
+  if (!given) return tool.fail(given.reason());
+  const auto records = appRecordsForMessage(*given);
+  if (!records) return tool.fail(path + ": " + records.reason());
+  sendMessage(tool, Operation::ActivatedAppInfo, {{"app_data", *records}});
 }
 
 }  // namespace

@@ -134,11 +134,10 @@ void storeScheduled(Tool& tool, const PlistValue& tasking) {
 
 void schedule(Tool& tool, const std::string& path) {
   if (!tool.hasUsableRoot()) return;
-  const PlistParseResult parsed = readPlistOrJsonFile(tool.platform().services().propertyListCodec, path);
-  if (!parsed.error.empty()) return tool.fail(parsed.error);
-  const std::string fault = taskingFault(parsed.value);
-  if (!fault.empty()) return tool.fail(path + ": " + fault);
-  storeScheduled(tool, parsed.value);
+  const auto tasking = readPlistOrJsonFile(tool.platform().services().propertyListCodec, path);
+  if (!tasking) return tool.fail(tasking.reason());
+  if (const auto checked = checkTasking(*tasking); !checked) return tool.fail(path + ": " + checked.reason());
+  storeScheduled(tool, *tasking);
 }
 
 }  // namespace
