@@ -31,9 +31,4 @@ class StackSnapshot {
   virtual std::unique_ptr<StackSnapshotConfiguration> createConfiguration() = 0;
 };
 
-class AbsentStackSnapshot : public StackSnapshot {
- public:
-  std::unique_ptr<StackSnapshotConfiguration> createConfiguration() override { return nullptr; }
-};
-
 }  // namespace tbdaily

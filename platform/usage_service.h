@@ -44,19 +44,4 @@ class UsageService {
   virtual std::unique_ptr<UsageWorkspace> createWorkspace() = 0;  // null on failure
 };
 
-class AbsentUsageService : public UsageService {
- public:
-  std::unique_ptr<UsageWorkspace> createWorkspace() override { return std::make_unique<Workspace>(); }
-
- private:
-  class Feed : public UsageFeed {
-   public:
-    void requestUsageToDate(std::span<const std::string>, UsageNameKind, UsageReplyHandler) override {}
-  };
-  class Workspace : public UsageWorkspace {
-   public:
-    std::unique_ptr<UsageFeed> createFeed() override { return std::make_unique<Feed>(); }
-  };
-};
-
 }  // namespace tbdaily

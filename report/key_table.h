@@ -30,9 +30,6 @@ class KeyTable {
   // The first prefix in table order with which the key begins; costs the length of the key.
   std::optional<Found> firstPrefixOf(std::string_view key) const;
 
-  const PlistDictionary& entries() const { return entries_; }
-  std::uint32_t groupAt(std::size_t position) const { return groups_[position]; }
-
  private:
   Found foundAt(std::size_t position) const;
 

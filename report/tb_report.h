@@ -25,6 +25,7 @@ class TBReport {
   // report. `appInfo` is an array of AppInfoRecord, or none.
   void writeLogForYesterdayWithAppInfo(DayNumber day, const PlistValue& appInfo);
 
+ private:
   // Rounds the value as the options say, stores it under the key and returns it.
   std::int64_t addScalarForKeyWithOptions(std::int64_t value, std::string_view key,
                                           const PlistDictionary& options);
@@ -44,12 +45,6 @@ class TBReport {
   // Writes what was gathered, unless that is nothing. From here on the report answers no key.
   void serializeWithDateAndAppInfo(DayNumber day, const PlistValue& appInfo);
 
-  const PlistDictionary& scalarsOutput() const { return _scalarsOutput; }
-  const PlistDictionary& distributionsOutput() const { return _distributionsOutput; }
-  const PlistDictionary& histogramsOutput() const { return _histogramsOutput; }
-  const PlistDictionary& metadataOutput() const { return _metadataOutput; }
-
- private:
   void readHistory(DayNumber day);
   const PlistDictionary* scalarOptions(std::string_view key) const;
   PlistDictionary rootDictionary(DayNumber day, const PlistValue& appInfo,

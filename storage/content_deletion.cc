@@ -9,9 +9,8 @@
 
 namespace tbdaily {
 
-bool NandRecommendsContentDeletion(DriverRegistry& registry, Diagnostics& diagnostics,
-                                   NandExporterTable exporters) {
-  const StorageService service(registry, exporters);
+bool NandRecommendsContentDeletion(DriverRegistry& registry, Diagnostics& diagnostics) {
+  const StorageService service(registry);
   const std::uint32_t method = service.descriptor().recommendationMethod;
   if (method == kNoMethod) return false;
   if (!service) {

@@ -9,7 +9,6 @@ namespace tbdaily {
 
 // False too when there is no controller, when it has no such query (nothing is said then) and when it does
 // not answer; troubles are told on standard error.
-bool NandRecommendsContentDeletion(DriverRegistry& registry, Diagnostics& diagnostics,
-                                   NandExporterTable exporters = nand_exporters);
+bool NandRecommendsContentDeletion(DriverRegistry& registry, Diagnostics& diagnostics);
 
 }  // namespace tbdaily

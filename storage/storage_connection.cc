@@ -125,16 +125,15 @@ bool FetchStatsContext(DriverRegistry& registry, const NandExporter*& descriptor
   return connection && fetchAndParse(connection, *descriptor, context, diagnostics);
 }
 
-FetchedStats::FetchedStats(DriverRegistry& registry, Diagnostics& diagnostics, NandExporterTable exporters)
-    : fetched_(FetchStatsContext(registry, descriptor_, context_, diagnostics, exporters)) {}
+FetchedStats::FetchedStats(DriverRegistry& registry, Diagnostics& diagnostics)
+    : fetched_(FetchStatsContext(registry, descriptor_, context_, diagnostics)) {}
 
 FetchedStats::~FetchedStats() {
   if (descriptor_->releaseContext != nullptr) descriptor_->releaseContext(context_);
 }
 
-KdHandle FlashConnect(DriverRegistry& registry, const NandExporter*& descriptor, Diagnostics& diagnostics,
-                      NandExporterTable exporters) {
-  const StorageService service(registry, exporters);
+KdHandle FlashConnect(DriverRegistry& registry, const NandExporter*& descriptor, Diagnostics& diagnostics) {
+  const StorageService service(registry);
   descriptor = &service.descriptor();
   if (!service) {
     diagnostics.error("No class found");
@@ -154,16 +153,15 @@ void FlashDisconnect(DriverRegistry& registry, KdHandle connection, Diagnostics&
     diagnostics.error("closing connection to service failed\n");
 }
 
-bool openSTXConnection(DriverRegistry& registry, StxConnection& connection, Diagnostics& diagnostics,
-                       NandExporterTable exporters) {
-  connection.service = findNandExporter(registry, connection.descriptor, exporters);
+bool openSTXConnection(DriverRegistry& registry, StxConnection& connection, Diagnostics& diagnostics) {
+  connection.service = findNandExporter(registry, connection.descriptor, nand_exporters);
   if (connection.service == 0) {
     diagnostics.error("Can't get STX Connection, no matching service!\n");
     closeSTXConnection(registry, connection);
     return false;
   }
   // Looks the service up again, so the descriptor may be another one by now.
-  connection.connection = FlashConnect(registry, connection.descriptor, diagnostics, exporters);
+  connection.connection = FlashConnect(registry, connection.descriptor, diagnostics);
   if (connection.connection == 0 || connection.descriptor->statsSelectors != STXGetStatsSelectors) {
     diagnostics.error("Can't get STX Connection!\n");
     closeSTXConnection(registry, connection);

@@ -98,8 +98,7 @@ bool FetchStatsContext(DriverRegistry& registry, const NandExporter*& descriptor
 // fetch succeeded or not.
 class FetchedStats {
  public:
-  explicit FetchedStats(DriverRegistry& registry, Diagnostics& diagnostics,
-                        NandExporterTable exporters = nand_exporters);
+  FetchedStats(DriverRegistry& registry, Diagnostics& diagnostics);
   ~FetchedStats();
   FetchedStats(const FetchedStats&) = delete;
   FetchedStats& operator=(const FetchedStats&) = delete;
@@ -115,8 +114,7 @@ class FetchedStats {
 
 // A connection by hand, for callers that keep it open: 0, or a handle that FlashDisconnect closes. Writes the
 // descriptor as findNandExporter does.
-KdHandle FlashConnect(DriverRegistry& registry, const NandExporter*& descriptor, Diagnostics& diagnostics,
-                      NandExporterTable exporters = nand_exporters);
+KdHandle FlashConnect(DriverRegistry& registry, const NandExporter*& descriptor, Diagnostics& diagnostics);
 void FlashDisconnect(DriverRegistry& registry, KdHandle connection, Diagnostics& diagnostics);
 
 // Service and connection by hand. Zero handles mean none.
@@ -127,8 +125,7 @@ struct StxConnection {
 };
 
 // Fills a record that holds nothing. False, and nothing held, when there is no controller of this family.
-bool openSTXConnection(DriverRegistry& registry, StxConnection& connection, Diagnostics& diagnostics,
-                       NandExporterTable exporters = nand_exporters);
+bool openSTXConnection(DriverRegistry& registry, StxConnection& connection, Diagnostics& diagnostics);
 // Closes and releases what the record holds, and zeroes the handles.
 void closeSTXConnection(DriverRegistry& registry, StxConnection& connection);
 

@@ -39,10 +39,9 @@ constexpr std::array<ListKind, 3> kListKinds = {{
 }};
 
 // Zeros when the statistics cannot be had.
-WriteAmplification currentWriteAmplification(Platform& platform, Diagnostics& diagnostics,
-                                             NandExporterTable exporters) {
-  const std::unique_ptr<FetchedStats> stats(
-      new (std::nothrow) FetchedStats(platform.driverRegistry, diagnostics, exporters));
+WriteAmplification currentWriteAmplification(Platform& platform, Diagnostics& diagnostics) {
+  const std::unique_ptr<FetchedStats> stats(new (std::nothrow)
+                                                FetchedStats(platform.driverRegistry, diagnostics));
   if (stats == nullptr) {
     diagnostics.error("not enough memory?");
     return {};
@@ -50,9 +49,9 @@ WriteAmplification currentWriteAmplification(Platform& platform, Diagnostics& di
   return *stats ? computeWriteAmplification(stats->context()) : WriteAmplification{};
 }
 
-void updateState(Platform& platform, Diagnostics& diagnostics, NandExporterTable exporters) {
+void updateState(Platform& platform, Diagnostics& diagnostics) {
   StorageLogState& state = gStorageLogState;
-  const WriteAmplification amplification = currentWriteAmplification(platform, diagnostics, exporters);
+  const WriteAmplification amplification = currentWriteAmplification(platform, diagnostics);
   state.gCurrentUserWamp = amplification.user;
   state.gCurrentSysWamp = amplification.system;
   state.gNeedValidityList =
@@ -132,10 +131,9 @@ class ListCollection {
 
 }  // namespace
 
-bool DumpStorageStructuredLog(Platform& platform, bool extended, Diagnostics& diagnostics,
-                              NandExporterTable exporters) {
-  updateState(platform, diagnostics, exporters);
-  const StorageService service(platform.driverRegistry, exporters);
+bool DumpStorageStructuredLog(Platform& platform, bool extended, Diagnostics& diagnostics) {
+  updateState(platform, diagnostics);
+  const StorageService service(platform.driverRegistry);
   if (!service) {
     diagnostics.error("Could not get matching KdKit service for exporting classes\n");
     return false;

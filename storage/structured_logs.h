@@ -28,8 +28,7 @@ extern StorageLogState gStorageLogState;
 // Computes the write amplification, then fetches the band statistics, three telemetry lists and the defects
 // list and hands each to its handler. True when every list that was fetched was handled. `extended` sets a
 // flag of each request whose meaning is the controller's. Troubles are told on standard error.
-bool DumpStorageStructuredLog(Platform& platform, bool extended, Diagnostics& diagnostics,
-                              NandExporterTable exporters = nand_exporters);
+bool DumpStorageStructuredLog(Platform& platform, bool extended, Diagnostics& diagnostics);
 
 // One list as it was fetched. Bytes between what the driver filled and the size that it announced read as 0.
 struct FetchedList {
