@@ -74,6 +74,12 @@ TEST_F(TBReportTest, CarriesTheWhitelistedRowsOfTwoDaysTheLaterOneWinning) {
   EXPECT_TRUE(fake_.systemLog.has("debug: Treating key d as a histogram"));
 }
 
+TEST_F(TBReportTest, IsWrittenOnceAndAnswersNoKeyAfterwards) {
+  TBReport report(fake_.platform, {[] { return 1; }, [] { return 7; }});
+  for (int i = 0; i < 2; ++i) report.writeLogForYesterdayWithAppInfo(kDay, PlistValue());
+  EXPECT_EQ(fake_.logSubmission.logs.size(), 1U);
+}
+
 TEST_F(TBReportTest, HasExactlyTheRootEntriesWithSubstitutesForWhatIsAbsent) {
   fake_.kernel.now = PlistDate::fromUnixSeconds(1795597624.25);
   const PlistDictionary root = write();
@@ -144,20 +150,25 @@ TEST_F(TBReportTest, MeasuresOnlyWhatIsAllowedAndCarriesTaskingAndAppInfoAsTheyS
 }
 
 TEST_F(TBReportTest, MeasuresTheSystem) {
-  const PlistDictionary measured = {{"k", number(1)},
-                                    {"com.velmora.homedeck.numThirdPartyApps", number(2)},
-                                    {"com.velmora.sysmetrics.tbkd.database.size", number(1)},
-                                    {"com.velmora.sysmetrics.tbkd.database.corruptions", number(7)},
-                                    {"com.velmora.usage.cur_boot_session_cpu_uptime", number(2500)},
-                                    {"com.velmora.kernel.memorystatus_freeze_count", number(4294967295)},
-                                    {"com.velmora.kernel.memorystatus_freeze_pageouts", number(-1)},
-                                    {"com.velmora.kernel.swapusage", number(0x0101010101010101)}};
+  const PlistDictionary measured = {
+      {"k", number(1)},
+      {"com.velmora.homedeck.numThirdPartyApps", number(2)},
+      {"com.velmora.sysmetrics.tbkd.database.size", number(1)},
+      {"com.velmora.sysmetrics.tbkd.database.corruptions", number(7)},
+      {"com.velmora.usage.cur_boot_session_cpu_uptime", number(2500)},
+      {"com.velmora.kernel.memorystatus_freeze_count", number(4294967295)},
+      {"com.velmora.kernel.memorystatus_freeze_pageouts", number(0x0202020202020202)},
+      {"com.velmora.kernel.memorystatus_freeze_budget_pages_remaining", number(0x0303030303030303)},
+      {"com.velmora.kernel.memorystatus_thaw_count", number(-1)},
+      {"com.velmora.kernel.swapusage", number(0x0101010101010101)}};
   allow(keysOf(measured));
   fake_.appRegistry.bundleTypes = {"User", "System", "User"};
   fake_.fileSystem.sizes["/var/mobile/Library/Tallybook/TBDataStore.sqlitedb"] = 1048576;
   fake_.kernel.ticks = 3600000000000;
   fake_.kernel.ratio = Timebase{125, 3};
   fake_.kernel.sysctls["kern.memorystatus_freeze_count"] = PlistData(4, std::byte{0xff});
+  fake_.kernel.sysctls["kern.memorystatus_freeze_pageouts"] = PlistData(8, std::byte{0x02});
+  fake_.kernel.sysctls["kern.memorystatus_freeze_budget_pages_remaining"] = PlistData(8, std::byte{0x03});
   fake_.kernel.sysctls["vm.swapusage"] = PlistData(32, std::byte{0x01});
   EXPECT_EQ(write().get("TBScalars"), dict(measured));
   fake_.kernel.ratio = Timebase{1, 0};

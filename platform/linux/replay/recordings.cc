@@ -7,7 +7,7 @@
 namespace tbdaily {
 
 std::filesystem::path Recordings::path(std::string_view file) const {
-  return host_.devicePath("/System/Device") / file;
+  return host_.devicePath(recording::kFolder) / file;
 }
 
 PlistValue Recordings::load(std::string_view file) {

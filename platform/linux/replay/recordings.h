@@ -39,6 +39,7 @@ class Recordings {
 };
 
 namespace recording {
+inline constexpr std::string_view kFolder = "/System/Device";
 inline constexpr std::string_view kClock = "clock.plist";
 inline constexpr std::string_view kAnswers = "answers.plist";
 inline constexpr std::string_view kKernel = "kernel.plist";

@@ -8,6 +8,7 @@
 #include "platform/analytics_home.h"
 #include "platform/linux/file_io.h"
 #include "platform/linux/host_notes.h"
+#include "platform/linux/replay/recordings.h"
 #include "platform/linux/store/analytics_store.h"
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
@@ -26,7 +27,9 @@ namespace {
 constexpr std::string_view kSupportLibrary =
     "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
 
-constexpr std::string_view kStackSnapshot = "/System/Device/snapshot.kcdata";
+std::string recordingPath(std::string_view file) {
+  return std::string(recording::kFolder).append("/").append(file);
+}
 
 PlistValue text(std::string_view t) {
   return PlistValue::string(std::string(t));
@@ -113,13 +116,13 @@ std::vector<SampleFile> sampleFiles(const SampleProfile& profile, DayNumber toda
     return "/var/mobile/Library/Preferences/" + std::string(domain) + ".plist";
   };
   return {{std::string(kWhitelistPath), sampleWhitelist()},
-          {"/System/Device/answers.plist", sampleAnswers(profile)},
-          {"/System/Device/kernel.plist", sampleKernel()},
-          {"/System/Device/locale.plist", sampleLocale()},
-          {"/System/Device/apps.plist", sampleBundles()},
-          {"/System/Device/registry.plist", sampleDrivers(profile)},
-          {"/System/Device/hub.plist", sampleHub()},
-          {"/System/Device/usage.plist", {{"records", PlistValue::array(sampleUsageRecords(today))}}},
+          {recordingPath(recording::kAnswers), sampleAnswers(profile)},
+          {recordingPath(recording::kKernel), sampleKernel()},
+          {recordingPath(recording::kLocale), sampleLocale()},
+          {recordingPath(recording::kApps), sampleBundles()},
+          {recordingPath(recording::kRegistry), sampleDrivers(profile)},
+          {recordingPath(recording::kHub), sampleHub()},
+          {recordingPath(recording::kUsage), {{"records", PlistValue::array(sampleUsageRecords(today))}}},
           {preferences(preference_domain::kLogSubmission),
            {{"DiagnosticLogSubmissionEnabled", PlistValue::boolean(true)},
             {"ScheduledTasking", PlistValue::dictionary(sampleTasking())}}},
@@ -169,7 +172,8 @@ class SampleDevice {
 
  private:
   std::string firstTaken(const std::vector<SampleFile>& files, const fs::path& store) const {
-    std::vector<fs::path> places{store, host_.devicePath(kSupportLibrary), host_.devicePath(kStackSnapshot)};
+    std::vector<fs::path> places{store, host_.devicePath(kSupportLibrary),
+                                 host_.devicePath(recordingPath(recording::kStackSnapshot))};
     for (const SampleFile& file : files) places.push_back(host_.devicePath(file.path));
     for (const fs::path& place : places) {
       std::error_code ignored;
@@ -195,7 +199,8 @@ class SampleDevice {
 
   Outcome<Nothing> writeStackSnapshot() const {
     const PlistData snapshot = sampleStackSnapshot();
-    return writeBytes(kStackSnapshot, {reinterpret_cast<const char*>(snapshot.data()), snapshot.size()});
+    return writeBytes(recordingPath(recording::kStackSnapshot),
+                      {reinterpret_cast<const char*>(snapshot.data()), snapshot.size()});
   }
 
   Outcome<Nothing> placeSupportLibrary() const {
