@@ -12,7 +12,6 @@ namespace {
 namespace fs = std::filesystem;
 using namespace std::string_literals;
 using testing::bundleTypes;
-using testing::joined;
 using testing::TestPlatform;
 
 TEST(LinuxAppRegistryTest, CountsTheApplicationsAmongTheDesktopEntries) {
