@@ -9,7 +9,7 @@
 
 #include "platform/linux/store/analytics_store.h"
 #include "platform/linux/store/sqlite_analytics_history.h"
-#include "platform/platform_with.h"
+#include "platform/platform.h"
 #include "platform/plist/codec.h"
 #include "report/distribution_summary.h"
 #include "report/internal_device.h"

@@ -4,7 +4,7 @@
 
 #include <vector>
 
-#include "platform/platform_with.h"
+#include "platform/platform.h"
 #include "storage/nand_info.h"
 #include "storage/stats_context.h"
 #include "storage/stats_table.h"
@@ -63,7 +63,7 @@ void telemetryList(benchmark::State& state) {
                               {"num-bus", PlistValue::int64(channels)}});
   for (auto _ : state) {
     const FetchedList list{bytes, bytes.size(), characteristics, "VelmoraEmbeddedNVMeController"};
-    benchmark::DoNotOptimize(HandleTelemetryList(platform, list, platform.diagnostics));
+    benchmark::DoNotOptimize(HandleTelemetryList(platform, list));
   }
   state.SetBytesProcessed(state.iterations() * static_cast<std::int64_t>(bytes.size()));
 }

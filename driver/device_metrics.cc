@@ -66,15 +66,15 @@ void CollectDiskUsage(Platform& platform) {
   platform.analyticsClient.setValuesForScalarKeys(figures);
 }
 
-PlistDictionary currentNANDInfo(Platform& platform, Diagnostics& diagnostics) {
-  PlistDictionary info = CopyNANDInfo(platform, diagnostics);
+PlistDictionary currentNANDInfo(Platform& platform) {
+  PlistDictionary info = CopyNANDInfo(platform);
   if (info.empty()) return info;
   for (const auto& [key, value] : CopyVMFreezerNANDInfo(platform)) info.set(key, value);
   return info;
 }
 
 void CollectNANDInfo(Platform& platform) {
-  const PlistDictionary info = currentNANDInfo(platform, platform.diagnostics);
+  const PlistDictionary info = currentNANDInfo(platform);
   if (info.empty()) {
     platform.systemLog.message(LogLevel::Default, "failed to get NAND info dict");
     return;
@@ -112,7 +112,7 @@ void CollectECCEvents(Platform& platform) {
 
 void CollectDailyDeviceMetrics(Platform& platform) {
   CollectDiskUsage(platform);
-  DumpStorageStructuredLog(platform, false, platform.diagnostics);
+  DumpStorageStructuredLog(platform, false);
   CollectNANDInfo(platform);
   CollectECCEvents(platform);
   CollectDataUsage(platform);

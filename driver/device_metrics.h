@@ -19,6 +19,6 @@ void CollectNANDInfo(Platform& platform);
 void CollectECCEvents(Platform& platform);
 
 // The NAND info of the moment with the freezer's entries merged in, as the daily run records it.
-PlistDictionary currentNANDInfo(Platform& platform, Diagnostics& diagnostics);
+PlistDictionary currentNANDInfo(Platform& platform);
 
 }  // namespace tbdaily

@@ -18,7 +18,7 @@ constexpr std::int64_t kOther = 0x200 << 16;
 // Identifier, type and, unless null, name of each channel.
 using Channels = std::vector<std::tuple<std::int64_t, std::int64_t, const char*>>;
 
-testing::FakeDriver driverWith(std::uint64_t identifier, const Channels& channels) {
+testing::ScriptedDriver driverWith(std::uint64_t identifier, const Channels& channels) {
   PlistArray entries;
   for (const auto& [channel, type, name] : channels) {
     PlistArray entry{PlistValue::int64(channel), PlistValue::int64(type)};

@@ -11,8 +11,6 @@ EnvironmentProbeCache gEnvironmentProbeCache;
 
 namespace {
 
-constexpr std::string_view kSupportLibrary =
-    "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
 constexpr const char* kCorruptionCountKey = "DatabaseCorruptionCount";
 constexpr const char* kCorruptionCountDomain = "com.velmora.tallyd";
 constexpr std::int64_t kBytesPerMiB = 1048576;
@@ -42,7 +40,7 @@ std::int64_t GetDatabaseSizeMB(Platform& platform) {
 }
 
 void LinkPreferenceFunctions(Platform& platform) {
-  const LibraryHandle library = platform.dynamicLoader.open(kSupportLibrary);
+  const LibraryHandle library = platform.dynamicLoader.open(kSupportLibraryPath);
   if (library == nullptr) {
     platform.systemLog.message(LogLevel::Error, "Failed to dynamically load the FaultdeskSupport framework");
     return;

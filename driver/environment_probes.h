@@ -6,11 +6,16 @@
 
 #include <cstdint>
 #include <string>
+#include <string_view>
 
 #include "platform/platform.h"
 #include "report/store_probes.h"
 
 namespace tbdaily {
+
+// The library whose functions count how often the store was found damaged.
+inline constexpr std::string_view kSupportLibraryPath =
+    "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
 
 // The functions that are bound at run time: the integer value of a key in a domain (the out-flag may be
 // null), and its setting.

@@ -2,7 +2,7 @@
 
 #include <gmock/gmock.h>
 
-#include "platform/platform_with.h"
+#include "platform/platform.h"
 #include "testing/fake_platform.h"
 
 namespace tbdaily {
@@ -55,8 +55,7 @@ TEST_F(EnvironmentProbesTest, AMissingContainerIsLookedUpAgain) {
 
 TEST_F(EnvironmentProbesTest, TheCorruptionCountIsTakenThroughTheBoundFunctions) {
   EXPECT_EQ(TakeDatabaseCorruptionCount(fake_.platform), 0);
-  fake_.dynamicLoader.library =
-      "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
+  fake_.dynamicLoader.library = std::string(kSupportLibraryPath);
   fake_.dynamicLoader.symbols["SMXPreferencesGetIntegerValue"] = reinterpret_cast<void*>(&getCount);
   EXPECT_EQ(TakeDatabaseCorruptionCount(fake_.platform), 0);
   fake_.dynamicLoader.symbols["SMXPreferencesSetValue"] = reinterpret_cast<void*>(&setCount);

@@ -6,7 +6,7 @@
 namespace kdreport {
 namespace {
 
-using testing::channelOf, testing::channelsIn, testing::channelType, testing::FakeDriver;
+using testing::channelOf, testing::channelsIn, testing::channelType, testing::ScriptedDriver;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 
@@ -24,7 +24,7 @@ PlistValue group(const char* name, const char* subGroup, PlistArray channels) {
   return PlistValue::dictionary(fields);
 }
 
-FakeDriver driver(std::uint64_t identifier, const char* name, PlistValue legend) {
+ScriptedDriver driver(std::uint64_t identifier, const char* name, PlistValue legend) {
   PlistDictionary properties{{"KdReportLegendPublic", PlistValue::boolean(true)}};
   properties.set("KdReportLegend", std::move(legend));
   return {.identifier = identifier,

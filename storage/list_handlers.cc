@@ -88,7 +88,8 @@ PlistDictionary defectRecord(std::span<const std::byte> entry, std::string_view 
 
 }  // namespace
 
-bool HandleValidityList(Platform& platform, const FetchedList& list, Diagnostics& diagnostics) {
+bool HandleValidityList(Platform& platform, const FetchedList& list) {
+  Diagnostics& diagnostics = platform.diagnostics;
   if (!gStorageLogState.gNeedValidityList) return true;
   const std::uint32_t count = wordAt(list.filled, 0);
   const std::uint32_t skipped = wordAt(list.filled, kWord);
@@ -102,13 +103,14 @@ bool HandleValidityList(Platform& platform, const FetchedList& list, Diagnostics
   SetNumberValue(values, "IntermediateWamp", PlistNumber::float64(gStorageLogState.gCurrentSysWamp),
                  diagnostics);
   SetNumberValue(values, "UserWamp", PlistNumber::float64(gStorageLogState.gCurrentUserWamp), diagnostics);
-  DumpNANDInfo(platform, values, diagnostics);
+  DumpNANDInfo(platform, values);
   addValidityLists(list.filled, kValidityHeader + kValiditySkippedWord * std::size_t{skipped}, count, values);
   NLW_WriteLog(platform, "165", &values);
   return true;
 }
 
-bool HandleDefectsList(Platform& platform, const FetchedList& list, Diagnostics& diagnostics) {
+bool HandleDefectsList(Platform& platform, const FetchedList& list) {
+  Diagnostics& diagnostics = platform.diagnostics;
   PlistDictionary summary;
   SetNumberValue(summary, "Factory Count", number32(wordAt(list.filled, kWord)), diagnostics);
   if (const auto number = list.characteristics.get("nand-device-desc").asNumber()) {

@@ -166,10 +166,10 @@ class NandInfoBuilder {
 
 }  // namespace
 
-PlistDictionary CopyNANDInfo(Platform& platform, Diagnostics& diagnostics) {
-  const FetchedStats stats(platform.driverRegistry, diagnostics);
+PlistDictionary CopyNANDInfo(Platform& platform) {
+  const FetchedStats stats(platform.driverRegistry, platform.diagnostics);
   if (!stats) return errorInfo("Unable to parse buffer");
-  return NandInfoFromContext(platform.preferences, stats.context(), false, diagnostics)
+  return NandInfoFromContext(platform.preferences, stats.context(), false, platform.diagnostics)
       .value_or(PlistDictionary());
 }
 
@@ -186,10 +186,10 @@ std::optional<PlistDictionary> NandInfoFromContext(PreferencesStore& preferences
   return builder.take();
 }
 
-void DumpNANDInfo(Platform& platform, PlistDictionary& target, Diagnostics& diagnostics) {
-  const FetchedStats stats(platform.driverRegistry, diagnostics);
+void DumpNANDInfo(Platform& platform, PlistDictionary& target) {
+  const FetchedStats stats(platform.driverRegistry, platform.diagnostics);
   if (!stats) return;
-  const auto info = NandInfoFromContext(platform.preferences, stats.context(), true, diagnostics);
+  const auto info = NandInfoFromContext(platform.preferences, stats.context(), true, platform.diagnostics);
   if (!info) return;
   for (const auto& [key, value] : *info) CopyDictionary(key, value, target);
 }

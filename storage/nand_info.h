@@ -25,7 +25,7 @@ inline constexpr std::array<std::string_view, 5> kNANDInfoReadsBeforeErasureKeys
 
 // Fetches the controller afresh. When that fails, two entries only: kNANDInfoErrorKey (the string "1") and
 // kNANDInfoErrorMessageKey.
-PlistDictionary CopyNANDInfo(Platform& platform, Diagnostics& diagnostics);
+PlistDictionary CopyNANDInfo(Platform& platform);
 
 // The dictionary of a parsed buffer. The log variant has no version and demo-mode entries, and is none for a
 // context without an export version, which otherwise gives the two error entries. Unsigned values are stored
@@ -34,7 +34,7 @@ std::optional<PlistDictionary> NandInfoFromContext(PreferencesStore& preferences
                                                    bool logVariant, Diagnostics& diagnostics);
 
 // Fetches the controller and merges the log variant into the target; nothing when the fetch fails.
-void DumpNANDInfo(Platform& platform, PlistDictionary& target, Diagnostics& diagnostics);
+void DumpNANDInfo(Platform& platform, PlistDictionary& target);
 
 // Sets one entry of a dictionary; for each entry of another.
 void CopyDictionary(std::string_view key, const PlistValue& value, PlistDictionary& target);

@@ -117,18 +117,17 @@ TEST(NandInfo, DerivesItsOwnValues) {
 
 TEST(NandInfo, IsCopiedFromTheControllerAndMergedIntoALog) {
   FakePlatform fake;
-  testing::FakeDiagnostics said;
   testing::ScriptedController controller(fake.driverRegistry, "STXStorage");
   controller.buffers[13] = full().bytes;
   for (const auto& [demo, number] : {std::pair(PlistValue::boolean(true), 1), {PlistValue::int32(1), 0}}) {
     fake.preferences.setValue("StoreDemoMode", demo, preference_domain::kDemoSettings);
-    EXPECT_EQ(under(CopyNANDInfo(fake.platform, said), "DemoMode"), PlistValue::int64(number));
+    EXPECT_EQ(under(CopyNANDInfo(fake.platform), "DemoMode"), PlistValue::int64(number));
   }
   PlistDictionary log = {{"UserWamp", PlistValue::float64(1)}};
-  DumpNANDInfo(fake.platform, log, said);
+  DumpNANDInfo(fake.platform, log);
   controller.buffers[13] = full().word(~0ULL).bytes;
-  EXPECT_EQ(CopyNANDInfo(fake.platform, said), errorInfo("Unable to parse buffer"));
-  DumpNANDInfo(fake.platform, log, said);
+  EXPECT_EQ(CopyNANDInfo(fake.platform), errorInfo("Unable to parse buffer"));
+  DumpNANDInfo(fake.platform, log);
   EXPECT_EQ(log.size(), 26U);
 }
 

@@ -5,7 +5,7 @@
 #include <cstdlib>
 
 #include "platform/calendar.h"
-#include "platform/platform_with.h"
+#include "platform/platform.h"
 #include "testing/fake_platform.h"
 
 namespace tbdaily {

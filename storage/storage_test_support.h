@@ -33,8 +33,9 @@ class StatsBuffer {
 struct ScriptedController {
   ScriptedController(FakeDriverRegistry& registry, const char* serviceClass) {
     registry.drivers.emplace_back().serviceClass = serviceClass;
-    registry.structMethod = [this](const FakeDriver&, std::uint32_t method, std::span<const std::byte> input,
-                                   std::span<std::byte> output, std::size_t& size) {
+    registry.structMethod = [this](const ScriptedDriver&, std::uint32_t method,
+                                   std::span<const std::byte> input, std::span<std::byte> output,
+                                   std::size_t& size) {
       methods.push_back(method);
       requests.emplace_back(input.begin(), input.end());
       const ByteReader reader(input);

@@ -15,7 +15,7 @@ StorageLogState gStorageLogState;
 
 namespace {
 
-using ListHandler = bool (*)(Platform&, const FetchedList&, Diagnostics&);
+using ListHandler = bool (*)(Platform&, const FetchedList&);
 
 // A list that is fetched, and what handles it. `unsupported` is said, once, when the controller cannot serve
 // the list.
@@ -39,19 +39,19 @@ constexpr std::array<ListKind, 3> kListKinds = {{
 }};
 
 // Zeros when the statistics cannot be had.
-WriteAmplification currentWriteAmplification(Platform& platform, Diagnostics& diagnostics) {
+WriteAmplification currentWriteAmplification(Platform& platform) {
   const std::unique_ptr<FetchedStats> stats(new (std::nothrow)
-                                                FetchedStats(platform.driverRegistry, diagnostics));
+                                                FetchedStats(platform.driverRegistry, platform.diagnostics));
   if (stats == nullptr) {
-    diagnostics.error("not enough memory?");
+    platform.diagnostics.error("not enough memory?");
     return {};
   }
   return *stats ? computeWriteAmplification(stats->context()) : WriteAmplification{};
 }
 
-void updateState(Platform& platform, Diagnostics& diagnostics) {
+void updateState(Platform& platform) {
   StorageLogState& state = gStorageLogState;
-  const WriteAmplification amplification = currentWriteAmplification(platform, diagnostics);
+  const WriteAmplification amplification = currentWriteAmplification(platform);
   state.gCurrentUserWamp = amplification.user;
   state.gCurrentSysWamp = amplification.system;
   state.gNeedValidityList =
@@ -76,18 +76,17 @@ std::vector<SelectorFunctionEntry> selectorFunctions(const NandExporter& descrip
 class ListCollection {
  public:
   ListCollection(Platform& platform, const StorageService& service, const StorageConnection& connection,
-                 PlistValue characteristics, bool extended, Diagnostics& diagnostics)
+                 PlistValue characteristics, bool extended)
       : platform_(platform),
         descriptor_(service.descriptor()),
         connection_(connection),
         characteristics_(std::move(characteristics)),
-        extended_(extended),
-        diagnostics_(diagnostics) {}
+        extended_(extended) {}
 
   bool run() {
     bool result = true;
     int index = 0;
-    for (const SelectorFunctionEntry& entry : selectorFunctions(descriptor_, diagnostics_)) {
+    for (const SelectorFunctionEntry& entry : selectorFunctions(descriptor_, platform_.diagnostics)) {
       result = collect(entry, index++) && result;
     }
     return result;
@@ -102,23 +101,22 @@ class ListCollection {
     const StxRequest query = StxRequest::sizeQuery(*selectors, options);
     std::uint32_t size = 0;
     if (const KdStatus status = connection_.querySize(&query, size); status != kKdSuccess) {
-      diagnostics_.error("KdConnectCallStructMethod failed with status 0x%x on selector index %d\n",
-                         static_cast<unsigned>(status), index);
+      platform_.diagnostics.error("KdConnectCallStructMethod failed with status 0x%x on selector index %d\n",
+                                  static_cast<unsigned>(status), index);
       return true;
     }
     if (size == 0) return true;
     StorageBuffer buffer(size);
     if (!buffer) {
-      diagnostics_.error("Could not malloc %zd bytes", static_cast<ssize_t>(size));
+      platform_.diagnostics.error("Could not malloc %zd bytes", static_cast<ssize_t>(size));
       return false;
     }
     const StxRequest fetch = StxRequest::dataFetch(*selectors, options);
     if (connection_.fetch(&fetch, buffer) != kKdSuccess) {
-      diagnostics_.error("Could not retrieve data from driver for selector %u\n", fetch.command);
+      platform_.diagnostics.error("Could not retrieve data from driver for selector %u\n", fetch.command);
       return true;
     }
-    return entry.handler(platform_, {buffer.filled(), size, characteristics_, descriptor_.className},
-                         diagnostics_);
+    return entry.handler(platform_, {buffer.filled(), size, characteristics_, descriptor_.className});
   }
 
   Platform& platform_;
@@ -126,13 +124,13 @@ class ListCollection {
   const StorageConnection& connection_;
   const PlistValue characteristics_;
   const bool extended_;
-  Diagnostics& diagnostics_;
 };
 
 }  // namespace
 
-bool DumpStorageStructuredLog(Platform& platform, bool extended, Diagnostics& diagnostics) {
-  updateState(platform, diagnostics);
+bool DumpStorageStructuredLog(Platform& platform, bool extended) {
+  Diagnostics& diagnostics = platform.diagnostics;
+  updateState(platform);
   const StorageService service(platform.driverRegistry);
   if (!service) {
     diagnostics.error("Could not get matching KdKit service for exporting classes\n");
@@ -147,8 +145,7 @@ bool DumpStorageStructuredLog(Platform& platform, bool extended, Diagnostics& di
     diagnostics.error("failed to create dictionary");
     return false;
   }
-  return ListCollection(platform, service, connection, std::move(characteristics), extended, diagnostics)
-      .run();
+  return ListCollection(platform, service, connection, std::move(characteristics), extended).run();
 }
 
 }  // namespace tbdaily

@@ -27,8 +27,9 @@ extern StorageLogState gStorageLogState;
 
 // Computes the write amplification, then fetches the band statistics, three telemetry lists and the defects
 // list and hands each to its handler. True when every list that was fetched was handled. `extended` sets a
-// flag of each request whose meaning is the controller's. Troubles are told on standard error.
-bool DumpStorageStructuredLog(Platform& platform, bool extended, Diagnostics& diagnostics);
+// flag of each request whose meaning is the controller's. Troubles are told through the platform's
+// diagnostics.
+bool DumpStorageStructuredLog(Platform& platform, bool extended);
 
 // One list as it was fetched. Bytes between what the driver filled and the size that it announced read as 0.
 struct FetchedList {
@@ -41,10 +42,10 @@ struct FetchedList {
 // Each answers whether the list could be handled.
 // Band statistics: the NAND text log with the validity lists and the NAND info, when gNeedValidityList says
 // so.
-bool HandleValidityList(Platform& platform, const FetchedList& list, Diagnostics& diagnostics);
+bool HandleValidityList(Platform& platform, const FetchedList& list);
 // One record of each NAND channel.
-bool HandleTelemetryList(Platform& platform, const FetchedList& list, Diagnostics& diagnostics);
+bool HandleTelemetryList(Platform& platform, const FetchedList& list);
 // One record with the factory count, and one of each defect.
-bool HandleDefectsList(Platform& platform, const FetchedList& list, Diagnostics& diagnostics);
+bool HandleDefectsList(Platform& platform, const FetchedList& list);
 
 }  // namespace tbdaily

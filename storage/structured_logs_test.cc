@@ -55,12 +55,12 @@ class StructuredLogsTest : public ::testing::Test {
                       const char* className = kNvme) {
     diagnostics.errors.clear();
     const FetchedList list{bytes, bytes.size(), std::move(properties), className};
-    return (handler(fake.platform, list, diagnostics) ? "accepted. " : "refused. ") + diagnostics.errors;
+    return (handler(fake.platform, list) ? "accepted. " : "refused. ") + diagnostics.errors;
   }
   const std::vector<std::pair<int, PlistDictionary>>& logs() { return fake.logSubmission.structured; }
 
   testing::FakePlatform fake;
-  testing::FakeDiagnostics diagnostics;
+  testing::FakeDiagnostics& diagnostics = fake.diagnostics;
 };
 
 TEST(WriteAmplification, CountsErasedUnitsForEachUnitWritten) {
@@ -106,7 +106,7 @@ TEST_F(StructuredLogsTest, ValidityListsAreCollectedByIndexOrRefused) {
   const auto good =
       words({4, 1, 77, 77, 0, 2, 11, 0, 0, 0, 0, 12, 0, 0, 0, 2, 0xFFFFFFFF, 0, 0, 0, 16, 5, 0, 0});
   fake.kernel.now = PlistDate::fromUnixSeconds(1795597624);
-  EXPECT_TRUE(HandleValidityList(fake.platform, {good, good.size(), {}, kNvme}, diagnostics));
+  EXPECT_TRUE(HandleValidityList(fake.platform, {good, good.size(), {}, kNvme}));
   ASSERT_EQ(fake.logSubmission.logs.size(), 1U);
   EXPECT_EQ(fake.logSubmission.logs[0].type, "165");
   const std::string& log = fake.logSubmission.logs[0].bytes;
@@ -175,12 +175,12 @@ TEST_F(StructuredLogsTest, EveryListIsFetchedWhateverBecameOfTheOthers) {
   testing::ScriptedController controller(fake.driverRegistry, kNvme);
   controller.buffers[17] = telemetry(1);
   controller.buffers[15] = words({0, 1, 0});
-  EXPECT_FALSE(DumpStorageStructuredLog(fake.platform, true, diagnostics));
+  EXPECT_FALSE(DumpStorageStructuredLog(fake.platform, true));
   EXPECT_EQ(diagnostics.errors, "failed to create dictionary");
   fake.driverRegistry.drivers[0].properties.set("Controller Characteristics",
                                                 PlistValue::dictionary(characteristics(1)));
   controller.requests.clear();
-  EXPECT_TRUE(DumpStorageStructuredLog(fake.platform, true, diagnostics));
+  EXPECT_TRUE(DumpStorageStructuredLog(fake.platform, true));
   EXPECT_EQ(logs().size(), 4U);  // three telemetry lists and the defects
   std::vector<std::pair<int, int>> codesAndFlags;
   for (const auto& request : controller.requests) {
@@ -191,15 +191,15 @@ TEST_F(StructuredLogsTest, EveryListIsFetchedWhateverBecameOfTheOthers) {
                           std::pair{17, 2}, std::pair{17, 7}, std::pair{17, 6}, std::pair{17, 11},
                           std::pair{17, 10}, std::pair{15, 3}, std::pair{15, 2}));
   controller.sizeStatus = kKdBadArgument;
-  EXPECT_TRUE(DumpStorageStructuredLog(fake.platform, false, diagnostics));
+  EXPECT_TRUE(DumpStorageStructuredLog(fake.platform, false));
   controller.sizeStatus = 0;
   controller.dataStatus = kKdBadArgument;
-  EXPECT_TRUE(DumpStorageStructuredLog(fake.platform, false, diagnostics));
+  EXPECT_TRUE(DumpStorageStructuredLog(fake.platform, false));
   for (const char* error : {"KdConnectCallStructMethod failed with status 0xe00002c2 on selector index 4\n",
                             "Could not retrieve data from driver for selector 17\n"})
     EXPECT_THAT(diagnostics.errors, HasSubstr(error));
   fake.driverRegistry.drivers.clear();
-  EXPECT_FALSE(DumpStorageStructuredLog(fake.platform, false, diagnostics));
+  EXPECT_FALSE(DumpStorageStructuredLog(fake.platform, false));
   EXPECT_FALSE(gStorageLogState.gNeedValidityList);
 }
 

@@ -118,7 +118,8 @@ void copyFilled(std::span<const std::byte> filled, std::size_t offset, std::arra
 
 }  // namespace
 
-bool HandleTelemetryList(Platform& platform, const FetchedList& list, Diagnostics& diagnostics) {
+bool HandleTelemetryList(Platform& platform, const FetchedList& list) {
+  Diagnostics& diagnostics = platform.diagnostics;
   const std::unique_ptr<NandCounterRecord> record(new (std::nothrow) NandCounterRecord);
   if (record == nullptr) {
     diagnostics.error("ERROR: Could not malloc %lu bytes\n",

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "platform/byte_reader.h"
+#include "platform/hexadecimal.h"
 #include "storage/vendor_counter_copies.h"
 
 namespace tbdaily {
@@ -40,12 +41,10 @@ char lowerCase(char c) {
   return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
 }
 
-unsigned hexDigit(char character, Diagnostics& diagnostics) {
-  const char c = lowerCase(character);
-  if (c >= '0' && c <= '9') return static_cast<unsigned>(c - '0');
-  if (c >= 'a' && c <= 'f') return static_cast<unsigned>(c - 'a' + 10);
-  diagnostics.output("unrecognized hex character: %c", c);
-  return 0;
+unsigned hexDigit(char c, Diagnostics& diagnostics) {
+  const auto digit = hexadecimalDigit(c);
+  if (!digit) diagnostics.output("unrecognized hex character: %c", lowerCase(c));
+  return digit.value_or(0);
 }
 
 }  // namespace

@@ -2,6 +2,9 @@
 // `Platform& services`.
 #pragma once
 
+#include <chrono>
+#include <thread>
+
 #include "testing/analytics_lines.h"
 #include "testing/contract_test.h"
 

@@ -6,7 +6,7 @@
 #include <cmath>
 #include <limits>
 
-#include "testing/fake_platform.h"  // for the interfaces of all families
+#include "platform/families.h"
 
 namespace tbdaily::testing {
 

@@ -16,35 +16,27 @@
 #include "platform/driver_registry.h"
 #include "platform/stack_snapshot.h"
 #include "platform/usage_service.h"
+#include "testing/scripted_driver.h"
 
 namespace tbdaily::testing {
-
-struct FakeDriver {
-  std::optional<std::uint64_t> identifier;  // without one, or without a name, that query fails
-  std::optional<std::string> name;
-  std::string serviceClass;
-  PlistDictionary properties;
-  std::optional<std::uint64_t> parent;  // the identifier of another driver
-  std::uint32_t retainCount = 1;
-};
 
 // A matching description matches on the class, or, with "KdPropertyMatch", on properties that equal every
 // value in it.
 class FakeDriverRegistry : public DriverRegistry {
  public:
-  std::vector<FakeDriver> drivers;  // in the order in which they are found
+  std::vector<ScriptedDriver> drivers;  // in the order in which they are found
   bool iteratorsAreValid = true;
   KdStatus openStatus = kKdSuccess, closeStatus = kKdSuccess;
   // The user clients' answers; without one a call is a bad argument. Outputs as in DriverRegistry.
-  std::function<KdStatus(const FakeDriver&, std::uint32_t method, std::span<const std::byte> input,
+  std::function<KdStatus(const ScriptedDriver&, std::uint32_t method, std::span<const std::byte> input,
                          std::span<std::byte> output, std::size_t& outputSize)>
       structMethod;
-  std::function<KdStatus(const FakeDriver&, std::uint32_t method, std::span<const std::uint64_t> inputs,
+  std::function<KdStatus(const ScriptedDriver&, std::uint32_t method, std::span<const std::uint64_t> inputs,
                          std::span<std::uint64_t> outputs, std::size_t& outputCount)>
       scalarMethod;
-  std::function<KdStatus(const FakeDriver&, std::uint32_t method, const KdMethodInput&, KdMethodOutput&)>
+  std::function<KdStatus(const ScriptedDriver&, std::uint32_t method, const KdMethodInput&, KdMethodOutput&)>
       method;
-  std::function<KdStatus(const FakeDriver&, std::uint32_t memoryType, std::span<std::byte>& memory)>
+  std::function<KdStatus(const ScriptedDriver&, std::uint32_t memoryType, std::span<std::byte>& memory)>
       mapMemory;
 
   // Objects that were not released and connections that were not closed; memory that was not unmapped.
@@ -78,32 +70,32 @@ class FakeDriverRegistry : public DriverRegistry {
     return handles_.erase(object) == 1 ? kKdSuccess : kKdBadArgument;
   }
   std::uint32_t KdObjectGetUserRetainCount(KdHandle object) override {
-    const FakeDriver* driver = driverOf(object);
+    const ScriptedDriver* driver = driverOf(object);
     return driver != nullptr ? driver->retainCount : 0;
   }
 
   PlistValue KdRegistryEntryCreateCFProperty(KdHandle entry, std::string_view key) override {
-    const FakeDriver* driver = driverOf(entry);
+    const ScriptedDriver* driver = driverOf(entry);
     return driver != nullptr ? driver->properties.get(key) : PlistValue();
   }
   PlistValue KdRegistryEntrySearchCFProperty(KdHandle entry, KdRegistryPlane, std::string_view key,
                                              KdSearchOptions) override {
-    const FakeDriver* driver = driverOf(entry);
+    const ScriptedDriver* driver = driverOf(entry);
     for (std::size_t steps = 0; driver != nullptr && steps < drivers.size(); ++steps) {
       if (driver->properties.contains(key)) return driver->properties.get(key);
-      const auto parent = std::ranges::find(drivers, driver->parent, &FakeDriver::identifier);
+      const auto parent = std::ranges::find(drivers, driver->parent, &ScriptedDriver::identifier);
       driver = driver->parent && parent != drivers.end() ? &*parent : nullptr;
     }
     return {};
   }
   KdStatus KdRegistryEntryGetRegistryEntryID(KdHandle entry, std::uint64_t& identifier) override {
-    const FakeDriver* driver = driverOf(entry);
+    const ScriptedDriver* driver = driverOf(entry);
     if (driver == nullptr || !driver->identifier) return kKdNotFound;
     identifier = *driver->identifier;
     return kKdSuccess;
   }
   KdStatus KdRegistryEntryGetName(KdHandle entry, std::string& name) override {
-    const FakeDriver* driver = driverOf(entry);
+    const ScriptedDriver* driver = driverOf(entry);
     if (driver == nullptr || !driver->name) return kKdNotFound;
     name = *driver->name;
     return kKdSuccess;
@@ -165,7 +157,7 @@ class FakeDriverRegistry : public DriverRegistry {
     const auto found = handles_.find(handle);
     return found != handles_.end() && found->second.kind == kind ? &found->second : nullptr;
   }
-  const FakeDriver* driverOf(KdHandle object, Kind kind = Kind::Object) {
+  const ScriptedDriver* driverOf(KdHandle object, Kind kind = Kind::Object) {
     const Handle* handle = find(object, kind);
     return handle != nullptr ? &drivers[handle->driver] : nullptr;
   }
@@ -187,7 +179,7 @@ class FakeDriverRegistry : public DriverRegistry {
   }
   template <typename Script, typename... Arguments>
   KdStatus answer(KdHandle connection, const Script& script, Arguments&&... arguments) {
-    const FakeDriver* driver = driverOf(connection, Kind::Connection);
+    const ScriptedDriver* driver = driverOf(connection, Kind::Connection);
     if (driver == nullptr || !script) return kKdBadArgument;
     return script(*driver, std::forward<Arguments>(arguments)...);
   }

@@ -40,7 +40,7 @@ struct FakeSubject : FakePlatform {
   }
   void connectPeer() { serviceListener.addPeer(kPeer); }
   void send(const PlistDictionary& message) { serviceListener.addMessage(kPeer, message); }
-  void setDrivers(std::vector<FakeDriver> drivers) { driverRegistry.drivers = std::move(drivers); }
+  void setDrivers(std::vector<ScriptedDriver> drivers) { driverRegistry.drivers = std::move(drivers); }
   void put(const char* path, const std::string& contents) { fileSystem.files[path] = bytesOf(contents); }
   std::string library() { return "/lib/Support"; }
   std::string symbolName() { return "function"; }

@@ -9,12 +9,13 @@
 //   addBundle(type)
 //   posts(name)                         how many so far
 //   connectPeer(), send(PlistDictionary)  as the peer that connected, once there is a listener
-//   setDrivers(std::vector<FakeDriver>)
+//   setDrivers(std::vector<ScriptedDriver>)
 //   put(path, text), library(), symbolName()  a file; a library that is there and a symbol that it has
 #pragma once
 
 #include "platform/plist_text.h"
 #include "testing/contract_test.h"
+#include "testing/scripted_driver.h"
 
 namespace tbdaily::testing {
 

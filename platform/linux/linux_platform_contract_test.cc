@@ -64,9 +64,9 @@ class LinuxSubject : public TestPlatform {
     appendLittleEndian(bytes, list.size(), 4);
     EXPECT_EQ(writeAll(peer_.get(), bytes + list), 0);
   }
-  void setDrivers(const std::vector<FakeDriver>& drivers) {
+  void setDrivers(const std::vector<ScriptedDriver>& drivers) {
     PlistArray entries;
-    for (const FakeDriver& driver : drivers) {
+    for (const ScriptedDriver& driver : drivers) {
       PlistDictionary entry{{"class", PlistValue::string(driver.serviceClass)},
                             {"properties", PlistValue::dictionary(driver.properties)},
                             {"retainCount", PlistValue::int64(driver.retainCount)},

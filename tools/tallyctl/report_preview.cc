@@ -9,7 +9,7 @@
 #include "platform/linux/store/analytics_store.h"
 #include "platform/linux/store/sqlite_analytics_history.h"
 #include "platform/log_submission.h"
-#include "platform/platform_with.h"
+#include "platform/platform.h"
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
 #include "report/tb_report.h"

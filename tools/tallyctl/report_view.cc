@@ -26,12 +26,6 @@ std::string text(const PlistValue& value) {
   return value.isNone() ? "-" : printable(plistText(value));
 }
 
-std::string sixDigits(double value) {
-  std::array<char, 32> buffer;
-  const int length = std::snprintf(buffer.data(), buffer.size(), "%.6g", value);
-  return {buffer.data(), static_cast<std::size_t>(length)};
-}
-
 void printHeading(Terminal& out, const std::string& heading, std::size_t count) {
   out.line();
   out.line(out.styled(heading + " (" + std::to_string(count) + ")", Style::Heading));

@@ -82,6 +82,12 @@ std::string printable(std::string_view text) {
   return result;
 }
 
+std::string sixDigits(double value) {
+  std::array<char, 32> buffer;
+  const int length = std::snprintf(buffer.data(), buffer.size(), "%.6g", value);
+  return {buffer.data(), static_cast<std::size_t>(length)};
+}
+
 std::size_t columnsOf(std::string_view text) {
   return static_cast<std::size_t>(std::count_if(
       text.begin(), text.end(), [](char c) { return (static_cast<unsigned char>(c) & 0xC0) != 0x80; }));

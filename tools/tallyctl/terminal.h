@@ -36,6 +36,9 @@ class Terminal {
 // Text with control characters, which could drive a terminal, replaced by '?'.
 std::string printable(std::string_view text);
 
+// A number in at most six significant digits, for people.
+std::string sixDigits(double value);
+
 // How many columns UTF-8 text takes, one for each character.
 std::size_t columnsOf(std::string_view text);
 

@@ -2,6 +2,7 @@
 
 #include <sqlite3.h>
 
+#include "platform/hexadecimal.h"
 #include "platform/linux/host_notes.h"
 
 namespace tbdaily {
@@ -13,7 +14,6 @@ constexpr int kPrimaryCode = 0xff;
 constexpr int kLongestValue = 1 << 20;
 
 std::string fileUri(const std::filesystem::path& file, SqliteMode mode) {
-  constexpr std::string_view kHexDigits = "0123456789ABCDEF";
   constexpr std::string_view kPlain = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-._~/";
   std::string uri = "file:";
   for (const char c : file.native()) {
@@ -21,8 +21,8 @@ std::string fileUri(const std::filesystem::path& file, SqliteMode mode) {
       uri += c;
       continue;
     }
-    const auto byte = static_cast<unsigned char>(c);
-    uri.append(1, '%').append(1, kHexDigits[byte >> 4U]).append(1, kHexDigits[byte & 0xFU]);
+    uri += '%';
+    appendHexadecimal(uri, std::as_bytes(std::span(&c, 1)), HexadecimalCase::Upper);
   }
   if (mode == SqliteMode::Immutable) uri += "?immutable=1";
   return uri;

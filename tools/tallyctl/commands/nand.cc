@@ -5,6 +5,8 @@
 #include <vector>
 
 #include "driver/device_metrics.h"
+#include "platform/diagnostics.h"
+#include "platform/platform.h"
 #include "platform/plist_text.h"
 #include "storage/nand_info.h"
 #include "tools/tallyctl/controller_buffer.h"
@@ -54,7 +56,8 @@ void explain(Tool& tool, const std::string& key) {
 void showNand(Tool& tool) {
   if (!tool.hasUsableRoot()) return;
   QuietDiagnostics quiet;
-  const PlistDictionary info = currentNANDInfo(tool.platform().services(), quiet);
+  Platform services = platformWith(tool.platform().services(), quiet);
+  const PlistDictionary info = currentNANDInfo(services);
   if (tool.printedAsJson(PlistValue::dictionary(info))) return;
   if (info.contains(kNANDInfoErrorKey)) {
     return tool.fail("the NAND info cannot be had: " + plistText(info.get(kNANDInfoErrorMessageKey)));

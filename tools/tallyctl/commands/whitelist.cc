@@ -3,7 +3,7 @@
 #include <CLI/CLI.hpp>
 
 #include "platform/file_system.h"
-#include "platform/platform_with.h"
+#include "platform/platform.h"
 #include "platform/plist_text.h"
 #include "platform/property_list_codec.h"
 #include "report/tb_config.h"

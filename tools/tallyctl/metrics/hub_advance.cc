@@ -8,6 +8,7 @@
 
 #include "drivermetrics/kd_report.h"
 #include "tools/tallyctl/metrics/hub_legends.h"
+#include "tools/tallyctl/noise.h"
 
 namespace tbdaily {
 
@@ -33,23 +34,6 @@ struct Element {
   std::uint64_t stamp = 0;
   std::array<std::uint64_t, kElementWords> words{};
   std::size_t wordCount = 0;  // how many are recorded
-};
-
-// Numbers that look like chance and are the same in every run.
-class Noise {
- public:
-  explicit Noise(std::uint64_t seed) : state_(seed) {}
-  std::uint64_t next() {
-    std::uint64_t n = state_ += 0x9E3779B97F4A7C15;
-    n = (n ^ n >> 30) * 0xBF58476D1CE4E5B9;
-    n = (n ^ n >> 27) * 0x94D049BB133111EB;
-    return n ^ n >> 31;
-  }
-  // 0 to limit - 1; the limit is at least 1.
-  std::uint64_t below(std::uint64_t limit) { return next() % limit; }
-
- private:
-  std::uint64_t state_;
 };
 
 void grow(std::uint64_t& value, std::uint64_t by) {

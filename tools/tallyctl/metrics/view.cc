@@ -14,12 +14,6 @@ using namespace kdreport;
 
 namespace {
 
-std::string sixDigits(double value) {
-  std::array<char, 32> buffer;
-  const int length = std::snprintf(buffer.data(), buffer.size(), "%.6g", value);
-  return {buffer.data(), static_cast<std::size_t>(length)};
-}
-
 // With one digit behind the point.
 std::string percentage(double share) {
   if (std::isnan(share)) return "-";

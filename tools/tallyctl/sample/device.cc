@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "driver/daily_tasks.h"
+#include "driver/environment_probes.h"
 #include "platform/analytics_home.h"
 #include "platform/linux/file_io.h"
 #include "platform/linux/host_notes.h"
@@ -23,9 +24,6 @@ namespace tbdaily {
 namespace fs = std::filesystem;
 
 namespace {
-
-constexpr std::string_view kSupportLibrary =
-    "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
 
 std::string recordingPath(std::string_view file) {
   return std::string(recording::kFolder).append("/").append(file);
@@ -172,7 +170,7 @@ class SampleDevice {
 
  private:
   std::string firstTaken(const std::vector<SampleFile>& files, const fs::path& store) const {
-    std::vector<fs::path> places{store, host_.devicePath(kSupportLibrary),
+    std::vector<fs::path> places{store, host_.devicePath(kSupportLibraryPath),
                                  host_.devicePath(recordingPath(recording::kStackSnapshot))};
     for (const SampleFile& file : files) places.push_back(host_.devicePath(file.path));
     for (const fs::path& place : places) {
@@ -208,7 +206,7 @@ class SampleDevice {
     if (built.empty())
       return Failure{
           "the support library FaultdeskSupport is missing beside tallyctl; build or install it again"};
-    const fs::path place = host_.devicePath(kSupportLibrary);
+    const fs::path place = host_.devicePath(kSupportLibraryPath);
     if (const int error = host_.makeFolders(place.parent_path()); error != 0)
       return Failure{place.native() + ": " + errorText(error)};
     std::error_code error;

@@ -7,32 +7,11 @@
 #include <vector>
 
 #include "platform/usage_service.h"
+#include "tools/tallyctl/noise.h"
 
 namespace tbdaily {
 
 namespace {
-
-// A small generator of its own, so that a sample is the same on every machine.
-class Random {
- public:
-  explicit Random(std::uint64_t seed) : state_(seed) {}
-  // From 0 up to but not including 1.
-  double unit() {
-    state_ += 0x9E3779B97F4A7C15U;
-    std::uint64_t z = state_;
-    z = (z ^ (z >> 30)) * 0xBF58476D1CE4E5B9U;
-    z = (z ^ (z >> 27)) * 0x94D049BB133111EBU;
-    return static_cast<double>((z ^ (z >> 31)) >> 11) * 0x1.0p-53;
-  }
-  double between(double low, double high) { return low + unit() * (high - low); }
-  // Bell-shaped around the mean, three standard deviations wide.
-  double around(double mean, double deviation) {
-    return mean + deviation * 2 * (unit() + unit() + unit() - 1.5);
-  }
-
- private:
-  std::uint64_t state_;
-};
 
 constexpr std::array<const char*, 24> kUserApps = {
     "maps",       "chess",   "recipes", "podcasts", "translate", "weather", "banking", "tickets",
@@ -90,14 +69,14 @@ constexpr SampleScalar kScalars[] = {
     {"contacts.lookups", 5, 300},
 };
 
-double draw(Random& random, const SampleDistribution& d) {
+double draw(Noise& noise, const SampleDistribution& d) {
   switch (d.shape) {
     case Shape::Bell:
-      return random.around(d.middle, d.spread);
+      return noise.around(d.middle, d.spread);
     case Shape::Percent:
-      return std::clamp(random.around(d.middle, d.spread), 0.0, 100.0);
+      return std::clamp(noise.around(d.middle, d.spread), 0.0, 100.0);
     case Shape::Decay:
-      return -d.middle * std::log(1 - random.unit());
+      return -d.middle * std::log(1 - noise.unit());
   }
   return 0;
 }
@@ -110,15 +89,15 @@ double measured(double value) {
 class SampleWriter {
  public:
   SampleWriter(AnalyticsStore& store, DayNumber day)
-      : store_(store), day_(day), random_(static_cast<std::uint64_t>(day)) {}
+      : store_(store), day_(day), noise_(static_cast<std::uint64_t>(day)) {}
 
   void scalar(const std::string& key, double low, double high) {
-    keep(store_.setScalar(key, day_, static_cast<std::int64_t>(std::llround(random_.between(low, high)))));
+    keep(store_.setScalar(key, day_, static_cast<std::int64_t>(std::llround(noise_.between(low, high)))));
   }
   void distribution(const std::string& key, const SampleDistribution& d) {
     for (int i = 0; i < d.count && result_.ok(); ++i) {
       const auto second = static_cast<std::int32_t>(kSecondsPerDay * i / d.count);
-      const double value = measured(draw(random_, d));
+      const double value = measured(draw(noise_, d));
       keep(store_.appendDistributionValues(key, day_, second, std::span(&value, 1)));
     }
   }
@@ -132,9 +111,9 @@ class SampleWriter {
       scalar("app.energy." + app.identifier, 1, 900);
       scalar("app.writes." + app.identifier, 0, 1e8);
       if (!app.isUserApp) continue;
-      const auto launches = static_cast<int>(random_.between(1, 60));
+      const auto launches = static_cast<int>(noise_.between(1, 60));
       distribution("app.launchTime." + app.identifier,
-                   {"", launches, Shape::Decay, random_.between(20, 180), 0});
+                   {"", launches, Shape::Decay, noise_.between(20, 180), 0});
     }
   }
   const StoreResult& result() const { return result_; }
@@ -146,7 +125,7 @@ class SampleWriter {
 
   AnalyticsStore& store_;
   DayNumber day_;
-  Random random_;
+  Noise noise_;
   StoreResult result_;
 };
 
@@ -164,16 +143,16 @@ PlistArray sampleUsageRecords(DayNumber day) {
   constexpr std::array<const char*, 8> kDaemons = {"mailsyncd", "updated", "pushd", "timesyncd",
                                                    "mapsd",     "cloudd",  "dnsd",  "backupd"};
   constexpr DayNumber kDaysSinceBoot = 3;
-  Random random(static_cast<std::uint64_t>(day) + 1);
+  Noise noise(static_cast<std::uint64_t>(day) + 1);
   PlistArray records;
   const auto add = [&](const char* nameKey, const std::string& name, double scale, DayNumber since) {
     const auto bytes = [&](double low, double high) {
-      return PlistValue::int64(std::llround(random.between(low, high) * scale));
+      return PlistValue::int64(std::llround(noise.between(low, high) * scale));
     };
     records.push_back(PlistValue::dictionary(
         {{nameKey, PlistValue::string(name)},
          {std::string(kUsageSinceTimeKey),
-          PlistValue(PlistDate{dateOf(since).secondsSinceReference + measured(random.between(0, 86399))})},
+          PlistValue(PlistDate{dateOf(since).secondsSinceReference + measured(noise.between(0, 86399))})},
          {"wifiInBytes", bytes(1e5, 4e8)},
          {"wifiOutBytes", bytes(1e4, 3e7)},
          {"wwanInBytes", bytes(0, 9e7)},
@@ -182,7 +161,7 @@ PlistArray sampleUsageRecords(DayNumber day) {
   // Apps restart now and then; daemons have counted since the device was started.
   for (const SampleApp& app : sampleApps()) {
     if (app.isUserApp)
-      add("bundleName", app.identifier, 1, day - static_cast<DayNumber>(random.between(0, 2)));
+      add("bundleName", app.identifier, 1, day - static_cast<DayNumber>(noise.between(0, 2)));
   }
   for (const char* daemon : kDaemons) add("procName", daemon, 0.2, day - kDaysSinceBoot);
   return records;
