@@ -30,6 +30,15 @@ function(tbdaily_library name)
   target_link_libraries(tbdaily_${name} PUBLIC ${ARG_DEPENDS} PRIVATE tbdaily_options)
   # Before the folders that a surrounding project gives to all its targets.
   target_include_directories(tbdaily_${name} BEFORE PUBLIC ${PROJECT_SOURCE_DIR})
+  # What nearly every file includes is read once. Not by clang, which finds the files that forget to include it.
+  if(CMAKE_CXX_COMPILER_ID STREQUAL GNU)
+    if(name STREQUAL platform)
+      target_precompile_headers(tbdaily_platform PRIVATE <algorithm> <array> <cmath> <functional> <limits> <memory> <optional> <span>
+        <string> <string_view> <utility> <vector> ${PROJECT_SOURCE_DIR}/platform/plist_value.h)
+    else()
+      target_precompile_headers(tbdaily_${name} REUSE_FROM tbdaily_platform)
+    endif()
+  endif()
 endfunction()
 
 # tbdaily_test(NAME SOURCES ... DEPENDS ...): a unit-test program that links the library under test, those below it, the fakes
