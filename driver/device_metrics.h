@@ -1,14 +1,13 @@
 // The device's health and usage figures of the moment, as analytics scalars and structured data logs.
 #pragma once
 
-#include "platform/diagnostics.h"
 #include "platform/platform.h"
 #include "platform/plist_value.h"
 
 namespace tbdaily {
 
 // A step of the daily run: disk usage, storage telemetry, NAND info with the freezer's writes, kernel ECC
-// events, network usage. Each part runs whatever became of the others, and nothing that it meets stops the
+// events, network usage, driver metrics. Each part runs whatever became of the others, and nothing that it meets stops the
 // daily run. Main thread only.
 void CollectDailyDeviceMetrics(Platform& platform);
 
