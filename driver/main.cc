@@ -3,7 +3,7 @@
 #include <string>
 
 #include "driver/entry.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 #include "platform/linux/linux_platform.h"
 
 int main(int argc, char** argv) {

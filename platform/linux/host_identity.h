@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "platform/linux/host.h"
+#include "platform/linux/base/host.h"
 
 namespace tbdaily {
 

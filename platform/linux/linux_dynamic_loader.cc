@@ -7,7 +7,7 @@
 #include <cerrno>
 #include <string>
 
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 

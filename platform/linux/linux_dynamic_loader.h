@@ -2,7 +2,7 @@
 #pragma once
 
 #include "platform/dynamic_loader.h"
-#include "platform/linux/host.h"
+#include "platform/linux/base/host.h"
 
 namespace tbdaily {
 

@@ -4,8 +4,8 @@
 
 #include <cerrno>
 
-#include "platform/linux/file_io.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 

@@ -2,7 +2,7 @@
 #pragma once
 
 #include "platform/file_system.h"
-#include "platform/linux/host.h"
+#include "platform/linux/base/host.h"
 
 namespace tbdaily {
 

@@ -9,7 +9,7 @@
 #include <limits>
 
 #include "platform/byte_writer.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 

@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <filesystem>
 
-#include "platform/linux/host.h"
+#include "platform/linux/base/host.h"
 #include "platform/notifications.h"
 
 namespace tbdaily {

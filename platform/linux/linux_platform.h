@@ -3,7 +3,7 @@
 
 #include <memory>
 
-#include "platform/linux/host.h"
+#include "platform/linux/base/host.h"
 #include "platform/platform.h"
 
 namespace tbdaily {

@@ -8,7 +8,7 @@
 #include <unordered_map>
 #include <vector>
 
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 

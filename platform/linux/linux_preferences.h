@@ -9,9 +9,9 @@
 #include <mutex>
 #include <string>
 
-#include "platform/linux/cached_plist_file.h"
-#include "platform/linux/file_io.h"
-#include "platform/linux/host.h"
+#include "platform/linux/base/cached_plist_file.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host.h"
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
 

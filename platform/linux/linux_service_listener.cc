@@ -12,7 +12,7 @@
 #include <thread>
 
 #include "platform/byte_reader.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 #include "platform/linux/unix_socket.h"
 
 namespace tbdaily {

@@ -10,8 +10,8 @@
 #include <map>
 #include <vector>
 
-#include "platform/linux/file_io.h"
-#include "platform/linux/host.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host.h"
 #include "platform/property_list_codec.h"
 #include "platform/service_listener.h"
 

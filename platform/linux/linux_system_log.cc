@@ -8,7 +8,7 @@
 #include <cstdlib>
 
 #include "platform/calendar.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 

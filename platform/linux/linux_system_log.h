@@ -8,8 +8,8 @@
 
 #include "platform/device_answers.h"
 #include "platform/kernel.h"
-#include "platform/linux/file_io.h"
-#include "platform/linux/host.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host.h"
 #include "platform/system_log.h"
 
 namespace tbdaily {

@@ -9,8 +9,8 @@
 #include <vector>
 
 #include "platform/calendar.h"
-#include "platform/linux/file_io.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host_notes.h"
 #include "platform/plist/json.h"
 
 namespace tbdaily {

@@ -7,8 +7,8 @@
 #include <string>
 #include <string_view>
 
-#include "platform/linux/file_io.h"
-#include "platform/linux/host.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host.h"
 #include "platform/log_submission.h"
 #include "platform/property_list_codec.h"
 

@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/linux/host.h"
+#include "platform/linux/base/host.h"
 
 namespace tbdaily {
 

@@ -3,7 +3,7 @@
 
 #include <filesystem>
 
-#include "platform/linux/file_io.h"
+#include "platform/linux/base/file_io.h"
 
 namespace tbdaily {
 

@@ -5,7 +5,7 @@
 #include <cstdio>
 #include <string_view>
 
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 #include "platform/plist/json.h"
 
 namespace tbdaily {

@@ -9,7 +9,7 @@
 #include <system_error>
 #include <vector>
 
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 

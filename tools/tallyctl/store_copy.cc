@@ -7,8 +7,8 @@
 #include <optional>
 #include <thread>
 
-#include "platform/linux/file_io.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host_notes.h"
 #include "platform/linux/store/store_file.h"
 
 namespace tbdaily {

@@ -2,7 +2,7 @@
 
 #include <utility>
 
-#include "platform/linux/host.h"
+#include "platform/linux/base/host.h"
 #include "platform/linux/replay/recorded_driver_registry.h"
 #include "platform/linux/replay/recordings.h"
 #include "platform/plist/codec.h"

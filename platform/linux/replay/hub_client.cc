@@ -12,7 +12,7 @@
 
 #include "platform/byte_reader.h"
 #include "platform/byte_writer.h"
-#include "platform/linux/file_io.h"
+#include "platform/linux/base/file_io.h"
 #include "platform/linux/replay/recorded_client.h"
 
 namespace tbdaily {

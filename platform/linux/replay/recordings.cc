@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 

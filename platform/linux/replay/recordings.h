@@ -6,9 +6,9 @@
 #include <string>
 #include <string_view>
 
-#include "platform/linux/cached_plist_file.h"
-#include "platform/linux/file_io.h"
-#include "platform/linux/host.h"
+#include "platform/linux/base/cached_plist_file.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host.h"
 #include "platform/property_list_codec.h"
 
 namespace tbdaily {

@@ -3,7 +3,7 @@
 #include <string>
 #include <utility>
 
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 

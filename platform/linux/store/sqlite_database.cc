@@ -3,7 +3,7 @@
 #include <sqlite3.h>
 
 #include "platform/hexadecimal.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 

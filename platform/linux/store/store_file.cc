@@ -9,8 +9,8 @@
 #include <cerrno>
 #include <thread>
 
-#include "platform/linux/file_io.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host_notes.h"
 #include "platform/utf8.h"
 
 namespace tbdaily {

@@ -6,7 +6,7 @@
 #include <optional>
 
 #include "platform/analytics_home.h"
-#include "platform/linux/host.h"
+#include "platform/linux/base/host.h"
 
 namespace tbdaily {
 

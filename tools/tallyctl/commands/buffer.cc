@@ -3,8 +3,8 @@
 #include <CLI/CLI.hpp>
 #include <array>
 
-#include "platform/linux/file_io.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host_notes.h"
 #include "storage/snapshot_renderer.h"
 #include "storage/stats_context.h"
 #include "tools/tallyctl/controller_buffer.h"

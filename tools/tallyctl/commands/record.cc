@@ -10,7 +10,7 @@
 
 #include "platform/analytics_home.h"
 #include "platform/kernel.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 #include "tools/tallyctl/tool.h"
 
 namespace tbdaily {

@@ -9,7 +9,7 @@
 #include "driver/service_endpoint.h"
 #include "platform/analytics_client.h"
 #include "platform/byte_writer.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 #include "platform/linux/linux_service_listener.h"
 #include "platform/linux/unix_socket.h"
 #include "tools/tallyctl/app_records.h"

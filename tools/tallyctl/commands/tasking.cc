@@ -5,7 +5,7 @@
 #include <CLI/CLI.hpp>
 
 #include "platform/device_answers.h"
-#include "platform/linux/file_io.h"
+#include "platform/linux/base/file_io.h"
 #include "platform/log_submission.h"
 #include "platform/plist_text.h"
 #include "platform/preferences_store.h"

@@ -11,8 +11,8 @@
 #include <chrono>
 #include <optional>
 
-#include "platform/linux/file_io.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host_notes.h"
 #include "platform/linux/linux_notifications.h"
 #include "tools/tallyctl/tool.h"
 

@@ -1,7 +1,7 @@
 #include "tools/tallyctl/metrics/advance.h"
 
-#include "platform/linux/file_io.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host_notes.h"
 #include "platform/linux/replay/recordings.h"
 #include "platform/property_list_codec.h"
 #include "tools/tallyctl/metrics/hub_advance.h"

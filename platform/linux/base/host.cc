@@ -1,4 +1,4 @@
-#include "platform/linux/host.h"
+#include "platform/linux/base/host.h"
 
 #include <sys/stat.h>
 
@@ -6,8 +6,8 @@
 #include <cstdlib>
 #include <utility>
 
-#include "platform/linux/file_io.h"
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 

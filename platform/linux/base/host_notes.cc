@@ -1,4 +1,4 @@
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 
 #include <unistd.h>
 

@@ -5,7 +5,7 @@
 #include <optional>
 #include <string>
 
-#include "platform/linux/file_io.h"
+#include "platform/linux/base/file_io.h"
 #include "platform/plist_value.h"
 #include "platform/property_list_codec.h"
 

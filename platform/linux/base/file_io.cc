@@ -1,4 +1,4 @@
-#include "platform/linux/file_io.h"
+#include "platform/linux/base/file_io.h"
 
 #include <fcntl.h>
 #include <sys/file.h>

@@ -1,8 +1,8 @@
-#include "platform/linux/cached_plist_file.h"
+#include "platform/linux/base/cached_plist_file.h"
 
 #include <cerrno>
 
-#include "platform/linux/host_notes.h"
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 
