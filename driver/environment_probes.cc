@@ -9,14 +9,6 @@ namespace tbdaily {
 
 EnvironmentProbeCache gEnvironmentProbeCache;
 
-namespace {
-
-constexpr const char* kCorruptionCountKey = "DatabaseCorruptionCount";
-constexpr const char* kCorruptionCountDomain = "com.velmora.tallyd";
-constexpr std::int64_t kBytesPerMiB = 1048576;
-
-}  // namespace
-
 const std::string* GetAnalyticsHomePath(Platform& platform) {
   const AnalyticsHome::Answer home = platform.analyticsHome.find();
   bool& isForcedModeLogged = gEnvironmentProbeCache.isForcedModeLogged;

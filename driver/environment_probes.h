@@ -17,6 +17,11 @@ namespace tbdaily {
 inline constexpr std::string_view kSupportLibraryPath =
     "/System/Library/PrivateFrameworks/FaultdeskSupport.framework/FaultdeskSupport";
 
+// The preference that they keep the count in.
+inline constexpr const char* kCorruptionCountKey = "DatabaseCorruptionCount";
+inline constexpr const char* kCorruptionCountDomain = "com.velmora.tallyd";
+inline constexpr std::int64_t kBytesPerMiB = 1048576;
+
 // The functions that are bound at run time: the integer value of a key in a domain (the out-flag may be
 // null), and its setting.
 using PreferencesGetInteger = std::int64_t (*)(const char* key, const char* domain, bool* valid);

@@ -4,9 +4,11 @@
 
 #include "driver/entry.h"
 #include "platform/linux/base/host_notes.h"
+#include "platform/linux/base/process_start.h"
 #include "platform/linux/linux_platform.h"
 
 int main(int argc, char** argv) {
+  tbdaily::prepareProcess();
   // A reader of our output that went away, or a limit on the size of files, is an error like others and no
   // reason to die.
   std::signal(SIGPIPE, SIG_IGN);

@@ -24,7 +24,7 @@ class Companion(DeviceTest):
             device.tally(*words.split(), status=2)
         self.assertIn('no command "nonsense"', device.tally("nonsense", status=2))
         missing = str(device.base / "missing")
-        self.assertIn("no folder", device.tally("record", "scalar", "k", "1", "--root", missing, status=1))
+        self.assertIn("make a device there", device.tally("record", "scalar", "k", "1", "--root", missing, status=1))
         environment = {k: v for k, v in device.env.items() if k != "TBDAILY_ROOT"}
         result = subprocess.run([BIN / "tallyctl", "init"], env=environment, capture_output=True)
         self.assertEqual(result.returncode, 2)

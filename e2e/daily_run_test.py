@@ -53,7 +53,9 @@ class DailyRun(DeviceTest):
             "TBWhitelistDigest": whitelist.digest})
         self.assertEqual(device.preferences("com.velmora.tallyd")["DatabaseCorruptionCount"], 0)
         (meta,) = device.pending(".193.meta.plist")
-        self.assertEqual(plistlib.loads(meta.read_bytes()), {
+        described = plistlib.loads(meta.read_bytes())
+        self.assertRegex(described.pop("id"), r"^[0-9A-F]{8}(-[0-9A-F]{4}){3}-[0-9A-F]{12}$")
+        self.assertEqual(described, {
             "type": "193", "name": "log-tallyd", "created": NOW, "options": {"previous_os_version": "<unknown>"}})
         self.assertEqual(meta.name, "log-tallyd-2026-11-24-090704-0.193.meta.plist")
         for place in device.path("var").rglob("*"):

@@ -105,7 +105,7 @@ class Month(DeviceTest):
             today = TODAY + index - (20 if index in (24, 25) else 0)  # on two days the clock is wrong
             scheduled = (None if index < 2 or index in (20, 21) else first if index < 5 else second if index < 12
                          else tasking("three", None) if index < 15 else second)
-            crashferry = model.domains[CRASHFERRY] = {"DiagnosticLogSubmissionEnabled": False}
+            crashferry = model.domains[CRASHFERRY] = {"DiagnosticLogSubmissionEnabled": True}
             if scheduled is not None:
                 crashferry["ScheduledTasking"] = scheduled
             device.preferences(CRASHFERRY, crashferry)

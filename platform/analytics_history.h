@@ -1,6 +1,7 @@
 // The analytics store's rows by day.
 //
-// Absent or damaged store: no rows.
+// Absent or damaged store: no rows. Damage that shows only while rows are read:
+// OpenAnalyticsHistory::isWhole.
 #pragma once
 
 #include <cstdint>
@@ -38,6 +39,10 @@ class OpenAnalyticsHistory {
   // All values of one key and day are one row.
   virtual void enumerateDistributions(std::string_view keyPrefix, DayNumber minimumDay, DayNumber maximumDay,
                                       const DistributionRowCallback& row) = 0;
+
+  // False when an enumeration met damage or could not go on: the rows that it delivered are a part of those
+  // that there are, and no report may be made of them.
+  virtual bool isWhole() const = 0;
 };
 
 class AnalyticsHistory {

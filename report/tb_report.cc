@@ -71,6 +71,11 @@ void TBReport::readHistory(DayNumber day) {
             _config != nullptr ? _config->configOptionsForDistributionKey(key) : nullptr;
         if (options != nullptr) computeAndAddDistributionForKeyWithOptions(values, key, *options);
       });
+  if (history->isWhole()) return;
+  // As if there were no rows: no report is made from part of them.
+  _scalarsOutput = {};
+  _distributionsOutput = {};
+  _histogramsOutput = {};
 }
 
 const PlistDictionary* TBReport::scalarOptions(std::string_view key) const {

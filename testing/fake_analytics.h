@@ -34,6 +34,7 @@ class FakeAnalyticsClient : public AnalyticsClient {
 
 class FakeAnalyticsHistory : public AnalyticsHistory {
  public:
+  bool isWhole = true;     // what an opened history says of itself
   int valuesAskedFor = 0;  // calls of nextValue, over all rows
 
   void addScalar(std::string_view key, DayNumber day, std::int64_t value) {
@@ -46,7 +47,9 @@ class FakeAnalyticsHistory : public AnalyticsHistory {
   }
 
   std::unique_ptr<OpenAnalyticsHistory> open() override {
-    return std::make_unique<Opened>(rows_, valuesAskedFor);
+    auto opened = std::make_unique<Opened>(rows_, valuesAskedFor);
+    opened->whole = isWhole;
+    return opened;
   }
 
  private:
@@ -91,8 +94,10 @@ class FakeAnalyticsHistory : public AnalyticsHistory {
           row(key, day, enumerator, stop);
       }
     }
+    bool isWhole() const override { return whole; }
     Rows rows;
     int& askedFor;
+    bool whole = true;
   };
 
   Rows rows_;

@@ -118,6 +118,7 @@ TYPED_TEST_P(ServiceContract, LogsAreWrittenBeforeTheCallReturnsAndNotAtAllWhenT
         });
   };
   const PlistValue options = PlistValue::dictionary({{"o", PlistValue::string("1")}});
+  this->subject.enableLogs(PlistValue::boolean(true));
   EXPECT_TRUE(write(options, "one", true));
   EXPECT_EQ(this->subject.logOptions(), options);
   EXPECT_FALSE(write(options, "two", false));

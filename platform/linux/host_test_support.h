@@ -35,17 +35,23 @@ struct TestHost {
     std::filesystem::create_directories(place.parent_path());
     std::ofstream(place, std::ios::binary) << contents;
   }
-  void put(std::string_view path, std::string_view contents) { putAt(host.devicePath(path), contents); }
+  // An open folder of the device, made where it is missing.
+  DeviceFolder openFolder(std::string_view path) const {
+    DeviceFolder opened;
+    EXPECT_EQ(host.files().makeFolder(path, opened), 0) << path;
+    return opened;
+  }
+  void put(std::string_view path, std::string_view contents) { putAt(host.files().place(path), contents); }
   void putLive(std::string_view path, std::string_view contents) { putAt(host.livePath(path), contents); }
   std::string text(std::string_view path) {
-    std::ifstream file(host.devicePath(path), std::ios::binary);
+    std::ifstream file(host.files().place(path), std::ios::binary);
     return {std::istreambuf_iterator<char>(file), {}};
   }
   // The names in a folder of the device, in byte order.
   std::vector<std::string> names(std::string_view path) {
     std::vector<std::string> all;
     std::error_code ignored;
-    for (const auto& entry : std::filesystem::directory_iterator(host.devicePath(path), ignored))
+    for (const auto& entry : std::filesystem::directory_iterator(host.files().place(path), ignored))
       all.push_back(entry.path().filename());
     std::ranges::sort(all);
     return all;

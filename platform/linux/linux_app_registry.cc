@@ -33,7 +33,7 @@ std::string_view trimmed(std::string_view text) {
 bool isVisibleApplication(const fs::path& desktopEntry) {
   constexpr std::size_t kMaximumSize = std::size_t{1} << 20;  // anybody with a home may put files there
   FileContents contents;
-  if (readRegularFile(desktopEntry, contents, kMaximumSize) != 0) return false;
+  if (readHostFile(desktopEntry, contents, kMaximumSize) != 0) return false;
   std::string_view rest(reinterpret_cast<const char*>(contents.bytes.data()), contents.bytes.size());
   bool inEntry = false, isApplication = false;
   while (!rest.empty()) {

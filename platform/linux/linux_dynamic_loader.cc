@@ -14,9 +14,7 @@ namespace tbdaily {
 namespace {
 
 // Why a file or folder must not be trusted with code that the job runs; empty when it may.
-std::string whyUntrusted(const std::filesystem::path& path) {
-  struct stat status {};
-  if (::stat(path.c_str(), &status) != 0) return errorText(errno);
+std::string whyUntrusted(const struct stat& status) {
   if (status.st_uid != 0 && status.st_uid != ::geteuid()) return "it belongs to another user";
   if ((status.st_mode & (S_IWGRP | S_IWOTH)) != 0) return "others can write to it";
   return {};
@@ -25,19 +23,17 @@ std::string whyUntrusted(const std::filesystem::path& path) {
 }  // namespace
 
 LibraryHandle LinuxDynamicLoader::open(std::string_view path) {
-  std::error_code error;
-  const std::filesystem::path named = host_.devicePath(path);
-  const std::filesystem::path place = std::filesystem::canonical(named, error);
-  if (error || !std::filesystem::is_regular_file(place, error)) return nullptr;
-  // Where the name is a link, whoever can replace that chooses the library too.
-  for (const std::filesystem::path& checked : {place, place.parent_path(), named.parent_path()}) {
-    if (const std::string reason = whyUntrusted(checked); !reason.empty()) {
-      noteOnce("library " + place.native() + " is not loaded: " + checked.native() + ": " + reason);
-      return nullptr;
-    }
+  const std::string place = host_.files().place(path).native();
+  FileDescriptor file;
+  std::string complaint;
+  if (host_.files().openJudged(path, whyUntrusted, file, complaint) != 0) {
+    if (!complaint.empty()) noteOnce("library " + place + " is not loaded: " + complaint);
+    return nullptr;
   }
-  void* library = ::dlopen(place.c_str(), RTLD_LAZY | RTLD_LOCAL);
-  if (library == nullptr) noteOnce("library " + place.native() + " is not loaded: " + ::dlerror());
+  // The very file that was judged, whatever has its name by now.
+  const std::string judged = "/proc/self/fd/" + std::to_string(file.get());
+  void* library = ::dlopen(judged.c_str(), RTLD_LAZY | RTLD_LOCAL);
+  if (library == nullptr) noteOnce("library " + place + " is not loaded: " + ::dlerror());
   return library;
 }
 

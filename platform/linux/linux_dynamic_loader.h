@@ -6,8 +6,9 @@
 
 namespace tbdaily {
 
-// Opens a library only when it and its folder belong to root or to the job's user and nobody else can write
-// to them: what is loaded runs with the job's rights.
+// Opens a library only when it and every folder from the device root on belong to root or to the job's user
+// and nobody else can write to them: what is loaded runs with the job's rights. What was judged is what is
+// loaded.
 class LinuxDynamicLoader : public DynamicLoader {
  public:
   explicit LinuxDynamicLoader(const Host& host) : host_(host) {}

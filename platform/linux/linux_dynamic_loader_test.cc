@@ -15,7 +15,7 @@ using testing::TestPlatform;
 
 TEST(LinuxDynamicLoaderTest, RefusesWhatOthersCanWrite) {
   TestPlatform device;
-  const fs::path folder = device.host.devicePath("/lib"), library = folder / "Support";
+  const fs::path folder = device.host.files().place("/lib"), library = folder / "Support";
   fs::create_directory(folder);
   fs::copy_file(SUPPORT_LIBRARY, library);
   const auto opens = [&](const char* path) { return device.services.dynamicLoader.open(path) != nullptr; };
@@ -30,11 +30,11 @@ TEST(LinuxDynamicLoaderTest, RefusesWhatOthersCanWrite) {
     EXPECT_FALSE(opens("/lib/Support"));
     ASSERT_EQ(::chown(library.c_str(), 0, 0), 0);
   }
-  fs::create_directory(device.host.devicePath("/open"));
-  fs::permissions(device.host.devicePath("/open"), static_cast<fs::perms>(0777));
-  fs::create_symlink(library, device.host.devicePath("/open/link"));
+  fs::create_directory(device.host.files().place("/open"));
+  fs::permissions(device.host.files().place("/open"), static_cast<fs::perms>(0777));
+  fs::create_symlink("/lib/Support", device.host.files().place("/open/link"));
   EXPECT_FALSE(opens("/open/link"));
-  fs::create_symlink(library, folder / "link");
+  fs::create_symlink("../lib/Support", folder / "link");
   EXPECT_TRUE(opens("/lib/link"));
   ASSERT_EQ(::mkfifo((folder / "pipe").c_str(), 0600), 0);
   EXPECT_FALSE(opens("/lib/pipe"));  // and does not wait for a writer

@@ -9,17 +9,29 @@
 
 namespace tbdaily {
 
+namespace {
+
+// What is there and cannot be looked at is not missing: it is named.
+void noteUnreadable(const Host& host, std::string_view path, int error) {
+  if (error != ENOENT && error != kUnusableRoot)
+    noteOnce("cannot read " + host.files().place(path).native() + ": " + errorText(error));
+}
+
+}  // namespace
+
 std::optional<FileStatus> LinuxFileSystem::status(std::string_view path) {
   struct stat status {};
-  if (::stat(host_.devicePath(path).c_str(), &status) != 0) return std::nullopt;
+  if (const int error = host_.files().status(path, status); error != 0) {
+    noteUnreadable(host_, path, error);
+    return std::nullopt;
+  }
   return FileStatus{status.st_size};
 }
 
 std::optional<std::vector<std::byte>> LinuxFileSystem::readFile(std::string_view path) {
-  const std::filesystem::path place = host_.devicePath(path);
   FileContents contents;
-  if (const int error = readRegularFile(place, contents); error != 0) {
-    if (error != ENOENT) noteOnce("cannot read " + place.native() + ": " + errorText(error));
+  if (const int error = host_.files().readFile(path, contents); error != 0) {
+    noteUnreadable(host_, path, error);
     return std::nullopt;
   }
   return std::move(contents.bytes);

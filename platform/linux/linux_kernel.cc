@@ -111,7 +111,7 @@ std::optional<Timebase> LinuxKernel::timebase() {
 PlistDate LinuxKernel::currentTime() {
   if (const auto now = recordings_.entry(recording::kClock, "now").asDate()) return *now;
   if (!host_.live()) {
-    noteOnce("live sources are off and " + recordings_.path(recording::kClock).native() +
+    noteOnce("live sources are off and " + host_.files().place(Recordings::path(recording::kClock)).native() +
              " records no \"now\": the time is 1970-01-01");
     return PlistDate::fromUnixSeconds(0);
   }

@@ -8,7 +8,7 @@ namespace tbdaily {
 bool LinuxLogSubmission::writeLogForSubmission(std::string_view logType, std::string_view logName,
                                                const PlistValue& options, const PlistValue&,
                                                const LogWriter& writer) {
-  return spool_.writePending(logType, logName, options, kernel_.currentTime(), writer);
+  return spool_.writeLog(consent(), logType, logName, options, kernel_.currentTime(), writer);
 }
 
 void LinuxLogSubmission::logStructuredData(int type, const PlistDictionary& data) {
@@ -19,14 +19,18 @@ bool LinuxLogSubmission::isDiagnosticLogSubmissionEnabled() {
   return preferences_.getBoolean("DiagnosticLogSubmissionEnabled", preference_domain::kLogSubmission).value;
 }
 
+Consent LinuxLogSubmission::consent() {
+  return isDiagnosticLogSubmissionEnabled() ? Consent::Yes : Consent::No;
+}
+
 void LinuxLogSubmission::dumpAllOldStructuredDataLogs() {
-  spool_.dumpOldStructured(kernel_.currentTime());
+  spool_.dumpOldStructured(consent(), kernel_.currentTime());
 }
 void LinuxLogSubmission::rollCarewellLogs() {
   spool_.rollCarewell();
 }
 void LinuxLogSubmission::submitDiagnosticLogs() {
-  spool_.submitPending(kernel_.currentTime());
+  if (isDiagnosticLogSubmissionEnabled()) spool_.submitPending(kernel_.currentTime());
 }
 
 PlistValue LinuxLogSubmission::taskingValue(std::string_view key) {

@@ -34,6 +34,7 @@ class LinuxLogSubmission : public LogSubmission {
   std::string incidentIdentifier() override;
 
  private:
+  Consent consent();
   std::optional<std::string> recordedText(std::string_view key);
 
   const Host& host_;

@@ -2,18 +2,20 @@
 
 #include <charconv>
 
-#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 
-std::filesystem::path LinuxNotifications::folder() const {
-  return host_.devicePath("/var/run/notifications");
-}
+namespace {
+constexpr std::string_view kAround = "/var/run";
+constexpr const char* kLockName = "notifications.lock";
+constexpr std::size_t kLongestCount = 64;
+}  // namespace
 
 std::uint64_t LinuxNotifications::postCount(std::string_view name) const {
   FileContents contents;
-  if (readRegularFile(folder() / name, contents) != 0) return 0;
+  const std::string path = std::string(kFolder).append("/").append(name);
+  if (host_.files().readFile(path, contents, kLongestCount) != 0) return 0;
   const auto* text = reinterpret_cast<const char*>(contents.bytes.data());
   std::uint64_t count = 0;
   const auto [end, error] = std::from_chars(text, text + contents.bytes.size(), count);
@@ -23,13 +25,13 @@ std::uint64_t LinuxNotifications::postCount(std::string_view name) const {
 void LinuxNotifications::post(std::string_view name) {
   if (!isSafeName(name))
     return noteOnce("notification \"" + std::string(name.substr(0, 40)) + "\" is refused: bad name");
-  if (const int error = host_.makeFolders(folder()); error != 0) return noteWriteFailure(folder(), error);
-  const std::filesystem::path lockFile = folder().parent_path() / "notifications.lock";
+  DeviceFolder around, folder;
+  int error = host_.files().makeFolder(kAround, around);
   FileLock lock;
-  if (const int error = lock.acquire(lockFile); error != 0) return noteWriteFailure(lockFile, error);
-  const std::filesystem::path place = folder() / name;
-  const int error = replaceFile(place, std::to_string(postCount(name) + 1) + "\n");
-  if (error != 0) noteWriteFailure(place, error);
+  if (error == 0) error = lock.acquire(around, kLockName);
+  if (error == 0) error = around.makeFolder(std::string(kFolder.substr(kAround.size() + 1)), folder);
+  if (error == 0) error = folder.replaceFile(std::string(name), std::to_string(postCount(name) + 1) + "\n");
+  if (error != 0) noteWriteFailure(host_.files().place(kFolder) / name, error);
 }
 
 }  // namespace tbdaily

@@ -2,7 +2,7 @@
 #pragma once
 
 #include <cstdint>
-#include <filesystem>
+#include <string_view>
 
 #include "platform/linux/base/host.h"
 #include "platform/notifications.h"
@@ -16,7 +16,7 @@ class LinuxNotifications : public Notifications {
   // Counts up and replaces the file atomically, so that a watcher of the folder sees every post.
   void post(std::string_view name) override;
 
-  std::filesystem::path folder() const;
+  static constexpr std::string_view kFolder = "/var/run/notifications";
   // The number of posts so far; 0 before the first, or when the file holds no number.
   std::uint64_t postCount(std::string_view name) const;
 

@@ -18,8 +18,8 @@ namespace {
 class LinuxSubject : public TestPlatform {
  public:
   LinuxSubject() {
-    std::filesystem::create_directory(host.devicePath("/lib"));
-    std::filesystem::copy_file(SUPPORT_LIBRARY, host.devicePath(library()));
+    std::filesystem::create_directory(host.files().place("/lib"));
+    std::filesystem::copy_file(SUPPORT_LIBRARY, host.files().place(library()));
   }
 
   PreferencesStore& anotherStore() { return other_; }
@@ -57,7 +57,9 @@ class LinuxSubject : public TestPlatform {
     record(recording::kApps, "bundles", PlistValue::array(bundles_));
   }
   std::uint64_t posts(const char* name) { return LinuxNotifications(host).postCount(name); }
-  void connectPeer() { peer_ = connectUnixSocket(endpointPath(host, "com.example.endpoint")).socket; }
+  void connectPeer() {
+    peer_ = connectUnixSocket(openFolder(kEndpointFolder), "com.example.endpoint.sock").socket;
+  }
   void send(const PlistDictionary& message) {
     const std::string list = codec.write(PlistValue::dictionary(message)).bytes;
     std::string bytes;

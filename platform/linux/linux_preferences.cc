@@ -1,6 +1,5 @@
 #include "platform/linux/linux_preferences.h"
 
-#include <fcntl.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -15,12 +14,8 @@ namespace tbdaily {
 namespace fs = std::filesystem;
 using State = CachedPlistFile::State;
 
-fs::path LinuxPreferences::folder() const {
-  return host_.devicePath("/var/mobile/Library/Preferences");
-}
-
-fs::path LinuxPreferences::file(std::string_view domain) const {
-  return folder() / (std::string(domain) + ".plist");
+std::string LinuxPreferences::path(std::string_view domain) {
+  return std::string(kFolder).append("/").append(domain).append(".plist");
 }
 
 bool LinuxPreferences::acceptsDomain(std::string_view domain) {
@@ -36,8 +31,8 @@ CachedPlistFile& LinuxPreferences::current(std::string_view name) {
   auto found = domains_.find(name);
   if (found == domains_.end()) found = domains_.try_emplace(std::string(name)).first;
   CachedPlistFile& domain = found->second;
-  const fs::path place = file(name);
-  domain.refresh(place, codec_);
+  domain.refresh(host_.files(), path(name), codec_);
+  const fs::path place = host_.files().place(path(name));
   if (domain.state() == State::Unreadable)
     noteOnce("cannot read preferences " + place.native() + ": " + domain.fault());
   if (domain.state() == State::Damaged)
@@ -51,21 +46,18 @@ PlistValue LinuxPreferences::getValue(std::string_view key, std::string_view dom
   return current(domain).root().get(key);
 }
 
-bool LinuxPreferences::moveAside(const fs::path& place) {
+bool LinuxPreferences::moveAside(const DeviceFolder& folder, const std::string& file) {
   for (unsigned n = 0; n < 10000; ++n) {
-    const fs::path aside = place.native() + ".damaged-" + std::to_string(n);
-    // A link never replaces, so that an earlier damaged file stays too.
-    if (::link(place.c_str(), aside.c_str()) == 0) {
-      ::unlink(place.c_str());
-      noteOnce("damaged preferences were moved aside as " + aside.native());
-      return true;
-    }
-    if (errno != EEXIST) {
-      noteWriteFailure(aside, errno);
+    const std::string aside = file + ".damaged-" + std::to_string(n);
+    if (folder.has(aside)) continue;
+    if (const int error = folder.rename(file, folder, aside); error != 0) {
+      noteWriteFailure(folder.place(aside), error);
       return false;
     }
+    noteOnce("damaged preferences were moved aside as " + folder.place(aside).native());
+    return true;
   }
-  noteOnce("too many damaged copies beside " + place.native() + "; remove some of them");
+  noteOnce("too many damaged copies beside " + folder.place(file).native() + "; remove some of them");
   return false;
 }
 
@@ -105,14 +97,16 @@ std::string LinuxPreferences::bytesOf(std::string_view name, const PlistDictiona
 
 void LinuxPreferences::changeDomain(std::string_view name, std::span<const Change> changes) {
   if (!acceptsDomain(name)) return;
-  const fs::path place = file(name);
   const bool onlyRemoves =
       std::all_of(changes.begin(), changes.end(), [](const Change& c) { return c.value.isNone(); });
-  if (onlyRemoves && !fileIdentity(place)) return;  // nothing to remove, nothing to make
-  if (const int error = host_.makeFolders(folder()); error != 0) return noteWriteFailure(folder(), error);
-  const fs::path lockFile = place.native() + ".lock";
+  if (onlyRemoves && current(name).state() == State::Missing) return;  // nothing to remove, nothing to make
+  DeviceFolder folder;
+  if (const int error = host_.files().makeFolder(kFolder, folder); error != 0)
+    return noteWriteFailure(host_.files().place(kFolder), error);
+  const std::string file = std::string(name) + ".plist";
   FileLock lock;
-  if (const int error = lock.acquire(lockFile); error != 0) return noteWriteFailure(lockFile, error);
+  if (const int error = lock.acquire(folder, file + ".lock"); error != 0)
+    return noteWriteFailure(folder.place(file + ".lock"), error);
 
   CachedPlistFile& domain = current(name);
   if (domain.state() == State::Unreadable)
@@ -122,11 +116,12 @@ void LinuxPreferences::changeDomain(std::string_view name, std::span<const Chang
       onlyRemoves && std::none_of(changes.begin(), changes.end(),
                                   [&stored](const Change& c) { return stored.contains(c.key); });
   if (changesNothing && domain.state() != State::Damaged) return;
-  if (domain.state() == State::Damaged && !moveAside(place)) return;
+  if (domain.state() == State::Damaged && !moveAside(folder, file)) return;
   const std::string bytes = bytesOf(name, stored, changes);
   domain.forget();  // whatever becomes of the write
   if (bytes.empty()) return;
-  if (const int error = replaceFile(place, bytes); error != 0) noteWriteFailure(place, error);
+  if (const int error = folder.replaceFile(file, bytes); error != 0)
+    noteWriteFailure(folder.place(file), error);
 }
 
 void LinuxPreferences::setValue(std::string_view key, const PlistValue& value, std::string_view name) {
@@ -149,14 +144,15 @@ void LinuxPreferences::applyChanges(std::span<const PreferenceChange> changes) {
 
 void LinuxPreferences::synchronize(std::string_view name) {
   if (!acceptsDomain(name)) return;
-  const fs::path place = file(name);
-  const FileDescriptor fd(::open(place.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  if (!fd.isOpen()) {
-    if (errno != ENOENT) noteWriteFailure(place, errno);
-    return;
-  }
-  if (::fsync(fd.get()) != 0) noteWriteFailure(place, errno);
-  if (const int error = syncFolder(folder()); error != 0) noteWriteFailure(folder(), error);
+  DeviceFolder folder;
+  FileDescriptor file;
+  const std::string fileName = std::string(name) + ".plist";
+  int error = host_.files().openFolder(kFolder, folder);
+  if (error == 0) error = folder.openForReading(fileName, file);
+  if (error == ENOENT) return;
+  if (error == 0 && ::fsync(file.get()) != 0) error = errno;
+  if (error == 0) error = folder.sync();
+  if (error != 0) noteWriteFailure(host_.files().place(path(name)), error);
 }
 
 }  // namespace tbdaily

@@ -10,7 +10,6 @@
 #include <string>
 
 #include "platform/linux/base/cached_plist_file.h"
-#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host.h"
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
@@ -27,11 +26,11 @@ class LinuxPreferences : public PreferencesStore {
   void applyChanges(std::span<const PreferenceChange> changes) override;
   void synchronize(std::string_view domain) override;
 
-  std::filesystem::path folder() const;
+  static constexpr std::string_view kFolder = "/var/mobile/Library/Preferences";
 
  private:
   static bool acceptsDomain(std::string_view domain);
-  std::filesystem::path file(std::string_view domain) const;
+  static std::string path(std::string_view domain);
   // The domain as its file stands now; parsed anew only when the file changed.
   CachedPlistFile& current(std::string_view domain);
   struct Change {
@@ -44,7 +43,7 @@ class LinuxPreferences : public PreferencesStore {
   // The file's contents after the changes; empty when they cannot be written.
   std::string bytesOf(std::string_view name, const PlistDictionary& stored, std::span<const Change> changes);
   bool isWritable(const Change& change, std::string_view name);
-  static bool moveAside(const std::filesystem::path& place);
+  static bool moveAside(const DeviceFolder& folder, const std::string& file);
 
   const Host& host_;
   PropertyListCodec& codec_;

@@ -62,10 +62,10 @@ TEST_F(PreferencesTest, MoveDamagedFilesAsideAndNeverOverwriteThem) {
   }
   EXPECT_EQ(device.text(path("d.plist.damaged-0")), "<plist><dict><key>k");
   EXPECT_EQ(device.text(path("d.plist.damaged-2")), "<plist><array/></plist>");
-  fs::create_directories(device.host.devicePath(path("folder.plist")));
+  fs::create_directories(device.host.files().place(path("folder.plist")));
   preferences.setValue("k", PlistValue::int64(1), "folder");
   EXPECT_TRUE(preferences.getValue("k", "folder").isNone());
-  EXPECT_TRUE(fs::is_directory(device.host.devicePath(path("folder.plist"))));
+  EXPECT_TRUE(fs::is_directory(device.host.files().place(path("folder.plist"))));
   // XML has no such character.
   preferences.applyChanges(std::vector<PreferenceChange>{{"k", PlistValue::string("\x01"), "d"},
                                                          {"n", PlistValue::int64(2), "d"}});

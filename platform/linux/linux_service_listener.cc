@@ -31,30 +31,31 @@ int pollTimeout(Clock::time_point deadline) {
 }
 
 // Clears the way for a new socket: removes one that nobody serves. An errno value when the place is taken.
-int removeStaleSocket(const std::filesystem::path& path) {
+int removeStaleSocket(const DeviceFolder& folder, const std::string& name) {
   struct stat status {};
-  if (::lstat(path.c_str(), &status) != 0) return errno == ENOENT ? 0 : errno;
+  if (const int error = folder.status(name, status); error != 0) return error == ENOENT ? 0 : error;
   if (!S_ISSOCK(status.st_mode)) return EEXIST;
-  const SocketResult probe = connectUnixSocket(path);
+  const SocketResult probe = connectUnixSocket(folder, name);
   if (probe.error == 0) return EADDRINUSE;
   if (probe.error != ECONNREFUSED) return probe.error;
-  return ::unlink(path.c_str()) == 0 ? 0 : errno;
+  return folder.remove(name);
 }
 
 }  // namespace
 
-std::filesystem::path endpointPath(const Host& host, std::string_view endpointName) {
-  return host.devicePath("/var/run") / (std::string(endpointName) + ".sock");
+std::string endpointSocketName(std::string_view endpointName) {
+  return std::string(endpointName) + ".sock";
 }
 
 LinuxServiceListener::~LinuxServiceListener() {
-  if (!boundPath_.empty()) ::unlink(boundPath_.c_str());
+  if (!boundName_.empty()) folder_.remove(boundName_);
 }
 
 ServiceConnection LinuxServiceListener::add(FileDescriptor socket, bool isListener) {
   Connection connection;
   connection.socket = std::move(socket);
   connection.isListener = isListener;
+  connection.lastActive = ++activity_;
   connections_.emplace(++lastIdentifier_, std::move(connection));
   return lastIdentifier_;
 }
@@ -63,23 +64,23 @@ ServiceConnection LinuxServiceListener::createListener(std::string_view endpoint
   if (!isSafeName(endpointName)) return 0;
   if (FileDescriptor passed = takePassedListener(); passed.isOpen()) return add(std::move(passed), true);
 
-  const std::filesystem::path path = endpointPath(host_, endpointName);
-  const auto refuse = [&path](int error) -> ServiceConnection {
-    noteOnce("cannot serve " + path.native() + ": " +
+  const std::string name = endpointSocketName(endpointName);
+  const auto refuse = [&](int error) -> ServiceConnection {
+    noteOnce("cannot serve " + (host_.files().place(kEndpointFolder) / name).native() + ": " +
              (error == EADDRINUSE ? "another job is listening there" : errorText(error)));
     return 0;
   };
-  if (const int error = host_.makeFolders(path.parent_path()); error != 0) {
-    noteWriteFailure(path.parent_path(), error);
+  if (const int error = host_.files().makeFolder(kEndpointFolder, folder_); error != 0) {
+    noteWriteFailure(host_.files().place(kEndpointFolder), error);
     return 0;
   }
   // Two jobs that start at once must not both find the same stale socket.
-  const int lockError = endpointLock_.acquire(path.native() + ".lock", 0);
+  const int lockError = endpointLock_.acquire(folder_, name + ".lock", 0);
   if (lockError != 0) return refuse(lockError == EWOULDBLOCK ? EADDRINUSE : lockError);
-  if (const int error = removeStaleSocket(path); error != 0) return refuse(error);
-  SocketResult listening = listenUnixSocket(path);
+  if (const int error = removeStaleSocket(folder_, name); error != 0) return refuse(error);
+  SocketResult listening = listenUnixSocket(folder_, name);
   if (listening.error != 0) return refuse(listening.error);
-  boundPath_ = path;
+  boundName_ = name;
   return add(std::move(listening.socket), true);
 }
 
@@ -111,15 +112,47 @@ bool LinuxServiceListener::fail(ServiceConnection peer, const std::string& reaso
   return true;
 }
 
-bool LinuxServiceListener::acceptPeer(ServiceConnection listener) {
-  FileDescriptor socket(
-      ::accept4(connections_.at(listener).socket.get(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
-  if (!socket.isOpen()) {
-    // The peer stays in the queue and the listener ready: without a rest the loop would spin.
-    if (errno == EMFILE || errno == ENFILE || errno == ENOBUFS || errno == ENOMEM)
-      std::this_thread::sleep_for(kRestWithoutDescriptors);
-    return false;
+ServiceConnection LinuxServiceListener::idleLongest(Holding holding, ServiceConnection except) const {
+  ServiceConnection found = 0;
+  for (const auto& [id, connection] : connections_) {
+    if (connection.isListener || id == except) continue;
+    if (holding == Holding::PartOfAMessage && connection.received.empty()) continue;
+    if (found == 0 || connection.lastActive < connections_.at(found).lastActive) found = id;
   }
+  return found;
+}
+
+std::size_t LinuxServiceListener::unfinishedBytes() const {
+  std::size_t bytes = 0;
+  for (const auto& [id, connection] : connections_) bytes += connection.received.capacity();
+  return bytes;
+}
+
+FileDescriptor LinuxServiceListener::acceptSocket(ServiceConnection listener) {
+  const int listening = connections_.at(listener).socket.get();
+  while (true) {
+    const bool isFull = connections_.size() > kMaximumPeers;  // the listener is one of them
+    FileDescriptor socket;
+    if (!isFull)
+      socket = FileDescriptor(::accept4(listening, nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
+    const bool lacksRoom =
+        isFull ||
+        (!socket.isOpen() && (errno == EMFILE || errno == ENFILE || errno == ENOBUFS || errno == ENOMEM));
+    if (!lacksRoom) return socket;
+    const ServiceConnection idle = idleLongest(Holding::Anything);
+    if (idle == 0) {
+      // The peer stays in the queue and the listener ready: without a rest the loop would spin.
+      std::this_thread::sleep_for(kRestWithoutDescriptors);
+      return socket;
+    }
+    noteOnce("there are too many peers at the endpoint: those that are idle longest give way");
+    connections_.erase(idle);
+  }
+}
+
+bool LinuxServiceListener::acceptPeer(ServiceConnection listener) {
+  FileDescriptor socket = acceptSocket(listener);
+  if (!socket.isOpen()) return false;
   if (!isTrustedPeer(socket.get())) {
     noteOnce("a peer of another user was refused at the endpoint");
     return false;
@@ -150,10 +183,21 @@ bool LinuxServiceListener::receive(ServiceConnection peer) {
     if (have >= kLengthSize && have == whole) return finishMessage(peer);
 
     // Room grows with what arrives, not with what the length promises.
-    received.resize(have + std::min(whole - have, kReadSize));
+    const std::size_t wanted = have + std::min(whole - have, kReadSize);
+    if (wanted > received.capacity()) {
+      const std::size_t room =
+          std::min(std::max(wanted, 2 * received.capacity()), std::max(whole, kLengthSize));
+      if (unfinishedBytes() - received.capacity() + room > kMaximumUnfinished) {
+        const ServiceConnection idle = idleLongest(Holding::PartOfAMessage, peer);
+        return fail(idle != 0 ? idle : peer, "too much of unfinished messages is waiting");
+      }
+      received.reserve(room);
+    }
+    received.resize(wanted);
     const ssize_t count = ::read(connection.socket.get(), received.data() + have, received.size() - have);
     const int error = errno;
     received.resize(have + static_cast<std::size_t>(std::max<ssize_t>(count, 0)));
+    if (count > 0) connection.lastActive = ++activity_;
     if (count > 0) continue;
     if (count < 0 && error == EINTR) continue;
     if (count < 0 && error == EAGAIN) return false;
@@ -170,9 +214,8 @@ bool LinuxServiceListener::serve(ServiceConnection id) {
 std::vector<ServiceConnection> LinuxServiceListener::waitForReady(Clock::time_point deadline) {
   std::vector<pollfd> polled;
   std::vector<ServiceConnection> ids;
-  const bool full = connections_.size() > kMaximumPeers;
   for (const auto& [id, connection] : connections_) {
-    if (!connection.resumed || (connection.isListener && full)) continue;
+    if (!connection.resumed) continue;
     polled.push_back({connection.socket.get(), POLLIN, 0});
     ids.push_back(id);
   }

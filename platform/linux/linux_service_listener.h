@@ -10,7 +10,6 @@
 #include <map>
 #include <vector>
 
-#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host.h"
 #include "platform/property_list_codec.h"
 #include "platform/service_listener.h"
@@ -20,7 +19,11 @@ namespace tbdaily {
 class LinuxServiceListener : public ServiceListener {
  public:
   static constexpr std::size_t kMaximumMessageLength = std::size_t{16} << 20;
-  static constexpr std::size_t kMaximumPeers = 256;  // more wait in the socket's queue
+  // Where there is no room for a new peer, or for more of a message, the connection that has been idle
+  // longest gives way.
+  static constexpr std::size_t kMaximumPeers = 256;
+  static constexpr std::size_t kMaximumUnfinished = std::size_t{64}
+                                                    << 20;  // bytes of all messages on their way
 
   LinuxServiceListener(const Host& host, PropertyListCodec& codec) : host_(host), codec_(codec) {}
   ~LinuxServiceListener() override;
@@ -38,6 +41,7 @@ class LinuxServiceListener : public ServiceListener {
     bool resumed = false;
     ServiceEventHandler handler;
     std::vector<std::byte> received;  // of the message that is on its way: length and bytes
+    std::uint64_t lastActive = 0;     // counts what arrived anywhere
   };
 
   ServiceConnection add(FileDescriptor socket, bool isListener);
@@ -48,6 +52,12 @@ class LinuxServiceListener : public ServiceListener {
   bool receive(ServiceConnection peer);
   bool finishMessage(ServiceConnection peer);
   bool fail(ServiceConnection peer, const std::string& reason);
+  // The peer that has been idle longest, of those that hold part of a message or of all; 0 when there is none
+  // but `except`.
+  enum class Holding : bool { Anything, PartOfAMessage };
+  ServiceConnection idleLongest(Holding holding, ServiceConnection except = 0) const;
+  FileDescriptor acceptSocket(ServiceConnection listener);
+  std::size_t unfinishedBytes() const;
   void deliver(ServiceConnection id, const ServiceEvent& event);
 
   const Host& host_;
@@ -55,11 +65,14 @@ class LinuxServiceListener : public ServiceListener {
   std::map<ServiceConnection, Connection> connections_;
   ServiceConnection lastIdentifier_ = 0;
   ServiceConnection lastServed_ = 0;  // peers take turns
-  std::filesystem::path boundPath_;   // empty when the socket was passed in
+  std::uint64_t activity_ = 0;
+  DeviceFolder folder_;    // of the socket; not open when that was passed in
+  std::string boundName_;  // of the socket in it; empty while there is none
   FileLock endpointLock_;
 };
 
-// Where the endpoint's socket lies.
-std::filesystem::path endpointPath(const Host& host, std::string_view endpointName);
+// Where the endpoint's socket lies: its folder, and its name in it.
+inline constexpr std::string_view kEndpointFolder = "/var/run";
+std::string endpointSocketName(std::string_view endpointName);
 
 }  // namespace tbdaily

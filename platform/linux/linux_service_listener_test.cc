@@ -52,7 +52,9 @@ class EndpointTest : public ::testing::Test {
     });
     listener.resume(endpoint);
   }
-  FileDescriptor connect() { return connectUnixSocket(endpointPath(device.host, kEndpoint)).socket; }
+  FileDescriptor connect() {
+    return connectUnixSocket(device.openFolder(kEndpointFolder), endpointSocketName(kEndpoint)).socket;
+  }
   // Runs slices until that many events came and nothing comes any more, and answers the events.
   std::vector<std::string> serve(double quiet = 0.05, std::size_t atLeast = 0) {
     constexpr double kLongEnough = 60;  // on a slow machine, for events that are sure to come
@@ -79,9 +81,9 @@ TEST_F(EndpointTest, BelongsToOneListenerAndOnlyStaleSocketsAreReplaced) {
     EXPECT_EQ(other.createListener(name, DeliveryQueue::Main), 0U) << name;
   EXPECT_EQ(device.text("/var/run/taken.sock"), "a file");
   // Closing a bound socket leaves its file, as a job that was killed does.
-  EXPECT_EQ(listenUnixSocket(endpointPath(device.host, "stale")).error, 0);
+  EXPECT_EQ(listenUnixSocket(device.openFolder(kEndpointFolder), "stale.sock").error, 0);
   EXPECT_NE(LinuxServiceListener(device.host, device.codec).createListener("stale", DeliveryQueue::Main), 0U);
-  EXPECT_FALSE(std::filesystem::exists(endpointPath(device.host, "stale")));
+  EXPECT_FALSE(device.openFolder(kEndpointFolder).has("stale.sock"));
 }
 
 TEST_F(EndpointTest, ReadsMessagesHoweverTheyArrive) {
@@ -147,6 +149,7 @@ TEST_F(EndpointTest, LetsPeersTakeTurns) {
 TEST_F(EndpointTest, RestsWhenNoDescriptorIsLeftAndServesTheCrowdLater) {
   std::vector<FileDescriptor> crowd;
   for (int i = 0; i < 20; ++i) crowd.push_back(connect());
+  const FileDescriptor lastFree(::dup(crowd.back().get()));
   {
     const testing::ResourceLimit none(RLIMIT_NOFILE, static_cast<rlim_t>(crowd.back().get()) + 1);
     const std::clock_t start = std::clock();
@@ -154,6 +157,38 @@ TEST_F(EndpointTest, RestsWhenNoDescriptorIsLeftAndServesTheCrowdLater) {
     EXPECT_LT(std::clock() - start, CLOCKS_PER_SEC / 10);  // it did not spin
   }
   EXPECT_EQ(serve().size(), crowd.size());
+}
+
+TEST_F(EndpointTest, GivesTheRoomOfIdlePeersToNewOnes) {
+  std::vector<FileDescriptor> crowd;
+  for (std::size_t i = 0; i < LinuxServiceListener::kMaximumPeers; ++i) {
+    crowd.push_back(connect());
+    if (i % 64 == 63) serve();
+  }
+  ASSERT_EQ(writeAll(crowd[0].get(), message(1)), 0);  // no longer the one that is idle longest
+  EXPECT_EQ(serve(), Events{"2 1"});
+  const FileDescriptor late = connect();
+  ASSERT_EQ(writeAll(late.get(), message(7)), 0);
+  ASSERT_EQ(writeAll(crowd[0].get(), message(2)), 0);
+  Events seen = serve();
+  std::ranges::sort(seen);
+  EXPECT_EQ(seen, (Events{"2 2", "258 7", "new 258"}));
+  char byte = 0;
+  EXPECT_EQ(::read(crowd[1].get(), &byte, 1), 0);  // closed
+}
+
+TEST_F(EndpointTest, HoldsAtMostSixtyFourMebibytesOfUnfinishedMessages) {
+  const std::string most = message(1, LinuxServiceListener::kMaximumMessageLength);
+  std::vector<FileDescriptor> peers;
+  for (int i = 0; i < 4; ++i) {
+    peers.push_back(connect());
+    const std::jthread writer(
+        [&] { writeAll(peers.back().get(), std::string_view(most).substr(0, most.size() - 1)); });
+    Events seen = serve(0.3);
+    EXPECT_EQ(std::ranges::count(seen, "2 error"), i == 3 ? 1 : 0) << i;
+  }
+  ASSERT_EQ(writeAll(peers[3].get(), most.substr(most.size() - 1)), 0);
+  EXPECT_EQ(serve(), Events{"5 1"});
 }
 
 }  // namespace

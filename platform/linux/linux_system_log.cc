@@ -1,10 +1,8 @@
 #include "platform/linux/linux_system_log.h"
 
-#include <fcntl.h>
 #include <unistd.h>
 
 #include <array>
-#include <cerrno>
 #include <cstdlib>
 
 #include "platform/calendar.h"
@@ -13,6 +11,9 @@
 namespace tbdaily {
 
 namespace {
+
+constexpr std::string_view kFolder = "/var/log";
+constexpr const char* kFile = "tbdaily.log";
 
 struct LevelText {
   std::string_view name;
@@ -82,16 +83,14 @@ void LinuxSystemLog::append(const std::string& lines) {
     writeAll(STDERR_FILENO, lines);
     return;
   }
-  const std::filesystem::path place = host_.devicePath("/var/log/tbdaily.log");
   if (!file_.isOpen()) {
-    if (const int error = host_.makeFolders(place.parent_path()); error != 0) {
-      return noteWriteFailure(place.parent_path(), error);
-    }
-    file_ = FileDescriptor(
-        ::open(place.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOCTTY | O_NONBLOCK, 0600));
-    if (!file_.isOpen()) return noteWriteFailure(place, errno);
+    DeviceFolder folder;
+    int error = host_.files().makeFolder(kFolder, folder);
+    if (error == 0) error = folder.openForAppending(kFile, file_);
+    if (error != 0) return noteWriteFailure(host_.files().place(kFolder) / kFile, error);
   }
-  if (const int error = writeAll(file_.get(), lines); error != 0) noteWriteFailure(place, error);
+  if (const int error = writeAll(file_.get(), lines); error != 0)
+    noteWriteFailure(host_.files().place(kFolder) / kFile, error);
 }
 
 }  // namespace tbdaily

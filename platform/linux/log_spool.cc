@@ -1,6 +1,5 @@
 #include "platform/linux/log_spool.h"
 
-#include <fcntl.h>
 #include <unistd.h>
 
 #include <array>
@@ -9,19 +8,19 @@
 #include <vector>
 
 #include "platform/calendar.h"
-#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host_notes.h"
+#include "platform/linux/host_identity.h"
 #include "platform/plist/json.h"
 
 namespace tbdaily {
-
-namespace fs = std::filesystem;
 
 namespace {
 
 constexpr std::string_view kMetaSuffix = ".meta.plist";
 constexpr unsigned kMaximumNumber = 100000;  // of logs with one name and second
 constexpr int kCarewellGenerations = 5;
+constexpr const char* kStructured = "Structured";
+constexpr const char* kCarewell = "Carewell";
 
 std::string dayText(PlistDate now) {
   return dateText(now, DateFraction::Drop).substr(0, 10);
@@ -42,61 +41,62 @@ class FileOutput : public LogOutput {
 };
 
 // All of the text or none of it: half a line would spoil the next one too. Callers hold the lock.
-int appendWhole(const fs::path& place, std::string_view text) {
-  const FileDescriptor fd(
-      ::open(place.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0600));
+int appendWhole(const DeviceFolder& folder, const std::string& name, std::string_view text) {
+  FileDescriptor file;
   struct stat before {};
-  if (!fd.isOpen() || ::fstat(fd.get(), &before) != 0) return errno;
-  const int error = writeAll(fd.get(), text);
-  return error != 0 && ::ftruncate(fd.get(), before.st_size) != 0 ? errno : error;
-}
-
-// Folders are made when one turns out to be missing, not looked for each time.
-bool isMissingFolder(int error) {
-  return error == ENOENT || error == ENOTDIR;
-}
-
-std::vector<fs::path> filesIn(const fs::path& folder) {
-  std::vector<fs::path> files;
-  std::error_code error;
-  for (fs::directory_iterator it(folder, error); !error && it != fs::directory_iterator();
-       it.increment(error)) {
-    files.push_back(it->path());
-  }
-  return files;
+  if (const int error = folder.openForAppending(name, file); error != 0) return error;
+  if (::fstat(file.get(), &before) != 0) return errno;
+  const int error = writeAll(file.get(), text);
+  return error != 0 && ::ftruncate(file.get(), before.st_size) != 0 ? errno : error;
 }
 
 // What a job that died in the middle may have left: passing names, and meta files whose log never came.
 // Callers hold the lock.
-void removeRemains(const fs::path& folder) {
-  for (const fs::path& file : filesIn(folder)) {
-    const std::string name = file.filename().native();
-    std::error_code ignored;
-    if (name.starts_with(TemporaryFile::kNamePrefix)) fs::remove(file, ignored);
-    if (!name.ends_with(kMetaSuffix)) continue;
-    const fs::path log = folder / name.substr(0, name.size() - kMetaSuffix.size());
-    if (!fs::exists(fs::symlink_status(log, ignored))) fs::remove(file, ignored);
+void removeRemains(const DeviceFolder& folder) {
+  removePassingFiles(folder);
+  std::vector<std::string> names;
+  folder.names(names);
+  for (const std::string& name : names) {
+    if (name.ends_with(kMetaSuffix) && !folder.has(name.substr(0, name.size() - kMetaSuffix.size())))
+      folder.remove(name);
   }
 }
 
 // Puts both files in place under the first free number. The log comes last: who sees it finds its meta file.
-int placePair(const fs::path& stem, std::string_view type, TemporaryFile& meta, TemporaryFile& log) {
+int placePair(const DeviceFolder& folder, const std::string& stem, std::string_view type, TemporaryFile& meta,
+              TemporaryFile& log) {
   for (unsigned n = 0; n < kMaximumNumber; ++n) {
-    const fs::path place = stem.native() + "-" + std::to_string(n) + "." + std::string(type);
-    const fs::path metaPlace = place.native() + std::string(kMetaSuffix);
-    std::error_code ignored;
-    if (fs::exists(fs::symlink_status(place, ignored)) || fs::exists(fs::symlink_status(metaPlace, ignored)))
-      continue;
-    if (const int error = meta.placeNew(metaPlace); error != 0) return error;
-    int error = log.placeNew(place);
+    const std::string name = stem + "-" + std::to_string(n) + "." + std::string(type);
+    const std::string metaName = name + std::string(kMetaSuffix);
+    if (folder.has(name) || folder.has(metaName)) continue;
+    if (const int error = meta.placeNew(metaName); error != 0) return error;
+    int error = log.placeNew(name);
     if (error == 0) {
-      error = syncFolder(stem.parent_path());
-      if (error != 0) ::unlink(place.c_str());
+      error = folder.sync();
+      if (error != 0) folder.remove(name);
     }
-    if (error != 0) ::unlink(metaPlace.c_str());
+    if (error != 0) folder.remove(metaName);
     return error;
   }
   return EEXIST;
+}
+
+// The first free one of "STEM.jsonl", "STEM-1.jsonl" ...
+std::string freeName(const DeviceFolder& folder, const std::string& stem) {
+  std::string name = stem + ".jsonl";
+  for (unsigned n = 1; folder.has(name) && n < kMaximumNumber; ++n)
+    name = stem + "-" + std::to_string(n) + ".jsonl";
+  return name;
+}
+
+// The old contents are forced to storage before their name moves: the run that wrote them may not have come
+// to it.
+int moveDurably(const DeviceFolder& from, const std::string& name, const DeviceFolder& to,
+                const std::string& newName) {
+  FileDescriptor file;
+  if (const int error = from.openForReading(name, file); error != 0) return error;
+  if (::fsync(file.get()) != 0) return errno;
+  return from.rename(name, to, newName);
 }
 
 }  // namespace
@@ -108,20 +108,22 @@ std::string spoolStamp(PlistDate now) {
   return dayText(now) + clock.data();
 }
 
-int LogSpool::lockSpool(FileLock& lock) const {
-  const fs::path place = folder() / ".lock";
-  const int error = lock.acquire(place);
-  if (!isMissingFolder(error)) return error;
-  const int folderError = host_.makeFolders(folder());
-  return folderError == 0 ? lock.acquire(place) : folderError;
+void LogSpool::noteFailure(std::string_view folder, int error) const {
+  noteWriteFailure(host_.files().place(kFolder) / folder, error);
 }
 
-bool LogSpool::writePending(std::string_view type, std::string_view name, const PlistValue& options,
-                            PlistDate now, const LogWriter& writer) {
+int LogSpool::lockSpool(DeviceFolder& folder, FileLock& lock) const {
+  const int error = host_.files().makeFolder(kFolder, folder);
+  return error == 0 ? lock.acquire(folder, ".lock") : error;
+}
+
+bool LogSpool::writeLog(Consent consent, std::string_view type, std::string_view name,
+                        const PlistValue& options, PlistDate now, const LogWriter& writer) {
   if (!isSafeName(type) || !isSafeName(name)) return false;
   PlistDictionary description{{"type", PlistValue::string(std::string(type))},
                               {"name", PlistValue::string(std::string(name))},
-                              {"created", PlistValue(now)}};
+                              {"created", PlistValue(now)},
+                              {"id", PlistValue::string(randomUuid())}};
   description.set("options", options);
   const PlistWriteResult meta =
       codec_.write(PlistValue::dictionary(std::move(description)), PlistForm::Plain);
@@ -130,16 +132,18 @@ bool LogSpool::writePending(std::string_view type, std::string_view name, const 
     return false;
   }
 
+  const std::string waiting(consent == Consent::Yes ? kPending : kWithheld);
+  DeviceFolder spool, folder;
   FileLock lock;
   TemporaryFile logFile, metaFile;
-  int error = lockSpool(lock);
-  if (error == 0) error = host_.makeFolders(pending());
-  if (error == 0) removeRemains(pending());
-  if (error == 0) error = metaFile.create(pending());
+  int error = lockSpool(spool, lock);
+  if (error == 0) error = spool.makeFolder(waiting, folder);
+  if (error == 0) removeRemains(folder);
+  if (error == 0) error = metaFile.create(folder);
   if (error == 0) error = writeAll(metaFile.fd(), meta.bytes);
-  if (error == 0) error = logFile.create(pending());
+  if (error == 0) error = logFile.create(folder);
   if (error != 0) {
-    noteWriteFailure(pending(), error);
+    noteFailure(waiting, error);
     return false;
   }
   FileOutput output(logFile.fd());
@@ -147,82 +151,104 @@ bool LogSpool::writePending(std::string_view type, std::string_view name, const 
   error = output.error();
   if (error == 0 && !whole) return false;
   if (error == 0)
-    error = placePair(pending() / (std::string(name) + "-" + spoolStamp(now)), type, metaFile, logFile);
-  if (error != 0) noteWriteFailure(pending(), error);
+    error = placePair(folder, std::string(name) + "-" + spoolStamp(now), type, metaFile, logFile);
+  if (error != 0) noteFailure(waiting, error);
   return error == 0;
 }
 
 void LogSpool::appendStructured(int type, const PlistDictionary& data, PlistDate now) {
-  const fs::path place = folder() / "Structured" / std::to_string(type) / (dayText(now) + ".jsonl");
+  const std::string name = dayText(now) + ".jsonl";
   const std::string line =
       "{\"time\": \"" + stampText(now, 3) + "\", \"data\": " + jsonText(PlistValue::dictionary(data)) + "}\n";
+  DeviceFolder spool, structured, folder;
   FileLock lock;
-  int error = lockSpool(lock);
-  if (error == 0) error = appendWhole(place, line);
-  if (isMissingFolder(error)) {
-    error = host_.makeFolders(place.parent_path());
-    if (error == 0) error = appendWhole(place, line);
-  }
-  if (error != 0) noteWriteFailure(place, error);
+  int error = lockSpool(spool, lock);
+  if (error == 0) error = spool.makeFolder(kStructured, structured);
+  if (error == 0) error = structured.makeFolder(std::to_string(type), folder);
+  if (error == 0) error = appendWhole(folder, name, line);
+  if (error != 0) noteFailure(std::string(kStructured) + "/" + std::to_string(type) + "/" + name, error);
 }
 
-void LogSpool::dumpOldStructured(PlistDate now) {
-  const fs::path structured = folder() / "Structured";
-  std::error_code ignored;
-  if (!fs::is_directory(structured, ignored)) return;
+int LogSpool::moveOldStructured(const DeviceFolder& from, const std::string& type, std::string_view today,
+                                const DeviceFolder& to) {
+  std::vector<std::string> names;
+  if (const int error = from.names(names); error != 0) return error;
+  for (const std::string& name : names) {
+    constexpr std::string_view kSuffix = ".jsonl";
+    if (name.size() != today.size() + kSuffix.size() || !name.ends_with(kSuffix)) continue;
+    const std::string day = name.substr(0, today.size());
+    if (day >= today) continue;
+    if (const int error = moveDurably(from, name, to, freeName(to, "structured-" + type + "-" + day));
+        error != 0)
+      noteWriteFailure(from.place(name), error);
+  }
+  return 0;
+}
+
+void LogSpool::dumpOldStructured(Consent consent, PlistDate now) {
+  DeviceFolder spool, structured, waiting;
+  int error = host_.files().openFolder(std::string(kFolder).append("/").append(kStructured), structured);
+  if (error == ENOENT || error == kUnusableRoot) return;
   FileLock lock;
-  if (const int error = lockSpool(lock); error != 0) return noteWriteFailure(structured, error);
-  const std::string today = dayText(now);
-  for (const fs::path& typeFolder : filesIn(structured)) {
-    for (const fs::path& file : filesIn(typeFolder)) {
-      const std::string day = file.stem().native();
-      if (file.extension() != ".jsonl" || day.size() != today.size() || day >= today) continue;
-      if (const int error = host_.makeFolders(pending()); error != 0)
-        return noteWriteFailure(pending(), error);
-      const std::string stem = "structured-" + typeFolder.filename().native() + "-" + day;
-      fs::path place = pending() / (stem + ".jsonl");
-      for (unsigned n = 1; fs::exists(fs::symlink_status(place, ignored)) && n < kMaximumNumber; ++n) {
-        place = pending() / (stem + "-" + std::to_string(n) + ".jsonl");
-      }
-      if (::rename(file.c_str(), place.c_str()) != 0) noteWriteFailure(place, errno);
-    }
+  if (error == 0) error = lockSpool(spool, lock);
+  std::vector<std::string> types;
+  if (error == 0) error = structured.names(types);
+  if (error == 0 && types.empty()) return;
+  if (error == 0)
+    error = spool.makeFolder(std::string(consent == Consent::Yes ? kPending : kWithheld), waiting);
+  if (error != 0) return noteFailure(kStructured, error);
+  for (const std::string& type : types) {
+    DeviceFolder folder;
+    error = structured.openFolder(type, folder);
+    if (error == ENOTDIR) continue;
+    if (error == 0) error = moveOldStructured(folder, type, dayText(now), waiting);
+    if (error != 0) noteWriteFailure(structured.place(type), error);
   }
 }
 
 void LogSpool::submitPending(PlistDate now) {
-  std::error_code ignored;
-  if (!fs::is_directory(pending(), ignored)) return;
+  DeviceFolder spool, pending, outbox;
+  int error = host_.files().openFolder(std::string(kFolder).append("/").append(kPending), pending);
+  if (error == ENOENT || error == kUnusableRoot) return;
   FileLock lock;
-  if (const int error = lockSpool(lock); error != 0) return noteWriteFailure(pending(), error);
-  removeRemains(pending());
-  if (fs::is_empty(pending(), ignored)) return;
-  if (const int error = host_.makeFolders(outbox()); error != 0) return noteWriteFailure(outbox(), error);
+  if (error == 0) error = lockSpool(spool, lock);
+  if (error == 0) removeRemains(pending);
+  std::vector<std::string> names;
+  if (error == 0) error = pending.names(names);
+  if (error == 0 && names.empty()) return;
+  if (error == 0) error = spool.makeFolder(std::string(kOutbox), outbox);
+  if (error != 0) return noteFailure(kPending, error);
 
   // The folder itself moves, so that a submission is never half handed over.
-  fs::path place;
+  std::string place;
   for (unsigned n = 0; n < kMaximumNumber; ++n) {
-    place = outbox() / (spoolStamp(now) + "-" + std::to_string(n));
-    if (!fs::exists(fs::symlink_status(place, ignored))) break;
+    place = spoolStamp(now) + "-" + std::to_string(n);
+    if (!outbox.has(place)) break;
   }
-  if (::rename(pending().c_str(), place.c_str()) != 0) return noteWriteFailure(place, errno);
-  if (const int error = host_.makeFolders(pending()); error != 0) noteWriteFailure(pending(), error);
-  syncFolder(outbox());
+  error = spool.rename(std::string(kPending), outbox, place);
+  if (error == 0) error = spool.makeFolder(std::string(kPending), pending);
+  if (error == 0) error = outbox.sync();
+  if (error == 0) error = spool.sync();
+  if (error != 0) noteFailure(kOutbox, error);
 }
 
 void LogSpool::rollCarewell() {
-  const fs::path carewell = folder() / "Carewell";
-  std::error_code ignored;
-  if (!fs::is_directory(carewell, ignored)) return;
+  DeviceFolder spool, carewell;
+  int error = host_.files().openFolder(std::string(kFolder).append("/").append(kCarewell), carewell);
+  if (error == ENOENT || error == kUnusableRoot) return;
   FileLock lock;
-  if (const int error = lockSpool(lock); error != 0) return noteWriteFailure(carewell, error);
-  for (const fs::path& file : filesIn(carewell)) {
-    if (file.extension() != ".log") continue;
+  if (error == 0) error = lockSpool(spool, lock);
+  std::vector<std::string> names;
+  if (error == 0) error = carewell.names(names);
+  if (error != 0) return noteFailure(kCarewell, error);
+  for (const std::string& name : names) {
+    if (!name.ends_with(".log")) continue;
     for (int generation = kCarewellGenerations; generation >= 1; --generation) {
-      const fs::path older = file.native() + "." + std::to_string(generation);
-      const fs::path newer =
-          generation == 1 ? file : fs::path(file.native() + "." + std::to_string(generation - 1));
-      if (::rename(newer.c_str(), older.c_str()) == 0 || errno == ENOENT) continue;
-      noteWriteFailure(older, errno);
+      const std::string older = name + "." + std::to_string(generation);
+      const std::string newer = generation == 1 ? name : name + "." + std::to_string(generation - 1);
+      error = carewell.rename(newer, carewell, older);
+      if (error == 0 || error == ENOENT) continue;
+      noteWriteFailure(carewell.place(older), error);
       break;  // going on would replace the generation that could not move
     }
   }

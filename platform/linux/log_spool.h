@@ -1,33 +1,40 @@
-// The folders of var/mobile/Library/Logs/: logs that wait for submission (Pending/), what was handed over
-// (Outbox/), structured data by type and day (Structured/), and the Carewell logs. One lock file serialises
-// the processes that change them.
+// The folders of var/mobile/Library/Logs/: logs that wait for submission (Pending/), logs that nobody agreed
+// to send (Withheld/), what was handed over (Outbox/), structured data by type and day (Structured/), and the
+// Carewell logs. One lock file serialises the processes that change them.
 #pragma once
 
-#include <filesystem>
 #include <string>
 #include <string_view>
 
-#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host.h"
 #include "platform/log_submission.h"
 #include "platform/property_list_codec.h"
 
 namespace tbdaily {
 
+// Whether logs may leave this device.
+enum class Consent : bool { No, Yes };
+
 class LogSpool {
  public:
+  static constexpr std::string_view kFolder = "/var/mobile/Library/Logs";
+  static constexpr std::string_view kPending = "Pending";    // leaves with the next submission
+  static constexpr std::string_view kWithheld = "Withheld";  // written without consent: stays
+  static constexpr std::string_view kOutbox = "Outbox";
+
   LogSpool(const Host& host, PropertyListCodec& codec) : host_(host), codec_(codec) {}
 
-  // Pending/<name>-<YYYY-MM-DD-HHMMSS>-<n>.<type> and <the same>.meta.plist: both or neither, the log last.
-  bool writePending(std::string_view type, std::string_view name, const PlistValue& options, PlistDate now,
-                    const LogWriter& writer);
+  // <name>-<YYYY-MM-DD-HHMMSS>-<n>.<type> and <the same>.meta.plist, in Pending/ or, without consent, in
+  // Withheld/: both or neither, the log last.
+  bool writeLog(Consent consent, std::string_view type, std::string_view name, const PlistValue& options,
+                PlistDate now, const LogWriter& writer);
 
   // One line of JSON to Structured/<type>/<YYYY-MM-DD>.jsonl, in one write.
   void appendStructured(int type, const PlistDictionary& data, PlistDate now);
 
-  // Moves the structured files of days before today to Pending/structured-<type>-<YYYY-MM-DD>.jsonl; where a
-  // file of that name still waits there, "-1", "-2" ... follows the date.
-  void dumpOldStructured(PlistDate now);
+  // Moves the structured files of days before today to structured-<type>-<YYYY-MM-DD>.jsonl in Pending/ or
+  // Withheld/; where a file of that name still waits there, "-1", "-2" ... follows the date.
+  void dumpOldStructured(Consent consent, PlistDate now);
 
   // Moves all of Pending/ to a new Outbox/<YYYY-MM-DD-HHMMSS>-<n>/; nothing when nothing is pending.
   void submitPending(PlistDate now);
@@ -35,12 +42,12 @@ class LogSpool {
   // Carewell/x.log to x.log.1, x.log.1 to x.log.2 and so on, keeping five.
   void rollCarewell();
 
-  std::filesystem::path folder() const { return host_.devicePath("/var/mobile/Library/Logs"); }
-  std::filesystem::path pending() const { return folder() / "Pending"; }
-  std::filesystem::path outbox() const { return folder() / "Outbox"; }
-
  private:
-  int lockSpool(FileLock& lock) const;
+  // The folder of all logs, made, and its lock.
+  int lockSpool(DeviceFolder& folder, FileLock& lock) const;
+  int moveOldStructured(const DeviceFolder& from, const std::string& type, std::string_view today,
+                        const DeviceFolder& to);
+  void noteFailure(std::string_view folder, int error) const;
 
   const Host& host_;
   PropertyListCodec& codec_;

@@ -18,9 +18,9 @@ constexpr const char* kLogs = "/var/mobile/Library/Logs/";
 class SpoolTest : public ::testing::Test {
  protected:
   bool write(const char* name, bool whole = true, double at = kNow) {
-    return spool.writePending("165", name, {}, PlistDate::fromUnixSeconds(at), [&](LogOutput& output) {
-      return output.write(std::as_bytes(std::span("text", 4))) && whole;
-    });
+    return spool.writeLog(
+        Consent::Yes, "165", name, {}, PlistDate::fromUnixSeconds(at),
+        [&](LogOutput& output) { return output.write(std::as_bytes(std::span("text", 4))) && whole; });
   }
   Names names(const char* folder) { return device.names(std::string(kLogs) + folder); }
   std::string text(const std::string& file) { return device.text(kLogs + file); }
@@ -41,7 +41,11 @@ TEST_F(SpoolTest, NumbersLogsAndClearsWhatADeadWriterLeft) {
                                      "log-2026-11-24-090704-1.165", "log-2026-11-24-090704-2.165",
                                      "log-2026-11-24-090704-2.165.meta.plist"}));
   EXPECT_EQ(text("Pending/log-2026-11-24-090704-1.165"), "a log of somebody else");
-  EXPECT_EQ(plistText(device.parse(text("Pending/log-2026-11-24-090704-0.165.meta.plist"))),
+  PlistDictionary meta =
+      device.parse(text("Pending/log-2026-11-24-090704-0.165.meta.plist")).mutableDictionary();
+  EXPECT_EQ(meta.get("id").asString().value_or("").size(), 36U);
+  meta.set("id", {});
+  EXPECT_EQ(plistText(PlistValue::dictionary(meta)),
             R"({"type": "165", "name": "log", "created": 2026-11-24 09:07:04 +0000})");
 }
 
@@ -51,7 +55,7 @@ TEST_F(SpoolTest, TakesNothingWhereItCannotWrite) {
   put("Carewell", "");
   EXPECT_FALSE(write("log"));
   spool.appendStructured(172, {}, kDate);
-  spool.dumpOldStructured(kDate);
+  spool.dumpOldStructured(Consent::Yes, kDate);
   spool.submitPending(kDate);
   spool.rollCarewell();
   EXPECT_EQ(text("Pending"), "a file in the folder's place");
@@ -80,7 +84,7 @@ TEST_F(SpoolTest, DumpsOldDaysUnderNamesOfTheirOwn) {
                            "172/2026-11-24.jsonl", "172/notes.txt"})
     put(std::string("Structured/") + file, file);
   put("Pending/structured-172-2026-11-23.jsonl", "waits");
-  spool.dumpOldStructured(kDate);
+  spool.dumpOldStructured(Consent::Yes, kDate);
   EXPECT_EQ(names("Pending"), (Names{"structured-172-2026-11-22.jsonl", "structured-172-2026-11-23-1.jsonl",
                                      "structured-172-2026-11-23.jsonl", "structured-176-2026-11-23.jsonl"}));
   EXPECT_EQ(text("Pending/structured-172-2026-11-23.jsonl"), "waits");
@@ -106,7 +110,7 @@ TEST_F(SpoolTest, SubmitsAllThatIsPendingOnceAndKeepsFiveCarewellLogs) {
   }
   EXPECT_EQ(names("Carewell"), (Names{"x.log.1", "x.log.2", "x.log.3", "x.log.4", "x.log.5"}));
   EXPECT_EQ(text("Carewell/x.log.5"), "3");
-  fs::remove(device.host.devicePath(std::string(kLogs) + "Carewell/x.log.5"));
+  fs::remove(device.host.files().place(std::string(kLogs) + "Carewell/x.log.5"));
   put("Carewell/x.log.5/in the way", "");
   put("Carewell/x.log", "8");
   spool.rollCarewell();

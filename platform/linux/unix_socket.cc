@@ -16,20 +16,14 @@ namespace tbdaily {
 
 namespace {
 
-// Calls the function with an address of the path. A path that is too long for an address is reached through a
-// descriptor of its folder.
-int withAddress(const std::filesystem::path& path,
+// Calls the function with the address of a name in the folder, which is reached through its descriptor: paths
+// of any length, and no other folder than that one.
+int withAddress(const DeviceFolder& folder, const std::string& name,
                 const std::function<int(const sockaddr*, socklen_t)>& call) {
   sockaddr_un address{};
   address.sun_family = AF_UNIX;
-  FileDescriptor folder;
-  std::string text = path.native();
-  if (text.size() >= sizeof address.sun_path) {
-    folder = FileDescriptor(::open(path.parent_path().c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-    if (!folder.isOpen()) return errno;
-    text = "/proc/self/fd/" + std::to_string(folder.get()) + "/" + path.filename().native();
-    if (text.size() >= sizeof address.sun_path) return ENAMETOOLONG;
-  }
+  const std::string text = folder.throughDescriptor(name).native();
+  if (text.size() >= sizeof address.sun_path) return ENAMETOOLONG;
   std::memcpy(address.sun_path, text.c_str(), text.size() + 1);
   return call(reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0 ? 0 : errno;
 }
@@ -52,29 +46,29 @@ bool isListeningUnixStream(int fd) {
 
 }  // namespace
 
-SocketResult connectUnixSocket(const std::filesystem::path& path) {
+SocketResult connectUnixSocket(const DeviceFolder& folder, const std::string& name) {
   FileDescriptor fd(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
   if (!fd.isOpen()) return {FileDescriptor(), errno};
   const int error =
-      withAddress(path, [&fd](const sockaddr* a, socklen_t n) { return ::connect(fd.get(), a, n); });
+      withAddress(folder, name, [&fd](const sockaddr* a, socklen_t n) { return ::connect(fd.get(), a, n); });
   if (error != 0) return {FileDescriptor(), error};
   return {std::move(fd), 0};
 }
 
-SocketResult listenUnixSocket(const std::filesystem::path& path) {
+SocketResult listenUnixSocket(const DeviceFolder& folder, const std::string& name) {
   FileDescriptor fd(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
   if (!fd.isOpen()) return {FileDescriptor(), errno};
   // Under another name until it listens: whoever sees the socket can connect to it.
-  std::filesystem::path unready = path;
-  unready += ".starting";
-  ::unlink(unready.c_str());
+  const std::string unready = name + ".starting";
+  folder.remove(unready);
   const mode_t mask = ::umask(0177);
-  int error = withAddress(unready, [&fd](const sockaddr* a, socklen_t n) { return ::bind(fd.get(), a, n); });
+  int error =
+      withAddress(folder, unready, [&fd](const sockaddr* a, socklen_t n) { return ::bind(fd.get(), a, n); });
   ::umask(mask);
   if (error != 0) return {FileDescriptor(), error};
-  if (::listen(fd.get(), SOMAXCONN) != 0 || ::rename(unready.c_str(), path.c_str()) != 0) {
-    error = errno;
-    ::unlink(unready.c_str());
+  error = ::listen(fd.get(), SOMAXCONN) == 0 ? folder.rename(unready, folder, name) : errno;
+  if (error != 0) {
+    folder.remove(unready);
     return {FileDescriptor(), error};
   }
   return {std::move(fd), 0};

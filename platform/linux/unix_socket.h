@@ -1,9 +1,9 @@
-// Unix stream sockets at paths of any length.
+// Unix stream sockets in folders of the device, at paths of any length.
 #pragma once
 
-#include <filesystem>
+#include <string>
 
-#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/device_files.h"
 
 namespace tbdaily {
 
@@ -13,12 +13,12 @@ struct SocketResult {
   int error = 0;
 };
 
-// A connection to the socket at the path.
-SocketResult connectUnixSocket(const std::filesystem::path& path);
+// A connection to the socket of this name.
+SocketResult connectUnixSocket(const DeviceFolder& folder, const std::string& name);
 
-// A listening, non-blocking socket of mode 0600 at the path, in the place of whatever is there. It appears
+// A listening, non-blocking socket of mode 0600 with this name, in the place of whatever has it. It appears
 // when it can be connected to; the caller sees to it that nobody else makes it at the same time.
-SocketResult listenUnixSocket(const std::filesystem::path& path);
+SocketResult listenUnixSocket(const DeviceFolder& folder, const std::string& name);
 
 // The first listening Unix stream socket that the service manager passed to this process (LISTEN_PID,
 // LISTEN_FDS); not open when there is none.

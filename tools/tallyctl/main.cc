@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "platform/linux/base/process_start.h"
 #include "tools/tallyctl/tool.h"
 
 namespace {
@@ -72,6 +73,7 @@ std::vector<std::string> reversedWords(int argc, char** argv) {
 }  // namespace
 
 int main(int argc, char** argv) {
+  tbdaily::prepareProcess();
   Tool tool;
   CLI::App app;
   try {

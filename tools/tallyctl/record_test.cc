@@ -24,11 +24,13 @@ class RecordTest : public ::testing::Test {
         store, input.get(), [this](std::uint64_t bytes) { bytesRead = bytes; }, imported);
   }
   std::unique_ptr<OpenAnalyticsHistory> history() {
-    return SqliteAnalyticsHistory([this] { return std::optional(store.file()); }).open();
+    return SqliteAnalyticsHistory([this] { return std::optional(place); }).open();
   }
 
   testing::TemporaryFolder folder;
-  AnalyticsStore store{folder.path() / "store"};
+  const DeviceFiles files{folder.path()};
+  const StorePlace place = storePlaceOf(files, "/store");
+  AnalyticsStore store{place};
   ImportedRows imported;
   std::uint64_t bytesRead = 0;
 };

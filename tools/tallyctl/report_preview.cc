@@ -1,13 +1,15 @@
 #include "tools/tallyctl/report_preview.h"
 
+#include <fcntl.h>
+#include <sys/stat.h>
+
 #include "driver/daily_tasks.h"
 #include "driver/environment_probes.h"
 #include "platform/analytics_home.h"
-#include "platform/dynamic_loader.h"
 #include "platform/file_system.h"
 #include "platform/kernel.h"
-#include "platform/linux/store/analytics_store.h"
 #include "platform/linux/store/sqlite_analytics_history.h"
+#include "platform/linux/store/store_locator.h"
 #include "platform/log_submission.h"
 #include "platform/platform.h"
 #include "platform/preferences_store.h"
@@ -31,44 +33,6 @@ class ReadOnlyPreferences : public PreferencesStore {
 
  private:
   PreferencesStore& real_;
-};
-
-// Binds the real functions, except that the one that stores does nothing.
-class ReadOnlyLoader : public DynamicLoader {
- public:
-  explicit ReadOnlyLoader(DynamicLoader& real) : real_(real) {}
-  LibraryHandle open(std::string_view path) override { return real_.open(path); }
-  void* symbol(LibraryHandle library, const std::string& name) override {
-    void* found = real_.symbol(library, name);
-    if (found == nullptr || name != "SMXPreferencesSetValue") return found;
-    const PreferencesSetValue nothing = [](const char*, std::int64_t, const char*) {};
-    return reinterpret_cast<void*>(nothing);
-  }
-
- private:
-  DynamicLoader& real_;
-};
-
-// Answers for the store's file with the copy, which is as large as the store will be once a run has asked for
-// its checkpoint.
-class StoreCopyFileSystem : public FileSystem {
- public:
-  StoreCopyFileSystem(FileSystem& real, std::string storePath, std::filesystem::path copy)
-      : real_(real), storePath_(std::move(storePath)), copy_(std::move(copy)) {}
-  std::optional<FileStatus> status(std::string_view path) override {
-    if (path != storePath_) return real_.status(path);
-    std::error_code error;
-    const auto size = std::filesystem::file_size(copy_, error);
-    return error ? std::nullopt : std::optional(FileStatus{static_cast<std::int64_t>(size)});
-  }
-  std::optional<std::vector<std::byte>> readFile(std::string_view path) override {
-    return real_.readFile(path);
-  }
-
- private:
-  FileSystem& real_;
-  std::string storePath_;
-  std::filesystem::path copy_;
 };
 
 // Keeps the one log that is written, and lets nothing else happen.
@@ -103,15 +67,18 @@ class CapturedSubmission : public LogSubmission {
   LogSubmission& real_;
 };
 
-// Brings the copy to the state that the store has once a run has asked for its checkpoint. Why it cannot be
-// used, of the store itself; empty when it can, or is missing.
-std::string checkpointCopy(const StoreCopy& copy, const std::filesystem::path& store) {
-  std::error_code ignored;
-  if (!std::filesystem::exists(copy.path(), ignored)) return {};
-  std::string error = AnalyticsStore(copy.path()).checkpoint().error;
-  const std::size_t place = error.find(copy.path().native());
-  return place == std::string::npos ? error
-                                    : error.replace(place, copy.path().native().size(), store.native());
+// What a run would find: the copy has the size of the store with its log written back, as a run does first.
+// Nothing of the device is loaded for the count of damages: it is the preference that the device's library
+// keeps it in.
+StoreProbes probesOver(const FileDescriptor& copy, Platform& real) {
+  return {[&copy]() -> std::int64_t {
+            struct stat status {};
+            return copy.isOpen() && ::fstat(copy.get(), &status) == 0 ? status.st_size / kBytesPerMiB : -1;
+          },
+          [&real]() -> std::int64_t {
+            const bool isKept = real.fileSystem.status(kSupportLibraryPath).has_value();
+            return isKept ? real.preferences.getInteger(kCorruptionCountKey, kCorruptionCountDomain) : 0;
+          }};
 }
 
 std::string whyNothing(const CapturedLog& log, DayNumber day) {
@@ -125,23 +92,27 @@ std::string whyNothing(const CapturedLog& log, DayNumber day) {
 
 Outcome<PlistValue> previewReport(LinuxPlatform& linux, std::optional<DayNumber> day) {
   Platform& real = linux.services();
-  const std::string* home = real.analyticsHome.find().path;
-  const std::string storePath = home != nullptr ? analyticsDatabasePath(*home) : "";
-  const StoreCopy copy(home != nullptr ? linux.host().devicePath(storePath) : std::filesystem::path());
-  if (!copy.error().empty()) return Failure{copy.error()};
-  if (const std::string fault = checkpointCopy(copy, linux.host().devicePath(storePath)); !fault.empty())
-    return Failure{fault};
+  const AnalyticsStoreLocator locate = analyticsStoreLocator(linux.host(), real.analyticsHome);
+  OpenedStore opened;
+  FileDescriptor file;
+  if (const auto place = locate()) {
+    auto copy = copyStore(*place);
+    if (!copy) return Failure{copy.reason()};
+    if (copy->file.isOpen()) {
+      file = FileDescriptor(::fcntl(copy->file.get(), F_DUPFD_CLOEXEC, 0));
+      opened = openStoreCopy(std::move(copy->file), std::move(copy->log), *place);
+      if (!opened.result.ok()) return Failure{opened.result.error};
+    }
+  }
 
   CapturedLog log;
   ReadOnlyPreferences preferences(real.preferences);
-  ReadOnlyLoader loader(real.dynamicLoader);
-  StoreCopyFileSystem fileSystem(real.fileSystem, storePath, copy.path());
   CapturedSubmission submission(real.logSubmission);
-  SqliteAnalyticsHistory history([&copy] { return std::optional(copy.path()); });
-  Platform preview = platformWith(real, preferences, submission, history, log, fileSystem, loader);
+  SqliteAnalyticsHistory history(locate, [&opened](const StorePlace&) { return std::move(opened); });
+  Platform preview = platformWith(real, preferences, submission, history, log);
 
   const DayNumber wanted = day ? *day : dayBefore(real.analyticsClient.currentDayNumber());
-  TBReport(preview, storeProbes(preview)).writeLogForYesterdayWithAppInfo(wanted, PlistValue());
+  TBReport(preview, probesOver(file, real)).writeLogForYesterdayWithAppInfo(wanted, PlistValue());
   if (submission.output.bytes.empty()) return Failure{whyNothing(log, wanted)};
   PlistParseResult parsed = real.propertyListCodec.parse(submission.output.bytes);
   if (!parsed.error.empty()) return Failure{std::move(parsed.error)};

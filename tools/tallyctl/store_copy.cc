@@ -1,67 +1,96 @@
 #include "tools/tallyctl/store_copy.h"
 
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <array>
 #include <cerrno>
 #include <chrono>
 #include <cstdlib>
-#include <optional>
+#include <filesystem>
 #include <thread>
+#include <vector>
 
-#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host_notes.h"
-#include "platform/linux/store/store_file.h"
 
 namespace tbdaily {
-
-namespace fs = std::filesystem;
 
 namespace {
 
 constexpr int kAttempts = 50;
 constexpr auto kPause = std::chrono::milliseconds(20);
+constexpr std::size_t kChunk = std::size_t{1} << 20;
 
-// The state of both files, to tell whether somebody wrote while they were copied.
-using StoreState = std::array<std::optional<FileIdentity>, 2>;
-
-StoreState stateOf(const fs::path& store) {
-  return {fileIdentity(store), fileIdentity(storeLogOf(store))};
+// A file of TMPDIR that has no name, or loses it at once where the file system knows no other way.
+int makeUnnamed(FileDescriptor& file) {
+  std::error_code error;
+  const std::filesystem::path folder = std::filesystem::temp_directory_path(error);
+  if (error) return error.value();
+  file = FileDescriptor(::open(folder.c_str(), O_TMPFILE | O_RDWR | O_CLOEXEC, 0600));
+  if (file.isOpen()) return 0;
+  std::string name = (folder / "tallyctl-XXXXXX").native();
+  file = FileDescriptor(::mkostemp(name.data(), O_CLOEXEC));
+  if (!file.isOpen()) return errno;
+  return ::unlink(name.c_str()) == 0 ? 0 : errno;
 }
 
-std::error_code copyIfThere(const fs::path& from, const fs::path& to) {
-  std::error_code error;
-  fs::remove(to, error);
-  if (!fs::exists(from, error)) return {};
-  fs::copy_file(from, to, error);
-  return error;
+int copyBytes(const FileDescriptor& from, const FileDescriptor& to) {
+  std::vector<std::byte> chunk(kChunk);
+  if (::ftruncate(to.get(), 0) != 0 || ::lseek(to.get(), 0, SEEK_SET) != 0) return errno;
+  while (true) {
+    const ssize_t count = ::read(from.get(), chunk.data(), chunk.size());
+    if (count < 0 && errno == EINTR) continue;
+    if (count <= 0) return count == 0 ? 0 : errno;
+    if (const int error = writeAll(to.get(), std::span(chunk).first(static_cast<std::size_t>(count)));
+        error != 0)
+      return error;
+  }
+}
+
+// The state of both files, to tell whether somebody wrote while they were copied.
+using StoreState = std::array<FileIdentity, 2>;
+
+StoreState stateOf(const DeviceFolder& folder, const std::string& name) {
+  StoreState state;
+  struct stat status {};
+  if (folder.status(name, status) == 0) state[0] = FileIdentity::of(status);
+  if (folder.status(storeLogOf(name), status) == 0) state[1] = FileIdentity::of(status);
+  return state;
+}
+
+// A file that is missing gives an empty copy.
+int copyIfThere(const DeviceFolder& folder, const std::string& name, const FileDescriptor& to) {
+  FileDescriptor from;
+  const int error = folder.openForReading(name, from);
+  if (error == ENOENT) return ::ftruncate(to.get(), 0) == 0 ? 0 : errno;
+  return error == 0 ? copyBytes(from, to) : error;
 }
 
 }  // namespace
 
-StoreCopy::StoreCopy(const fs::path& store) {
-  std::error_code ignored;
-  std::string name = (fs::temp_directory_path(ignored) / "tallyctl-XXXXXX").native();
-  if (::mkdtemp(name.data()) == nullptr) {
-    error_ = "no folder for a copy of the store can be made: " + errorText(errno);
-    return;
-  }
-  folder_ = name;
-  path_ = folder_ / store.filename();
+Outcome<StoreCopy> copyStore(const StorePlace& store) {
+  const std::string shown = store.file().native();
+  StoreCopy copy;
+  DeviceFolder folder;
+  int error = store.files->openFolder(store.folder, folder);
+  if (error == ENOENT) return copy;
+  if (error != 0) return Failure{shown + " cannot be read: " + errorText(error)};
+  if (!folder.has(store.name)) return copy;
+  error = makeUnnamed(copy.file);
+  if (error == 0) error = makeUnnamed(copy.log);
+  if (error != 0) return Failure{"no file for a copy of the store can be made: " + errorText(error)};
   for (int attempt = 0; attempt < kAttempts; ++attempt) {
-    const StoreState before = stateOf(store);
-    std::error_code error = copyIfThere(store, path_);
-    if (!error) error = copyIfThere(storeLogOf(store), storeLogOf(path_));
-    if (stateOf(store) == before) {
-      if (error) error_ = store.native() + " cannot be copied: " + error.message();
-      return;
+    const StoreState before = stateOf(folder, store.name);
+    error = copyIfThere(folder, store.name, copy.file);
+    if (error == 0) error = copyIfThere(folder, storeLogOf(store.name), copy.log);
+    if (stateOf(folder, store.name) == before) {
+      if (error != 0) return Failure{shown + " cannot be copied: " + errorText(error)};
+      return copy;
     }
     std::this_thread::sleep_for(kPause);
   }
-  error_ = store.native() + " is being written all the time; try again later";
-}
-
-StoreCopy::~StoreCopy() {
-  std::error_code ignored;
-  if (!folder_.empty()) fs::remove_all(folder_, ignored);
+  return Failure{shown + " is being written all the time; try again later"};
 }
 
 }  // namespace tbdaily

@@ -2,27 +2,18 @@
 // write-ahead log leaves traces beside it.
 #pragma once
 
-#include <filesystem>
-#include <string>
+#include "platform/linux/store/store_file.h"
+#include "tools/tallyctl/outcome.h"
 
 namespace tbdaily {
 
-class StoreCopy {
- public:
-  // Copies the store and its write-ahead log into a folder of its own, which the destructor removes. A store
-  // that is missing gives a copy that is missing.
-  explicit StoreCopy(const std::filesystem::path& store);
-  ~StoreCopy();
-  StoreCopy(const StoreCopy&) = delete;
-  StoreCopy& operator=(const StoreCopy&) = delete;
-
-  const std::string& error() const { return error_; }  // empty on success
-  const std::filesystem::path& path() const { return path_; }
-
- private:
-  std::filesystem::path folder_;
-  std::filesystem::path path_;
-  std::string error_;
+struct StoreCopy {
+  // Without a name from the beginning: whatever ends the process, nothing of them stays. Not open for a store
+  // that is missing.
+  FileDescriptor file, log;
 };
+
+// Copies the store and its write-ahead log into files of TMPDIR.
+Outcome<StoreCopy> copyStore(const StorePlace& store);
 
 }  // namespace tbdaily

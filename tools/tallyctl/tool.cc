@@ -2,7 +2,8 @@
 
 #include <cstdio>
 #include <cstdlib>
-#include <filesystem>
+
+#include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 
@@ -20,11 +21,11 @@ bool Tool::namesRoot() const {
 }
 
 bool Tool::hasUsableRoot() {
-  const std::filesystem::path& root = platform().host().root();
-  std::error_code error;
-  if (std::filesystem::is_directory(root, error)) return true;
-  fail("the device root " + root.native() +
-       " is no folder; make a device there with tallyctl init, or name another --root");
+  const Host& host = platform().host();
+  const int error = host.files().examineRoot();
+  if (error == 0) return true;
+  fail("the device root " + host.root().native() + " cannot be used: " + errorText(error) +
+       "; make a device there with tallyctl init, or name another --root");
   return false;
 }
 

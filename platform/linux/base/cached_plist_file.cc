@@ -6,21 +6,15 @@
 
 namespace tbdaily {
 
-void CachedPlistFile::refresh(const std::filesystem::path& place, PropertyListCodec& codec) {
-  const auto identity = fileIdentity(place);
-  if (!identity) {
-    *this = {};
-  } else if (identity != identity_) {
-    read(place, codec);
-  }
+void CachedPlistFile::refresh(const DeviceFiles& files, const std::string& path, PropertyListCodec& codec) {
+  if (identity_ == FileIdentity{} || !files.isUnchanged(path, identity_)) read(files, path, codec);
 }
 
-void CachedPlistFile::read(const std::filesystem::path& place, PropertyListCodec& codec) {
+void CachedPlistFile::read(const DeviceFiles& files, const std::string& path, PropertyListCodec& codec) {
   *this = {};
-  forget();  // what cannot be read is tried again
   FileContents contents;
-  if (const int error = readRegularFile(place, contents); error != 0) {
-    state_ = error == ENOENT ? State::Missing : State::Unreadable;
+  if (const int error = files.readFile(path, contents); error != 0) {
+    state_ = error == ENOENT || error == kUnusableRoot ? State::Missing : State::Unreadable;
     fault_ = errorText(error);
     return;
   }

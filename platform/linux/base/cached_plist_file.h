@@ -1,11 +1,9 @@
 // A property-list file that is parsed anew only when it changed.
 #pragma once
 
-#include <filesystem>
-#include <optional>
 #include <string>
 
-#include "platform/linux/base/file_io.h"
+#include "platform/linux/base/device_files.h"
 #include "platform/plist_value.h"
 #include "platform/property_list_codec.h"
 
@@ -15,10 +13,10 @@ class CachedPlistFile {
  public:
   enum class State { Missing, Readable, Damaged, Unreadable };
 
-  // Looks at the file as it stands now.
-  void refresh(const std::filesystem::path& place, PropertyListCodec& codec);
+  // Looks at the file of the device as it stands now.
+  void refresh(const DeviceFiles& files, const std::string& path, PropertyListCodec& codec);
   // The next look reads the file, whatever became of it meanwhile.
-  void forget() { identity_ = FileIdentity{}; }
+  void forget() { identity_ = {}; }
 
   State state() const { return state_; }
   // A dictionary; an empty one unless the file is readable.
@@ -27,9 +25,9 @@ class CachedPlistFile {
   const std::string& fault() const { return fault_; }
 
  private:
-  void read(const std::filesystem::path& place, PropertyListCodec& codec);
+  void read(const DeviceFiles& files, const std::string& path, PropertyListCodec& codec);
 
-  std::optional<FileIdentity> identity_;  // none: there was no file
+  FileIdentity identity_;  // that of no file: read again
   State state_ = State::Missing;
   PlistValue root_ = PlistValue::dictionary({});
   std::string fault_;

@@ -7,14 +7,10 @@
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
-#include <cstdio>
-#include <cstdlib>
 #include <ctime>
 #include <thread>
 
 namespace tbdaily {
-
-namespace fs = std::filesystem;
 
 void FileDescriptor::reset() {
   if (fd_ >= 0) ::close(fd_);
@@ -24,12 +20,6 @@ void FileDescriptor::reset() {
 FileIdentity FileIdentity::of(const struct stat& status) {
   return {status.st_dev,          status.st_ino,         status.st_size,        status.st_mtim.tv_sec,
           status.st_mtim.tv_nsec, status.st_ctim.tv_sec, status.st_ctim.tv_nsec};
-}
-
-std::optional<FileIdentity> fileIdentity(const fs::path& path) {
-  struct stat status {};
-  if (::stat(path.c_str(), &status) != 0) return std::nullopt;
-  return FileIdentity::of(status);
 }
 
 namespace {
@@ -45,12 +35,10 @@ bool isSettled(const FileIdentity& identity) {
 }
 }  // namespace
 
-int readRegularFile(const fs::path& path, FileContents& contents, std::size_t maximumSize) {
-  const FileDescriptor fd(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  if (!fd.isOpen()) return errno;
+int readOpenFile(int fd, FileContents& contents, std::size_t maximumSize) {
   struct stat status {};
-  if (::fstat(fd.get(), &status) != 0) return errno;
-  if (!S_ISREG(status.st_mode)) return EINVAL;
+  if (::fstat(fd, &status) != 0) return errno;
+  if (!S_ISREG(status.st_mode)) return kNotARegularFile;
   if (static_cast<std::uint64_t>(status.st_size) > maximumSize) return EFBIG;
   contents.identity = FileIdentity::of(status);
   if (!isSettled(contents.identity)) contents.identity = {};
@@ -60,7 +48,7 @@ int readRegularFile(const fs::path& path, FileContents& contents, std::size_t ma
   std::size_t filled = 0;
   while (true) {
     if (filled == contents.bytes.size()) contents.bytes.resize(filled + std::max<std::size_t>(filled / 8, 1));
-    const ssize_t count = ::read(fd.get(), contents.bytes.data() + filled, contents.bytes.size() - filled);
+    const ssize_t count = ::read(fd, contents.bytes.data() + filled, contents.bytes.size() - filled);
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) return errno;
     if (count == 0) break;
@@ -72,18 +60,9 @@ int readRegularFile(const fs::path& path, FileContents& contents, std::size_t ma
   return 0;
 }
 
-int makeFolders(const fs::path& folder) {
-  if (::mkdir(folder.c_str(), 0700) == 0) return 0;
-  const int error = errno;
-  if (error == EEXIST) {
-    struct stat status {};
-    if (::stat(folder.c_str(), &status) != 0) return errno;
-    return S_ISDIR(status.st_mode) ? 0 : ENOTDIR;
-  }
-  if (error != ENOENT || !folder.has_relative_path()) return error;
-  const int parentError = makeFolders(folder.parent_path());
-  if (parentError != 0) return parentError;
-  return ::mkdir(folder.c_str(), 0700) == 0 || errno == EEXIST ? 0 : errno;
+int readHostFile(const std::filesystem::path& path, FileContents& contents, std::size_t maximumSize) {
+  const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+  return file.isOpen() ? readOpenFile(file.get(), contents, maximumSize) : errno;
 }
 
 int writeAll(int fd, std::span<const std::byte> bytes) {
@@ -100,56 +79,9 @@ int writeAll(int fd, std::string_view text) {
   return writeAll(fd, std::as_bytes(std::span(text)));
 }
 
-int syncFolder(const fs::path& folder) {
-  const FileDescriptor fd(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  if (!fd.isOpen()) return errno;
-  return ::fsync(fd.get()) == 0 ? 0 : errno;
-}
-
-TemporaryFile::~TemporaryFile() {
-  if (!path_.empty()) ::unlink(path_.c_str());
-}
-
-int TemporaryFile::create(const fs::path& folder) {
-  std::string name = (folder / (std::string(kNamePrefix) + "XXXXXX")).native();
-  fd_ = FileDescriptor(::mkostemp(name.data(), O_CLOEXEC));
-  if (!fd_.isOpen()) return errno;
-  path_ = name;
-  return 0;
-}
-
-int TemporaryFile::sync() {
-  return ::fsync(fd_.get()) == 0 ? 0 : errno;
-}
-
-int TemporaryFile::replace(const fs::path& place) {
-  if (const int error = sync(); error != 0) return error;
-  if (::rename(path_.c_str(), place.c_str()) != 0) return errno;
-  path_.clear();
-  return 0;
-}
-
-int TemporaryFile::placeNew(const fs::path& place) {
-  if (const int error = sync(); error != 0) return error;
-  if (::link(path_.c_str(), place.c_str()) != 0) return errno;
-  ::unlink(path_.c_str());
-  path_.clear();
-  return 0;
-}
-
-int replaceFile(const fs::path& place, std::string_view contents) {
-  TemporaryFile file;
-  if (const int error = file.create(place.parent_path()); error != 0) return error;
-  if (const int error = writeAll(file.fd(), contents); error != 0) return error;
-  return file.replace(place);
-}
-
-int FileLock::acquire(const fs::path& lockFile, double timeoutSeconds) {
-  fd_ =
-      FileDescriptor(::open(lockFile.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
-  if (!fd_.isOpen()) return errno;
+int waitForLock(int fd, double timeoutSeconds) {
   const auto deadline = std::chrono::steady_clock::now() + std::chrono::duration<double>(timeoutSeconds);
-  while (::flock(fd_.get(), LOCK_EX | LOCK_NB) != 0) {
+  while (::flock(fd, LOCK_EX | LOCK_NB) != 0) {
     const int error = errno;
     if (error != EWOULDBLOCK && error != EINTR) return error;
     if (std::chrono::steady_clock::now() >= deadline) return EWOULDBLOCK;

@@ -1,5 +1,5 @@
-// Files on the host: owned descriptors, whole reads, files that appear whole or not at all, locks between
-// processes. Failures are errno values, 0 is success.
+// Open files: owned descriptors, whole reads and writes, locks between processes. Failures are errno values
+// or a FileRefusal, 0 is success.
 #pragma once
 
 #include <sys/stat.h>
@@ -7,7 +7,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
-#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -15,6 +14,16 @@
 #include <vector>
 
 namespace tbdaily {
+
+// Why the door to the device's files refuses one, beside the errno values.
+enum FileRefusal : int {
+  kForeignLink = 0x10000,  // a symbolic link of another user is on the way
+  kLinkInPlace,            // a symbolic link in the place of a file
+  kNotARegularFile,        // a folder, pipe, socket or device in the place of a file
+  kSecondName,             // a file that is written in place and has a second name
+  kOutside,                // what must lie below a folder leads out of it
+  kUnusableRoot,           // the device root cannot be opened, which has been named already
+};
 
 // Owns a file descriptor.
 class FileDescriptor {
@@ -49,9 +58,6 @@ struct FileIdentity {
   friend bool operator==(const FileIdentity&, const FileIdentity&) = default;
 };
 
-// The identity of the file that the path leads to; nothing when there is none.
-std::optional<FileIdentity> fileIdentity(const std::filesystem::path& path);
-
 struct FileContents {
   std::vector<std::byte> bytes;
   // The file's, by which a later look may tell that it is unchanged; that of no file where it may not, since
@@ -61,58 +67,18 @@ struct FileContents {
 
 inline constexpr std::size_t kMaximumFileSize = std::size_t{1} << 30;
 
-// Reads a regular file whole. Anything else (a folder, a pipe) fails at once with EINVAL and never blocks; a
-// file of more than `maximumSize` bytes fails with EFBIG.
-int readRegularFile(const std::filesystem::path& path, FileContents& contents,
-                    std::size_t maximumSize = kMaximumFileSize);
-
-// Makes the folder and its missing parents, mode 0700.
-int makeFolders(const std::filesystem::path& folder);
+// Reads an open file whole. Anything but a regular file fails with kNotARegularFile, a file of more than
+// `maximumSize` bytes with EFBIG.
+int readOpenFile(int fd, FileContents& contents, std::size_t maximumSize = kMaximumFileSize);
+// The same for a path of the host, outside of the device root; never blocks.
+int readHostFile(const std::filesystem::path& path, FileContents& contents,
+                 std::size_t maximumSize = kMaximumFileSize);
 
 int writeAll(int fd, std::span<const std::byte> bytes);
 int writeAll(int fd, std::string_view text);
 
-// Forces a folder's entries to storage.
-int syncFolder(const std::filesystem::path& folder);
-
-// A file of mode 0600 that is written beside its place under a passing name and then put there; without that,
-// its destructor removes it. Passing names begin with ".tmp-".
-class TemporaryFile {
- public:
-  static constexpr std::string_view kNamePrefix = ".tmp-";
-
-  ~TemporaryFile();
-  TemporaryFile() = default;
-  TemporaryFile(const TemporaryFile&) = delete;
-  TemporaryFile& operator=(const TemporaryFile&) = delete;
-
-  int create(const std::filesystem::path& folder);
-  int fd() const { return fd_.get(); }
-  const std::filesystem::path& path() const { return path_; }
-  // Forces the contents to storage, then takes the place, replacing what is there.
-  int replace(const std::filesystem::path& place);
-  // The same, but fails with EEXIST where something is there.
-  int placeNew(const std::filesystem::path& place);
-
- private:
-  int sync();
-  FileDescriptor fd_;
-  std::filesystem::path path_;
-};
-
-// Replaces the file by one with these contents, atomically. Its folder must be there.
-int replaceFile(const std::filesystem::path& place, std::string_view contents);
-
-// An exclusive lock between processes on a file of its own, held until destruction. Waits 5 seconds for
-// another holder.
-class FileLock {
- public:
-  // 0, or EWOULDBLOCK when the other holder kept it, or what opening the lock file failed with.
-  int acquire(const std::filesystem::path& lockFile, double timeoutSeconds = 5.0);
-
- private:
-  FileDescriptor fd_;
-};
+// Waits for an exclusive lock (flock) of the open file: 0, or EWOULDBLOCK when another holder kept it.
+int waitForLock(int fd, double timeoutSeconds);
 
 // 1 to 200 letters, digits, '.', '-', '_', not beginning with '.': a name that may become part of a file
 // name.

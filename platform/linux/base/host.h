@@ -3,7 +3,10 @@
 #pragma once
 
 #include <filesystem>
+#include <memory>
 #include <string_view>
+
+#include "platform/linux/base/device_files.h"
 
 namespace tbdaily {
 
@@ -15,20 +18,16 @@ class Host {
   // From TBDAILY_ROOT (unset or empty: "/") and TBDAILY_LIVE ("0" switches the live sources off).
   static Host fromEnvironment();
 
-  const std::filesystem::path& root() const { return root_; }
+  const std::filesystem::path& root() const { return files_->root(); }
   bool live() const { return live_; }
 
-  // The place on the host of an absolute path of the device. "..", as a component, cannot leave the root.
-  std::filesystem::path devicePath(std::string_view absolutePath) const;
+  // The door to the device's files, for as long as the host or a copy of it is there.
+  const DeviceFiles& files() const { return *files_; }
   // The place of a live source given by its absolute path.
   std::filesystem::path livePath(std::string_view absolutePath) const;
 
-  // Makes a folder below the root and its missing parents, mode 0700; never the root itself. 0 or an errno
-  // value.
-  int makeFolders(const std::filesystem::path& folder) const;
-
  private:
-  std::filesystem::path root_;
+  std::shared_ptr<const DeviceFiles> files_;
   bool live_;
   std::filesystem::path liveRoot_;
 };

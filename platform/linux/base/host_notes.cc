@@ -7,6 +7,8 @@
 #include <set>
 #include <system_error>
 
+#include "platform/linux/base/file_io.h"
+
 namespace tbdaily {
 
 namespace {
@@ -41,7 +43,9 @@ void noteOnce(const std::string& line) {
 }
 
 void noteWriteFailure(const std::filesystem::path& path, int error) {
-  if (!isFirstOfKind(error)) return;
+  if (error == kUnusableRoot) return;
+  const bool isRefusal = error >= kForeignLink;  // the place matters, each time
+  if (!isRefusal && !isFirstOfKind(error)) return;
   noteOnce("cannot write " + path.native() + ": " +
            (error == EWOULDBLOCK ? "another program keeps it locked" : errorText(error)));
 }
@@ -52,6 +56,22 @@ void noteUnusableRoot(const std::filesystem::path& root, int error) {
 }
 
 std::string errorText(int error) {
+  switch (error) {
+    case kForeignLink:
+      return "a symbolic link of another user is on the way";
+    case kLinkInPlace:
+      return "a symbolic link is in its place";
+    case kNotARegularFile:
+      return "it is not a regular file";
+    case kSecondName:
+      return "the file has a second name";
+    case kOutside:
+      return "it leads out of its folder";
+    case kUnusableRoot:
+      return "the device root cannot be used";
+    default:
+      break;
+  }
   std::string text = std::generic_category().message(error);
   if (!text.empty() && text[0] >= 'A' && text[0] <= 'Z' && text.size() > 1 && text[1] >= 'a') {
     text[0] = static_cast<char>(text[0] - 'A' + 'a');

@@ -15,7 +15,7 @@ void noteWriteFailure(const std::filesystem::path& path, int error);
 // The same for a device root that cannot be used at all.
 void noteUnusableRoot(const std::filesystem::path& root, int error);
 
-// "permission denied" and the like, for an errno value.
+// "permission denied" and the like, for an errno value or a FileRefusal.
 std::string errorText(int error);
 
 }  // namespace tbdaily

@@ -9,7 +9,7 @@ class RecordedConfiguration : public StackSnapshotConfiguration {
   explicit RecordedConfiguration(Recordings& recordings) : recordings_(recordings) {}
   KdStatus setFlags(std::uint64_t) override { return kKdSuccess; }
   KdStatus capture() override {
-    captured_ = fileIdentity(recordings_.path(recording::kStackSnapshot)) &&
+    captured_ = recordings_.has(recording::kStackSnapshot) &&
                 recordings_.readFile(recording::kStackSnapshot, contents_) &&
                 contents_.bytes.size() <= UINT32_MAX;
     return captured_ ? kKdSuccess : kKdNotFound;

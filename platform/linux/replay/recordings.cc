@@ -1,13 +1,11 @@
 #include "platform/linux/replay/recordings.h"
 
-#include <algorithm>
-
 #include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
 
-std::filesystem::path Recordings::path(std::string_view file) const {
-  return host_.devicePath(recording::kFolder) / file;
+std::string Recordings::path(std::string_view file) {
+  return std::string(recording::kFolder).append("/").append(file);
 }
 
 PlistValue Recordings::load(std::string_view file) {
@@ -16,24 +14,24 @@ PlistValue Recordings::load(std::string_view file) {
   auto found = loaded_.find(file);
   if (found == loaded_.end()) found = loaded_.try_emplace(std::string(file)).first;
   CachedPlistFile& loaded = found->second;
-  const std::filesystem::path place = path(file);
-  loaded.refresh(place, codec_);
+  loaded.refresh(host_.files(), path(file), codec_);
   if (loaded.state() == State::Damaged || loaded.state() == State::Unreadable)
-    noteOnce("recording " + place.native() + " is ignored: " + loaded.fault());
+    noteOnce("recording " + host_.files().place(path(file)).native() + " is ignored: " + loaded.fault());
   return loaded.root();
 }
 
 bool Recordings::readFile(std::string_view file, FileContents& contents) {
-  const std::filesystem::path folder = path("").parent_path();
-  const std::filesystem::path place = (folder / file).lexically_normal();
-  // What a recording names comes from outside: it leads nowhere else.
-  if (std::mismatch(folder.begin(), folder.end(), place.begin(), place.end()).first != folder.end()) {
-    noteOnce("recorded file " + place.native() + " is ignored: it lies outside of " + folder.native());
-    return false;
-  }
-  const int error = readRegularFile(place, contents);
-  if (error != 0) noteOnce("recorded file " + place.native() + " is ignored: " + errorText(error));
+  // What a recording names comes from outside: it leads nowhere else, by its name or through a link.
+  const int error = host_.files().readFileBelow(recording::kFolder, file, contents);
+  if (error != 0)
+    noteOnce("recorded file " + host_.files().place(path(file)).native() +
+             " is ignored: " + errorText(error));
   return error == 0;
+}
+
+bool Recordings::has(std::string_view file) const {
+  struct stat ignored {};
+  return host_.files().status(path(file), ignored) == 0;
 }
 
 PlistValue Recordings::entry(std::string_view file, std::string_view key) {

@@ -28,8 +28,9 @@ class Recordings {
   // there.
   bool readFile(std::string_view file, FileContents& contents);
 
-  // The place of a file under System/Device/.
-  std::filesystem::path path(std::string_view file) const;
+  bool has(std::string_view file) const;
+  // The path of a file under System/Device/.
+  static std::string path(std::string_view file);
 
  private:
   const Host& host_;

@@ -85,7 +85,7 @@ TEST(RecordingsTest, AreReadAgainWhenTheyChangeOrCouldNotBeRead) {
   }
   device.put("/System/Device/answers.plist", "<plist><dict>");
   EXPECT_EQ(build(), "-");
-  const fs::path place = device.host.devicePath("/System/Device/answers.plist");
+  const fs::path place = device.host.files().place("/System/Device/answers.plist");
   fs::remove(place);
   fs::create_directory(place);
   EXPECT_EQ(build(), "-");

@@ -1,6 +1,5 @@
 #include "platform/linux/store/analytics_store.h"
 
-#include <fcntl.h>
 #include <sqlite3.h>
 #include <unistd.h>
 
@@ -9,7 +8,6 @@
 #include <limits>
 #include <utility>
 
-#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
@@ -39,9 +37,6 @@ const std::array<std::string_view, AnalyticsStore::QueryCount> AnalyticsStore::k
     "DELETE FROM keys WHERE NOT EXISTS (SELECT 1 FROM scalars WHERE key_id = keys.id) "
     "AND NOT EXISTS (SELECT 1 FROM distribution_values WHERE key_id = keys.id)",
 };
-
-AnalyticsStore::AnalyticsStore(std::filesystem::path file, std::chrono::milliseconds busyTimeout)
-    : file_(std::move(file)), busyTimeout_(busyTimeout) {}
 
 StoreResult AnalyticsStore::setScalar(std::string_view key, DayNumber day, std::int64_t value) {
   return writeRow(key, [&](LoadedKey& entry) { return putScalar(entry.id, day, value); });
@@ -126,20 +121,28 @@ StoreResult AnalyticsStore::checkpoint() {
   if (StoreResult opened = open(MissingStore::Leave); !opened.ok() || !database_.isOpen()) return opened;
   bool complete = false;
   if (const int code = database_.truncateLog(complete); code != SQLITE_OK) return failure(code);
-  if (complete) return {};
+  if (complete) return succeeded();
   // Somebody reads: the log has to stay, and is forced to storage as it is.
-  const std::filesystem::path logFile = database_.logFile();
-  const FileDescriptor log(::open(logFile.c_str(), O_RDONLY | O_CLOEXEC));
-  if (log.isOpen() && ::fsync(log.get()) == 0) return {};
-  return {StoreFault::Failed, logFile.native() + ": " + errorText(errno), 0};
+  const std::string log = storeLogOf(place_.name);
+  DeviceFolder folder;
+  FileDescriptor file;
+  int error = place_.files->openFolder(place_.folder, folder);
+  if (error == 0) error = folder.openForReading(log, file);
+  if (error == 0 && ::fsync(file.get()) != 0) error = errno;
+  if (error == 0) return {};
+  return {StoreFault::Failed, folder.place(log).native() + ": " + errorText(error), 0};
 }
 
 StoreResult AnalyticsStore::open(MissingStore missing) {
   // Within a load the connection stays what it is: a new one would have lost what was loaded.
   if (loading_) return {};
-  if (database_.isOpen() && !database_.hasMoved()) return {};
+  if (place_.condition->isDamaged()) close();
+  if (database_.isOpen() && !database_.hasMoved()) {
+    database_.setBusyTimeout(place_.condition->patience());
+    return {};
+  }
   close();
-  OpenedStore opened = openStoreForWriting(file_, missing, busyTimeout_);
+  OpenedStore opened = openStoreForWriting(place_, missing);
   database_ = std::move(opened.database);
   return std::move(opened.result);
 }
@@ -181,7 +184,7 @@ StoreResult AnalyticsStore::transaction(const Body& body) {
 StoreResult AnalyticsStore::commit() {
   if (!database_.isOpen()) return brokenOff();
   const int code = database_.execute("COMMIT");
-  if (code == SQLITE_OK) return {};
+  if (code == SQLITE_OK) return succeeded();
   StoreResult result = failure(code);
   rollback();
   return result;
@@ -193,20 +196,29 @@ void AnalyticsStore::rollback() {
 
 StoreResult AnalyticsStore::failure(int code) {
   if (code == kNoSequenceLeft) {
-    return {StoreFault::Failed, file_.native() + ": no value can be added to this key and day", 0};
+    return {StoreFault::Failed, file().native() + ": no value can be added to this key and day", 0};
   }
-  StoreResult result = storeFailure(database_, file_);
-  // A connection to a damaged store is of no use: the next operation looks at the file again.
-  if (result.fault == StoreFault::Unusable) close();
+  StoreResult result = storeFailure(database_, place_);
+  // Nothing more is written to a damaged store, its log included.
+  if (result.fault == StoreFault::Unusable) {
+    place_.condition->setDamaged();
+    close();
+  }
   return result;
 }
 
+StoreResult AnalyticsStore::succeeded() {
+  place_.condition->setLocked(false);
+  return {};
+}
+
 StoreResult AnalyticsStore::brokenOff() const {
-  return {StoreFault::Failed, file_.native() + ": the load was broken off", 0};
+  return {StoreFault::Failed, file().native() + ": the load was broken off", 0};
 }
 
 void AnalyticsStore::close() {
   statements_ = {};
+  if (database_.isOpen() && place_.condition->isDamaged()) database_.keepLogOnClose();
   database_.close();
 }
 

@@ -2,12 +2,11 @@
 //
 // Opens its file at first use and makes it at the first write. Each operation is one transaction and, between
 // programs, atomic; between beginLoad and commitLoad all operations are one. A failed operation changes
-// nothing. A store that another program keeps locked is waited for, 5 seconds by default. Operations may come
+// nothing. A store that another program keeps locked is waited for, once. Operations may come
 // from several threads; a load is one thread's.
 #pragma once
 
 #include <array>
-#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
@@ -31,10 +30,10 @@ struct PrunedRows {
 
 class AnalyticsStore {
  public:
-  explicit AnalyticsStore(std::filesystem::path file,
-                          std::chrono::milliseconds busyTimeout = kStoreBusyTimeout);
+  explicit AnalyticsStore(StorePlace place) : place_(std::move(place)) {}
 
-  const std::filesystem::path& file() const { return file_; }
+  // On the host, for messages.
+  std::filesystem::path file() const { return place_.file(); }
 
   StoreResult setScalar(std::string_view key, DayNumber day, std::int64_t value);
   // An absent value counts as 0; wraps at 64 bits.
@@ -86,6 +85,7 @@ class AnalyticsStore {
   void rollback();
   StoreResult failure(int code);
   StoreResult brokenOff() const;
+  StoreResult succeeded();
   void close();
   SqliteStatement& statement(Query query);
 
@@ -94,8 +94,7 @@ class AnalyticsStore {
   int putScalar(std::int64_t keyId, DayNumber day, std::int64_t value);
   int putValues(LoadedKey& key, DayNumber day, std::int32_t secondsInDay, std::span<const double> values);
 
-  const std::filesystem::path file_;
-  const std::chrono::milliseconds busyTimeout_;
+  const StorePlace place_;
   std::mutex mutex_;
   SqliteDatabase database_;
   std::array<SqliteStatement, QueryCount> statements_;  // prepared at first use; gone before the database

@@ -26,8 +26,13 @@ using testing::Lines;
 
 struct StoredAnalytics : testing::TestPlatform {
   const std::string folder = "/var/mobile/Library/Tallybook";
-  const fs::path file = host.devicePath(folder) / "TBDataStore.sqlitedb";
-  AnalyticsStore store{file, 50ms};
+  const fs::path file = host.files().place(folder) / "TBDataStore.sqlitedb";
+  StorePlace place() {
+    StorePlace p = storePlaceOf(host.files(), folder + "/TBDataStore.sqlitedb");
+    p.condition = std::make_shared<StoreCondition>(50ms);
+    return p;
+  }
+  AnalyticsStore store{place()};
 
   void setToday(PlistDate now) { setClock(now.unixSeconds()); }
   void addScalar(std::string_view key, DayNumber day, std::int64_t value) {
@@ -44,11 +49,15 @@ class AnalyticsStoreTest : public ::testing::Test, protected StoredAnalytics {
   Lines scalars() { return testing::scalarLines(*history()); }
   Lines distributions() { return testing::distributionLines(*history()); }
 
+  int openFile(SqliteDatabase& database) {
+    return database.open(std::make_shared<DeviceFolder>(openFolder(folder)), file.filename(),
+                         SqliteMode::ReadWrite, 50ms);
+  }
   // What another program does to the file.
   void sql(const std::string& statements) {
     if (!fs::exists(file)) putAt(file, "");
     SqliteDatabase database;
-    ASSERT_EQ(database.open(file, SqliteMode::ReadWrite, 50ms), 0);
+    ASSERT_EQ(openFile(database), 0);
     ASSERT_EQ(database.execute(statements.c_str()), 0) << database.errorMessage();
   }
   // Names and bytes of the store's folder.
@@ -84,7 +93,7 @@ TEST_F(AnalyticsStoreTest, IsMadeAtTheFirstWriteForItsOwnerAlone) {
 
 TEST_F(AnalyticsStoreTest, LeavesAStoreThatItCannotUseAsItIs) {
   const auto withTables = [&](const std::string& more) {
-    EXPECT_TRUE(AnalyticsStore(file, 50ms).setScalar("k", 1, 1).ok());
+    EXPECT_TRUE(AnalyticsStore(place()).setScalar("k", 1, 1).ok());
     sql(more);
   };
   const std::map<std::string, std::function<void()>> cases{
@@ -94,7 +103,7 @@ TEST_F(AnalyticsStoreTest, LeavesAStoreThatItCannotUseAsItIs) {
        [&] {
          withTables("PRAGMA journal_mode = WAL");
          SqliteDatabase other;
-         ASSERT_EQ(other.open(file, SqliteMode::ReadWrite, 50ms), 0);
+         ASSERT_EQ(openFile(other), 0);
          other.keepLogOnClose();
          ASSERT_EQ(other.execute("PRAGMA user_version = 3"), 0);
          other.close();
@@ -141,7 +150,7 @@ TEST_F(AnalyticsStoreTest, WritesToTheFileThatIsThereNowAndTakesAnEmptyOneForANe
 TEST_F(AnalyticsStoreTest, LosesNoAdditionOfSeveralWritersAtOnce) {
   constexpr int kAdditions = 200;
   const auto add = [this] {
-    AnalyticsStore own(file);
+    AnalyticsStore own(storePlaceOf(host.files(), folder + "/TBDataStore.sqlitedb"));
     bool isGood = true;
     for (int i = 0; i < kAdditions; ++i)
       isGood &= own.addScalar("k", 1, 1).ok() && own.appendDistributionValues("d", 1, 0, {{1.0}}).ok();
@@ -163,7 +172,7 @@ TEST_F(AnalyticsStoreTest, GivesUpOnALockedStoreAndGoesOnWhenItIsFree) {
   EXPECT_TRUE(store.setScalar("k", 1, 1).ok());
   {
     SqliteDatabase other;
-    ASSERT_EQ(other.open(file, SqliteMode::ReadWrite, 50ms), 0);
+    ASSERT_EQ(openFile(other), 0);
     ASSERT_EQ(other.execute("BEGIN IMMEDIATE"), 0);
     EXPECT_EQ(store.addScalar("k", 1, 1).fault, StoreFault::Locked);
     EXPECT_EQ(scalars(), Lines{"k 1 1"});
@@ -247,11 +256,17 @@ TEST_F(AnalyticsStoreTest, EndsAtADamagedPageOfALargeStore) {
   std::fstream(file, std::ios::in | std::ios::out | std::ios::binary).seekp(middle)
       << std::string(4096, '\xA5');
 
+  const auto before = folderContents();
   EXPECT_EQ(scalars(), Lines{"k 1 1"});
-  const Lines rows = distributions();
+  const auto damaged = history();
+  const Lines rows = testing::distributionLines(*damaged);
+  EXPECT_FALSE(damaged->isWhole());
   ASSERT_EQ(rows.size(), 1U);
   const std::size_t delivered = (rows[0].size() - std::string("k 1:").size()) / 2;
   EXPECT_TRUE(delivered > 100000 && delivered < values.size()) << delivered;
+  services.analyticsClient.setValueForScalarKey("k", 2);  // nothing more is written
+  services.analyticsClient.checkpoint();
+  EXPECT_EQ(before.at("TBDataStore.sqlitedb"), folderContents().at("TBDataStore.sqlitedb"));
 }
 
 TEST(AnalyticsStoreLocator, FollowsTheAnalyticsHomeAndMakesNoRoot) {
@@ -262,11 +277,11 @@ TEST(AnalyticsStoreLocator, FollowsTheAnalyticsHomeAndMakesNoRoot) {
   const testing::TemporaryFolder root;
   const Host host(root.path(), false), absent(root.path() / "absent", false);
   const AnalyticsStoreLocator locate = analyticsStoreLocator(host, home);
-  EXPECT_EQ(locate(), std::nullopt);
+  EXPECT_FALSE(locate());
   EXPECT_EQ(testing::scalarLines(*SqliteAnalyticsHistory(locate).open()), Lines{});
   device.containers["systemgroup.com.velmora.sysmetrics"] = "/group";
-  EXPECT_EQ(locate(), root.path() / "group/Library/Tallybook/TBDataStore.sqlitedb");
-  EXPECT_EQ(analyticsStoreLocator(absent, home)(), std::nullopt);
+  EXPECT_EQ(locate().value().file(), root.path() / "group/Library/Tallybook/TBDataStore.sqlitedb");
+  EXPECT_FALSE(analyticsStoreLocator(absent, home)());
   EXPECT_FALSE(fs::exists(absent.root()));
 }
 

@@ -22,9 +22,8 @@ void noteLostWrite(const AnalyticsStore& store, std::string_view key, const Stor
 
 }  // namespace
 
-SqliteAnalyticsClient::SqliteAnalyticsClient(AnalyticsStoreLocator locate, Kernel& kernel,
-                                             std::chrono::milliseconds busyTimeout)
-    : locate_(std::move(locate)), kernel_(kernel), busyTimeout_(busyTimeout) {}
+SqliteAnalyticsClient::SqliteAnalyticsClient(AnalyticsStoreLocator locate, Kernel& kernel)
+    : locate_(std::move(locate)), kernel_(kernel) {}
 
 DayNumber SqliteAnalyticsClient::currentDayNumber() {
   return dayNumberOf(kernel_.currentTime());
@@ -80,9 +79,9 @@ void SqliteAnalyticsClient::writeAll(Write write, std::span<const ScalarFigure> 
 AnalyticsStore* SqliteAnalyticsClient::store() {
   const std::lock_guard lock(mutex_);
   if (!store_) {
-    const std::optional<std::filesystem::path> file = locate_();
-    if (!file) return nullptr;
-    store_.emplace(*file, busyTimeout_);
+    std::optional<StorePlace> place = locate_();
+    if (!place) return nullptr;
+    store_.emplace(std::move(*place));
   }
   return &*store_;
 }

@@ -3,7 +3,6 @@
 // A write that fails is lost and named on standard error. Operations may come from several threads.
 #pragma once
 
-#include <chrono>
 #include <mutex>
 #include <optional>
 
@@ -16,8 +15,7 @@ namespace tbdaily {
 
 class SqliteAnalyticsClient : public AnalyticsClient {
  public:
-  SqliteAnalyticsClient(AnalyticsStoreLocator locate, Kernel& kernel,
-                        std::chrono::milliseconds busyTimeout = kStoreBusyTimeout);
+  SqliteAnalyticsClient(AnalyticsStoreLocator locate, Kernel& kernel);
 
   DayNumber currentDayNumber() override;
   DayNumber dayNumberOfDate(PlistDate date) override;
@@ -38,7 +36,6 @@ class SqliteAnalyticsClient : public AnalyticsClient {
 
   AnalyticsStoreLocator locate_;
   Kernel& kernel_;
-  std::chrono::milliseconds busyTimeout_;
   std::mutex mutex_;  // over finding the store
   std::optional<AnalyticsStore> store_;
 };

@@ -48,31 +48,47 @@ bool isInt32(std::int64_t value) {
 // What an enumeration needs of the history that it runs on.
 class Reader {
  public:
-  Reader(SqliteDatabase database, std::filesystem::path file)
-      : database_(std::move(database)), file_(std::move(file)) {}
+  Reader(SqliteDatabase database, StorePlace place)
+      : database_(std::move(database)), place_(std::move(place)) {}
+  ~Reader() {
+    if (hasFailed_ && database_.isOpen()) database_.keepLogOnClose();
+  }
+  Reader(const Reader&) = delete;
+  Reader& operator=(const Reader&) = delete;
 
   SqliteDatabase& database() { return database_; }
   bool isOpen() const { return database_.isOpen(); }
 
   // Names what ended an enumeration early.
   void noteEnd(int code) {
-    if (code != SQLITE_DONE) noteOnce(storeFailure(database_, file_).error);
+    if (code == SQLITE_DONE) return;
+    const StoreResult result = storeFailure(database_, place_);
+    if (result.fault == StoreFault::Unusable) place_.condition->setDamaged();
+    hasFailed_ = true;
+    noteOnce(result.error);
   }
   // Rows that come in another order than that of their index are the work of a damaged index, which may go
   // round in circles.
-  void noteDisorder() { noteOnce(unusableStore(file_, "its rows are out of order").error); }
+  void noteDisorder() {
+    place_.condition->setDamaged();
+    hasFailed_ = true;
+    noteOnce(unusableStore(place_, "its rows are out of order").error);
+  }
+  // Whether an enumeration ended early, so that what it delivered is a part.
+  bool hasFailed() const { return hasFailed_; }
   void noteForeignRow() {
-    noteOnce(file_.native() + ": rows with values of a foreign type or range are passed over");
+    noteOnce(place_.file().native() + ": rows with values of a foreign type or range are passed over");
   }
   bool isUsableKey(std::string_view key) {
     if (!analyticsKeyFault(key)) return true;
-    noteOnce(file_.native() + ": rows with keys that no report can carry are passed over");
+    noteOnce(place_.file().native() + ": rows with keys that no report can carry are passed over");
     return false;
   }
 
  private:
   SqliteDatabase database_;
-  std::filesystem::path file_;
+  StorePlace place_;
+  bool hasFailed_ = false;
 };
 
 // The values of one key and day. Asks the store for none of them before the first is wanted.
@@ -188,13 +204,14 @@ class DayWalk {
 
 class LinuxOpenHistory : public OpenAnalyticsHistory {
  public:
-  LinuxOpenHistory(SqliteDatabase database, std::filesystem::path file)
-      : reader_(std::move(database), std::move(file)) {}
+  LinuxOpenHistory(SqliteDatabase database, StorePlace place)
+      : reader_(std::move(database), std::move(place)) {}
 
   void enumerateScalars(std::string_view keyPrefix, DayNumber minimumDay, DayNumber maximumDay,
                         const ScalarRowCallback& row) override;
   void enumerateDistributions(std::string_view keyPrefix, DayNumber minimumDay, DayNumber maximumDay,
                               const DistributionRowCallback& row) override;
+  bool isWhole() const override { return !reader_.hasFailed(); }
 
  private:
   bool enumerateDays(std::string_view key, std::int64_t keyId, DayWalk& days, SqliteStatement& values,
@@ -282,21 +299,25 @@ class EmptyHistory : public OpenAnalyticsHistory {
   void enumerateScalars(std::string_view, DayNumber, DayNumber, const ScalarRowCallback&) override {}
   void enumerateDistributions(std::string_view, DayNumber, DayNumber,
                               const DistributionRowCallback&) override {}
+  bool isWhole() const override { return true; }
 };
 
 }  // namespace
 
+SqliteAnalyticsHistory::SqliteAnalyticsHistory(AnalyticsStoreLocator locate)
+    : SqliteAnalyticsHistory(std::move(locate), openStoreForReading) {}
+
 SqliteAnalyticsHistory::SqliteAnalyticsHistory(AnalyticsStoreLocator locate,
-                                               std::chrono::milliseconds busyTimeout)
-    : locate_(std::move(locate)), busyTimeout_(busyTimeout) {}
+                                               std::function<OpenedStore(const StorePlace&)> open)
+    : locate_(std::move(locate)), open_(std::move(open)) {}
 
 std::unique_ptr<OpenAnalyticsHistory> SqliteAnalyticsHistory::open() {
-  const std::optional<std::filesystem::path> file = locate_();
-  if (!file) return std::make_unique<EmptyHistory>();
-  OpenedStore store = openStoreForReading(*file, busyTimeout_);
+  std::optional<StorePlace> place = locate_();
+  if (!place) return std::make_unique<EmptyHistory>();
+  OpenedStore store = open_(*place);
   if (!store.result.ok()) noteOnce(store.result.error);
   if (!store.database.isOpen()) return std::make_unique<EmptyHistory>();
-  return std::make_unique<LinuxOpenHistory>(std::move(store.database), *file);
+  return std::make_unique<LinuxOpenHistory>(std::move(store.database), std::move(*place));
 }
 
 }  // namespace tbdaily

@@ -5,7 +5,7 @@
 // over and named once on standard error, as is a store that cannot be read.
 #pragma once
 
-#include <chrono>
+#include <functional>
 
 #include "platform/analytics_history.h"
 #include "platform/linux/store/store_file.h"
@@ -15,14 +15,15 @@ namespace tbdaily {
 
 class SqliteAnalyticsHistory : public AnalyticsHistory {
  public:
-  explicit SqliteAnalyticsHistory(AnalyticsStoreLocator locate,
-                                  std::chrono::milliseconds busyTimeout = kStoreBusyTimeout);
+  explicit SqliteAnalyticsHistory(AnalyticsStoreLocator locate);
+  // Over what the function opens of the place.
+  SqliteAnalyticsHistory(AnalyticsStoreLocator locate, std::function<OpenedStore(const StorePlace&)> open);
 
   std::unique_ptr<OpenAnalyticsHistory> open() override;
 
  private:
   AnalyticsStoreLocator locate_;
-  std::chrono::milliseconds busyTimeout_;
+  std::function<OpenedStore(const StorePlace&)> open_;
 };
 
 }  // namespace tbdaily

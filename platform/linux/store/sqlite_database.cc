@@ -1,6 +1,15 @@
 #include "platform/linux/store/sqlite_database.h"
 
+#include <fcntl.h>
 #include <sqlite3.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <map>
+#include <mutex>
+#include <optional>
 
 #include "platform/hexadecimal.h"
 #include "platform/linux/base/host_notes.h"
@@ -12,6 +21,97 @@ namespace {
 constexpr int kPrimaryCode = 0xff;
 // Longer texts and blobs end in SQLITE_TOOBIG instead of being read into memory.
 constexpr int kLongestValue = 1 << 20;
+
+// The default file layer of SQLite with two differences: a path is taken as it is (looking for the file that
+// it means would leave the folder's descriptor), and what is opened is judged.
+constexpr const char* kFileLayer = "device";
+
+// The logs of files without a name, by the path that SQLite makes of the file's: such a path does not exist.
+class UnnamedLogs {
+ public:
+  static UnnamedLogs& all() {
+    static UnnamedLogs logs;
+    return logs;
+  }
+  void add(const std::string& path, int file) {
+    const std::lock_guard lock(mutex_);
+    files_[path] = file;
+  }
+  void remove(const std::string& path) {
+    const std::lock_guard lock(mutex_);
+    files_.erase(path);
+  }
+  std::optional<int> find(std::string_view path) {
+    const std::lock_guard lock(mutex_);
+    const auto found = files_.find(path);
+    return found != files_.end() ? std::optional(found->second) : std::nullopt;
+  }
+
+ private:
+  std::mutex mutex_;
+  std::map<std::string, int, std::less<>> files_;
+};
+
+std::string descriptorPath(int file) {
+  return "/proc/self/fd/" + std::to_string(file);
+}
+bool isDescriptorPath(std::string_view path) {
+  constexpr std::string_view kPrefix = "/proc/self/fd/";
+  return path.starts_with(kPrefix) && path.find('/', kPrefix.size()) == path.npos;
+}
+
+// Opens a regular file or a folder alone. Never waits for the other end of a pipe.
+int openJudged(const char* path, int flags, int mode) {
+  const auto log = UnnamedLogs::all().find(path);
+  const std::string meant = log ? descriptorPath(*log) : path;
+  if (isDescriptorPath(meant))
+    flags &= ~(O_NOFOLLOW | O_CREAT);  // the one link that leads to a file without a name
+  const int file = ::open(meant.c_str(), flags | O_NONBLOCK | O_NOCTTY | O_CLOEXEC, mode);
+  if (file < 0) return file;
+  struct stat status {};
+  int error = ::fstat(file, &status) == 0 ? 0 : errno;
+  const bool isWritten = (flags & O_ACCMODE) != O_RDONLY;
+  if (error == 0 && !S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode)) error = kNotARegularFile;
+  if (error == 0 && isWritten && status.st_nlink > 1) error = kSecondName;
+  if (error == 0) return file;
+  ::close(file);
+  errno = error;
+  return -1;
+}
+
+int takePathAsItIs(sqlite3_vfs*, const char* path, int room, char* out) {
+  const std::size_t length = std::strlen(path) + 1;
+  if (length > static_cast<std::size_t>(room)) return SQLITE_CANTOPEN;
+  std::memcpy(out, path, length);
+  return SQLITE_OK;
+}
+
+sqlite3_vfs* usualFileLayer() {
+  static sqlite3_vfs* const usual = (sqlite3_initialize(), sqlite3_vfs_find(nullptr));
+  return usual;
+}
+
+int knowUnnamedLogs(sqlite3_vfs*, const char* path, int question, int* answer) {
+  const auto log = UnnamedLogs::all().find(path);
+  if (!log) return usualFileLayer()->xAccess(usualFileLayer(), path, question, answer);
+  struct stat status {};
+  *answer = ::fstat(*log, &status) == 0 && status.st_size > 0 ? 1 : 0;
+  return SQLITE_OK;
+}
+
+int registerFileLayer() {
+  static const int result = [] {
+    sqlite3_vfs* usual = usualFileLayer();
+    if (usual == nullptr || usual->iVersion < 3) return SQLITE_ERROR;
+    usual->xSetSystemCall(usual, "open", reinterpret_cast<sqlite3_syscall_ptr>(openJudged));
+    static sqlite3_vfs layer = *usual;
+    layer.zName = kFileLayer;
+    layer.xFullPathname = takePathAsItIs;
+    layer.xAccess = knowUnnamedLogs;
+    return sqlite3_vfs_register(&layer, 0);
+  }();
+  return result;
+}
 
 std::string fileUri(const std::filesystem::path& file, SqliteMode mode) {
   constexpr std::string_view kPlain = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-._~/";
@@ -90,14 +190,53 @@ void SqliteDatabase::Closer::operator()(sqlite3* connection) const {
   sqlite3_close_v2(connection);
 }
 
-int SqliteDatabase::open(const std::filesystem::path& file, SqliteMode mode,
+int SqliteDatabase::open(std::shared_ptr<const DeviceFolder> folder, const std::string& name, SqliteMode mode,
                          std::chrono::milliseconds busyTimeout) {
+  if (const int code = registerFileLayer(); code != SQLITE_OK) return code;
   const int flags = (mode == SqliteMode::ReadWrite ? SQLITE_OPEN_READWRITE : SQLITE_OPEN_READONLY) |
                     SQLITE_OPEN_URI | SQLITE_OPEN_NOMUTEX;
   sqlite3* connection = nullptr;
-  const int code = sqlite3_open_v2(fileUri(file, mode).c_str(), &connection, flags, nullptr);
+  const std::string uri = fileUri(folder->throughDescriptor(name), mode);
+  connection_.reset();
+  folder_ = std::move(folder);
+  const int code = sqlite3_open_v2(uri.c_str(), &connection, flags, kFileLayer);
   connection_.reset(connection);
   return code == SQLITE_OK ? configure(busyTimeout) : code & kPrimaryCode;
+}
+
+class SqliteDatabase::UnnamedLog {
+ public:
+  UnnamedLog(std::string path, FileDescriptor file) : path_(std::move(path)), file_(std::move(file)) {
+    UnnamedLogs::all().add(path_, file_.get());
+  }
+  ~UnnamedLog() { UnnamedLogs::all().remove(path_); }
+  UnnamedLog(const UnnamedLog&) = delete;
+  UnnamedLog& operator=(const UnnamedLog&) = delete;
+
+ private:
+  const std::string path_;
+  const FileDescriptor file_;
+};
+
+void SqliteDatabase::UnnamedLogCloser::operator()(UnnamedLog* log) const {
+  delete log;
+}
+
+int SqliteDatabase::openUnnamed(FileDescriptor file, FileDescriptor log) {
+  if (const int code = registerFileLayer(); code != SQLITE_OK) return code;
+  connection_.reset();
+  unnamed_ = std::move(file);
+  const std::string path = descriptorPath(unnamed_.get());
+  unnamedLog_.reset(new UnnamedLog(path + "-wal", std::move(log)));
+  sqlite3* connection = nullptr;
+  const int code =
+      sqlite3_open_v2(path.c_str(), &connection, SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX, kFileLayer);
+  connection_.reset(connection);
+  if (code != SQLITE_OK) return code & kPrimaryCode;
+  if (const int configured = configure({}); configured != SQLITE_OK) return configured;
+  keepLogOnClose();
+  // Nobody else can have it open: no shared index.
+  return execute("PRAGMA locking_mode = EXCLUSIVE");
 }
 
 int SqliteDatabase::openImage(std::vector<std::byte> image) {
@@ -122,13 +261,17 @@ int SqliteDatabase::openImage(std::vector<std::byte> image) {
 
 int SqliteDatabase::configure(std::chrono::milliseconds busyTimeout) {
   sqlite3* connection = connection_.get();
-  sqlite3_busy_timeout(connection, static_cast<int>(busyTimeout.count()));
+  setBusyTimeout(busyTimeout);
   sqlite3_limit(connection, SQLITE_LIMIT_LENGTH, kLongestValue);
   sqlite3_db_config(connection, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
   sqlite3_db_config(connection, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
   sqlite3_db_config(connection, SQLITE_DBCONFIG_ENABLE_TRIGGER, 0, nullptr);
   sqlite3_db_config(connection, SQLITE_DBCONFIG_ENABLE_VIEW, 0, nullptr);
   return execute("PRAGMA cell_size_check = ON");
+}
+
+void SqliteDatabase::setBusyTimeout(std::chrono::milliseconds busyTimeout) {
+  sqlite3_busy_timeout(connection_.get(), static_cast<int>(busyTimeout.count()));
 }
 
 void SqliteDatabase::keepLogOnClose() {
@@ -182,10 +325,6 @@ int SqliteDatabase::truncateLog(bool& complete) {
       kPrimaryCode;
   complete = code == SQLITE_OK;
   return code == SQLITE_BUSY ? SQLITE_OK : code;
-}
-
-std::filesystem::path SqliteDatabase::logFile() const {
-  return sqlite3_filename_wal(sqlite3_db_filename(connection_.get(), "main"));
 }
 
 int SqliteDatabase::errorCode() const {

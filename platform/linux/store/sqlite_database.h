@@ -7,11 +7,12 @@
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
-#include <filesystem>
 #include <memory>
 #include <string>
 #include <string_view>
 #include <vector>
+
+#include "platform/linux/base/device_files.h"
 
 struct sqlite3;
 struct sqlite3_stmt;
@@ -76,9 +77,15 @@ class SqliteDatabase {
 
   // Opens a file that exists. What its schema holds is not trusted: no triggers, no views, no unsafe
   // functions.
-  int open(const std::filesystem::path& file, SqliteMode mode, std::chrono::milliseconds busyTimeout);
+  // What it opens are regular files of that folder without a second name, whatever becomes of the names
+  // meanwhile.
+  int open(std::shared_ptr<const DeviceFolder> folder, const std::string& name, SqliteMode mode,
+           std::chrono::milliseconds busyTimeout);
+  // Opens a file without a name, and the write-ahead log that belongs to it, for this process alone.
+  int openUnnamed(FileDescriptor file, FileDescriptor log);
   // Opens, for reading, what such a file holds, without a look at a log beside it.
   int openImage(std::vector<std::byte> image);
+  void setBusyTimeout(std::chrono::milliseconds busyTimeout);
   // Closing then leaves the write-ahead log as it is.
   void keepLogOnClose();
   void close() { connection_.reset(); }
@@ -99,8 +106,6 @@ class SqliteDatabase {
   // happening in full.
   int truncateLog(bool& complete);
 
-  std::filesystem::path logFile() const;
-
   // The outcome and the reason of the last failed operation, the system's reason included.
   int errorCode() const;
   std::string errorMessage() const;
@@ -111,7 +116,15 @@ class SqliteDatabase {
   struct Closer {
     void operator()(sqlite3* connection) const;
   };
-  std::vector<std::byte> image_;  // what the connection reads, where it is no file
+  // Says which file a log is that has no name, as long as its database is open.
+  class UnnamedLog;
+  struct UnnamedLogCloser {
+    void operator()(UnnamedLog* log) const;
+  };
+  FileDescriptor unnamed_;
+  std::unique_ptr<UnnamedLog, UnnamedLogCloser> unnamedLog_;
+  std::shared_ptr<const DeviceFolder> folder_;  // stays open for as long as files of it may be opened
+  std::vector<std::byte> image_;                // what the connection reads, where it is no file
   std::unique_ptr<sqlite3, Closer> connection_;
 };
 

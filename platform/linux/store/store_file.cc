@@ -9,13 +9,10 @@
 #include <cerrno>
 #include <thread>
 
-#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host_notes.h"
 #include "platform/utf8.h"
 
 namespace tbdaily {
-
-namespace fs = std::filesystem;
 
 namespace {
 
@@ -51,16 +48,30 @@ constexpr std::array<std::string_view, 10> kColumns{
     "scalars table 1: value INTEGER 1 0 0",
 };
 
-fs::path beside(const fs::path& file, const char* suffix) {
-  fs::path path = file;
-  path += suffix;
-  return path;
-}
+constexpr const char* kLogSuffix = "-wal";
+constexpr const char* kIndexSuffix = "-shm";
+constexpr const char* kJournalSuffix = "-journal";
 
-bool hasContents(const fs::path& path) {
-  const std::optional<FileIdentity> identity = fileIdentity(path);
-  return identity && identity->size > 0;
-}
+// A store whose folder is open.
+struct Site {
+  const StorePlace& place;
+  std::shared_ptr<const DeviceFolder> folder;
+
+  std::chrono::milliseconds patience() const { return place.condition->patience(); }
+  std::string beside(const char* suffix) const { return place.name + suffix; }
+  bool has(const char* suffix) const { return folder->has(beside(suffix)); }
+  bool hasContents(const char* suffix) const {
+    struct stat status {};
+    return folder->status(beside(suffix), status) == 0 && status.st_size > 0;
+  }
+  bool isWritable() const {
+    const int at = folder->descriptor();
+    return ::faccessat(at, place.name.c_str(), W_OK, 0) == 0 && ::faccessat(at, ".", W_OK, 0) == 0;
+  }
+  int open(SqliteDatabase& database, SqliteMode mode) const {
+    return database.open(folder, place.name, mode, patience());
+  }
+};
 
 enum class StoreState { Missing, New, Usable, Unusable };
 
@@ -69,12 +80,12 @@ struct Verdict {
   StoreResult result;
 };
 
-Verdict unusable(const fs::path& file, std::string_view reason) {
-  return {StoreState::Unusable, unusableStore(file, reason)};
+Verdict unusable(const StorePlace& place, std::string_view reason) {
+  return {StoreState::Unusable, unusableStore(place, reason)};
 }
 
-Verdict failed(const SqliteDatabase& database, const fs::path& file) {
-  return {StoreState::Unusable, storeFailure(database, file)};
+Verdict failed(const SqliteDatabase& database, const StorePlace& place) {
+  return {StoreState::Unusable, storeFailure(database, place)};
 }
 
 bool hasOurColumns(SqliteDatabase& database) {
@@ -94,7 +105,7 @@ bool hasDamagedPages(SqliteDatabase& database, std::string& report) {
 
 enum class Examination { Layout, Pages };
 
-Verdict examineState(SqliteDatabase& database, const fs::path& file, Examination examination) {
+Verdict examineState(SqliteDatabase& database, const StorePlace& place, Examination examination) {
   std::int64_t version = 0;
   std::int64_t pages = 0;
   std::int64_t pageSize = 0;
@@ -105,144 +116,144 @@ Verdict examineState(SqliteDatabase& database, const fs::path& file, Examination
       database.queryInteger("PRAGMA page_size", pageSize) != SQLITE_OK ||
       database.queryInteger("SELECT count(*) FROM sqlite_schema", schemaEntries) != SQLITE_OK ||
       database.queryText("PRAGMA encoding", encoding) != SQLITE_OK) {
-    return failed(database, file);
+    return failed(database, place);
   }
   if (version == 0 && schemaEntries == 0) return {StoreState::New, {}};
   if (version != kStoreVersion) {
     return unusable(
-        file, "its user_version is " + std::to_string(version) + ", not " + std::to_string(kStoreVersion));
+        place, "its user_version is " + std::to_string(version) + ", not " + std::to_string(kStoreVersion));
   }
   if (encoding != "UTF-8" || !hasOurColumns(database)) {
     const int code = database.errorCode();
-    if (code == SQLITE_BUSY || code == SQLITE_IOERR) return failed(database, file);
-    return unusable(file, "its tables are not those of an analytics store");
+    if (code == SQLITE_BUSY || code == SQLITE_IOERR) return failed(database, place);
+    return unusable(place, "its tables are not those of an analytics store");
   }
   std::string report;
   if (examination == Examination::Pages && pages * pageSize <= kFullExaminationBytes &&
       hasDamagedPages(database, report)) {
-    return unusable(file, "it is damaged: " + report);
+    return unusable(place, "it is damaged: " + report);
   }
   return {StoreState::Usable, {}};
 }
 
 // Everything is judged by one state of the store, whoever writes to it meanwhile.
-Verdict examine(SqliteDatabase& database, const fs::path& file, Examination examination) {
-  if (!database.isOutsideTransaction()) return examineState(database, file, examination);
-  if (database.execute("BEGIN") != SQLITE_OK) return failed(database, file);
-  Verdict verdict = examineState(database, file, examination);
+Verdict examine(SqliteDatabase& database, const StorePlace& place, Examination examination) {
+  if (!database.isOutsideTransaction()) return examineState(database, place, examination);
+  if (database.execute("BEGIN") != SQLITE_OK) return failed(database, place);
+  Verdict verdict = examineState(database, place, examination);
   database.execute("ROLLBACK");
   return verdict;
 }
 
-Verdict examineUntouched(const fs::path& file, Examination examination) {
+Verdict examineUntouched(const Site& site, Examination examination) {
   SqliteDatabase database;
   // All pages are wanted: they are read at once, not one by one.
+  FileDescriptor file;
   FileContents contents;
-  if (examination == Examination::Pages &&
-      readRegularFile(file, contents, static_cast<std::size_t>(kFullExaminationBytes)) == 0) {
-    if (database.openImage(std::move(contents.bytes)) != SQLITE_OK) return failed(database, file);
-    return examine(database, file, examination);
+  if (examination == Examination::Pages && site.folder->openForReading(site.place.name, file) == 0 &&
+      readOpenFile(file.get(), contents, static_cast<std::size_t>(kFullExaminationBytes)) == 0) {
+    if (database.openImage(std::move(contents.bytes)) != SQLITE_OK) return failed(database, site.place);
+    return examine(database, site.place, examination);
   }
-  if (database.open(file, SqliteMode::Immutable, {}) != SQLITE_OK) return failed(database, file);
-  return examine(database, file, examination);
-}
-
-bool isWritable(const fs::path& file) {
-  return ::access(file.c_str(), W_OK) == 0 && ::access(file.parent_path().c_str(), W_OK) == 0;
+  if (site.open(database, SqliteMode::Immutable) != SQLITE_OK) return failed(database, site.place);
+  return examine(database, site.place, examination);
 }
 
 // With a log beside it, the file alone does not tell what the store holds.
-Verdict examineWithLog(const fs::path& file, std::chrono::milliseconds busyTimeout) {
+Verdict examineWithLog(const Site& site) {
   SqliteDatabase database;
-  const SqliteMode mode = isWritable(file) ? SqliteMode::ReadWrite : SqliteMode::ReadOnly;
-  if (database.open(file, mode, busyTimeout) != SQLITE_OK) return failed(database, file);
+  const SqliteMode mode = site.isWritable() ? SqliteMode::ReadWrite : SqliteMode::ReadOnly;
+  if (site.open(database, mode) != SQLITE_OK) return failed(database, site.place);
   database.keepLogOnClose();
   // Nobody has the store open when the shared index is missing, and under an exclusive lock none is made.
-  if (mode == SqliteMode::ReadWrite && !fileIdentity(beside(file, "-shm")) &&
+  if (mode == SqliteMode::ReadWrite && !site.has(kIndexSuffix) &&
       database.execute("PRAGMA locking_mode = EXCLUSIVE") != SQLITE_OK) {
-    return failed(database, file);
+    return failed(database, site.place);
   }
-  return examine(database, file, Examination::Pages);
+  return examine(database, site.place, Examination::Pages);
 }
 
-Verdict examineFile(const fs::path& file, std::chrono::milliseconds busyTimeout) {
-  struct stat status {};
-  if (::stat(file.c_str(), &status) != 0) {
-    if (errno == ENOENT || errno == ENOTDIR) return {};
-    const int error = errno;  // no fault of the store's own
-    return {StoreState::Unusable,
-            {StoreFault::Failed, file.native() + " cannot be examined: " + errorText(error), error}};
+Verdict cannotBeExamined(const StorePlace& place, int error) {  // no fault of the store's own
+  return {StoreState::Unusable,
+          {StoreFault::Failed, place.file().native() + " cannot be examined: " + errorText(error), error}};
+}
+
+// What lies at the store's place and beside it are regular files that have no other name.
+int judgeFiles(const Site& site) {
+  for (const char* suffix : {"", kLogSuffix, kIndexSuffix, kJournalSuffix}) {
+    struct stat status {};
+    const int error = site.folder->status(site.beside(suffix), status);
+    if (error == ENOENT) continue;
+    if (error != 0) return error;
+    if (S_ISLNK(status.st_mode)) return kLinkInPlace;
+    if (!S_ISREG(status.st_mode)) return kNotARegularFile;
+    if (status.st_nlink > 1) return kSecondName;
   }
-  if (!S_ISREG(status.st_mode)) return unusable(file, "it is not a regular file");
+  return 0;
+}
+
+Verdict examineFile(const Site& site) {
+  const StorePlace& place = site.place;
+  if (place.condition->isDamaged()) return unusable(place, "it is damaged");
+  struct stat status {};
+  int error = site.folder->status(place.name, status);
+  if (error == ENOENT) return {};
+  if (error == 0) error = judgeFiles(site);
+  if (error >= kForeignLink) return unusable(place, errorText(error));
+  if (error != 0) return cannotBeExamined(place, error);
   if (status.st_size == 0) return {StoreState::New, {}};
 
-  const fs::path log = storeLogOf(file);
-  if (hasContents(log)) return examineWithLog(file, busyTimeout);
+  if (site.hasContents(kLogSuffix)) return examineWithLog(site);
   // An interrupted transaction leaves the pages in need of its journal, so that only page 1 with the layout
   // can be judged.
-  const Examination examination =
-      hasContents(beside(file, "-journal")) ? Examination::Layout : Examination::Pages;
-  Verdict verdict = examineUntouched(file, examination);
+  const Examination examination = site.hasContents(kJournalSuffix) ? Examination::Layout : Examination::Pages;
+  Verdict verdict = examineUntouched(site, examination);
   if (verdict.state != StoreState::Unusable) return verdict;
   // A program that wrote meanwhile makes a sound store look torn.
-  const bool untouched = fileIdentity(file) == FileIdentity::of(status) && !hasContents(log);
-  return untouched ? verdict : examineWithLog(file, busyTimeout);
+  struct stat now {};
+  const bool untouched = site.folder->status(place.name, now) == 0 &&
+                         FileIdentity::of(now) == FileIdentity::of(status) && !site.hasContents(kLogSuffix);
+  return untouched ? verdict : examineWithLog(site);
 }
 
-// A link is followed once, here: SQLite keeps the log beside the file that a link leads to.
-fs::path resolved(const fs::path& file) {
-  std::error_code error;
-  fs::path target = fs::canonical(file, error);
-  if (!error) return target;
-  target = fs::absolute(file, error);
-  return error ? file : target;
-}
-
-StoreResult cannotCreate(const fs::path& file, int error) {
-  return {StoreFault::Failed, file.native() + " cannot be made: " + errorText(error), error};
-}
-
-// An empty file of mode 0600, whatever the umask; the log and the shared index take over its mode. No
-// descriptor is opened: closing one would end the locks that another connection of this process already holds
-// on the file.
-StoreResult createFile(const fs::path& file) {
-  fs::path existing = file.parent_path();
-  while (existing.has_relative_path() && !fileIdentity(existing)) existing = existing.parent_path();
-  if (const int error = makeFolders(file.parent_path()); error != 0) return cannotCreate(file, error);
-
-  if (::mknod(file.c_str(), S_IFREG | 0600, 0) != 0) {
-    return errno == EEXIST ? StoreResult{} : cannotCreate(file, errno);
-  }
-  if (::chmod(file.c_str(), 0600) != 0) return cannotCreate(file, errno);
-  for (fs::path folder = file.parent_path();; folder = folder.parent_path()) {
-    if (const int error = syncFolder(folder); error != 0) return cannotCreate(file, error);
-    if (folder == existing || !folder.has_relative_path()) return {};
-  }
+StoreResult cannotCreate(const StorePlace& place, int error) {
+  return {StoreFault::Failed, place.file().native() + " cannot be made: " + errorText(error), error};
 }
 
 // In one transaction, so that of two programs at once one makes the tables and the other finds them.
-int createTables(SqliteDatabase& database, const fs::path& file) {
+int createTables(SqliteDatabase& database, const StorePlace& place) {
   if (const int code = database.execute("BEGIN IMMEDIATE"); code != SQLITE_OK) return code;
-  const bool isNew = examine(database, file, Examination::Layout).state == StoreState::New;
+  const bool isNew = examine(database, place, Examination::Layout).state == StoreState::New;
   const int code = isNew ? database.execute(kCreateStore) : SQLITE_OK;
   return code != SQLITE_OK ? code : database.execute("COMMIT");
 }
 
 // Of two programs that want this of a new store at once, SQLite turns one away without the wait that it
 // grants elsewhere.
-int switchToLog(SqliteDatabase& database, std::chrono::milliseconds busyTimeout) {
-  const auto deadline = std::chrono::steady_clock::now() + busyTimeout;
+int switchToLog(SqliteDatabase& database, std::chrono::milliseconds patience) {
+  const auto deadline = std::chrono::steady_clock::now() + patience;
   while (true) {
-    const int code = database.execute("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL");
+    const int code = database.execute("PRAGMA journal_mode = WAL; PRAGMA synchronous = FULL");
     if (code != SQLITE_BUSY || std::chrono::steady_clock::now() >= deadline) return code;
     std::this_thread::sleep_for(std::chrono::milliseconds(5));
   }
 }
 
+// The folder of the store, opened or made. A folder that is missing is no error where the store may be
+// missing.
+int openSite(Site& site, MissingStore missing) {
+  auto folder = std::make_shared<DeviceFolder>();
+  const DeviceFiles& files = *site.place.files;
+  const int error = missing == MissingStore::Create ? files.makeFolder(site.place.folder, *folder)
+                                                    : files.openFolder(site.place.folder, *folder);
+  if (error == 0) site.folder = std::move(folder);
+  return error;
+}
+
 }  // namespace
 
-fs::path storeLogOf(const fs::path& file) {
-  return beside(file, "-wal");
+std::string storeLogOf(const std::string& name) {
+  return name + kLogSuffix;
 }
 
 std::optional<std::string_view> analyticsKeyFault(std::string_view key) {
@@ -256,61 +267,86 @@ std::optional<std::string_view> analyticsKeyFault(std::string_view key) {
   return std::nullopt;
 }
 
-StoreResult unusableStore(const fs::path& file, std::string_view reason) {
-  std::string error = file.native();
+StoreResult unusableStore(const StorePlace& place, std::string_view reason) {
+  std::string error = place.file().native();
   error.append(" cannot be used as the analytics store: ").append(reason);
   std::replace(error.begin(), error.end(), '\n', ' ');
   error.append("; it is left as it is, move it away and the next write makes a new one");
   return {StoreFault::Unusable, std::move(error), 0};
 }
 
-StoreResult storeFailure(const SqliteDatabase& database, const fs::path& file) {
+StoreResult storeFailure(const SqliteDatabase& database, const StorePlace& place) {
   const int code = database.errorCode();
-  if (code == SQLITE_CORRUPT || code == SQLITE_NOTADB) return unusableStore(file, database.errorMessage());
+  if (code == SQLITE_CORRUPT || code == SQLITE_NOTADB) return unusableStore(place, database.errorMessage());
   if (code == SQLITE_BUSY || code == SQLITE_LOCKED) {
-    return {StoreFault::Locked, file.native() + " is kept locked by another program", 0};
+    place.condition->setLocked(true);
+    return {StoreFault::Locked, place.file().native() + " is kept locked by another program", 0};
   }
-  return {StoreFault::Failed, file.native() + ": " + database.errorMessage(), 0};
+  return {StoreFault::Failed, place.file().native() + ": " + database.errorMessage(), 0};
 }
 
-OpenedStore openStoreForReading(const fs::path& place, std::chrono::milliseconds busyTimeout) {
-  const fs::path file = resolved(place);
-  Verdict verdict = examineFile(file, busyTimeout);
+OpenedStore openStoreForReading(const StorePlace& place) {
+  Site site{place, nullptr};
+  if (const int error = openSite(site, MissingStore::Leave); error != 0) {
+    if (error == ENOENT || error == kUnusableRoot) return {};
+    return {{}, cannotBeExamined(place, error).result};
+  }
+  Verdict verdict = examineFile(site);
   if (verdict.state != StoreState::Usable) return {{}, std::move(verdict.result)};
 
   SqliteMode mode = SqliteMode::ReadWrite;
-  if (!isWritable(file)) mode = hasContents(storeLogOf(file)) ? SqliteMode::ReadOnly : SqliteMode::Immutable;
+  if (!site.isWritable()) mode = site.hasContents(kLogSuffix) ? SqliteMode::ReadOnly : SqliteMode::Immutable;
   SqliteDatabase database;
-  if (database.open(file, mode, busyTimeout) != SQLITE_OK || database.execute("BEGIN") != SQLITE_OK) {
-    return {{}, storeFailure(database, file)};
+  if (site.open(database, mode) != SQLITE_OK || database.execute("BEGIN") != SQLITE_OK) {
+    return {{}, storeFailure(database, place)};
   }
-  verdict = examine(database, file, Examination::Layout);
+  verdict = examine(database, place, Examination::Layout);
   if (verdict.state != StoreState::Usable) return {{}, std::move(verdict.result)};
   return {std::move(database), {}};
 }
 
-OpenedStore openStoreForWriting(const fs::path& place, MissingStore missing,
-                                std::chrono::milliseconds busyTimeout) {
-  const fs::path file = resolved(place);
-  Verdict verdict = examineFile(file, busyTimeout);
+OpenedStore openStoreCopy(FileDescriptor file, FileDescriptor log, const StorePlace& original) {
+  SqliteDatabase database;
+  bool complete = false;
+  if (database.openUnnamed(std::move(file), std::move(log)) != SQLITE_OK ||
+      database.truncateLog(complete) != SQLITE_OK) {
+    return {{}, storeFailure(database, original)};
+  }
+  Verdict verdict = examine(database, original, Examination::Pages);
+  if (verdict.state != StoreState::Usable) return {{}, std::move(verdict.result)};
+  if (database.execute("BEGIN") != SQLITE_OK) return {{}, storeFailure(database, original)};
+  return {std::move(database), {}};
+}
+
+OpenedStore openStoreForWriting(const StorePlace& place, MissingStore missing) {
+  Site site{place, nullptr};
+  if (const int error = openSite(site, missing); error != 0) {
+    if (missing == MissingStore::Leave && (error == ENOENT || error == kUnusableRoot)) return {};
+    return {{}, cannotCreate(place, error)};
+  }
+  Verdict verdict = examineFile(site);
   if (verdict.state == StoreState::Unusable) return {{}, std::move(verdict.result)};
   if (verdict.state == StoreState::Missing) {
     if (missing == MissingStore::Leave) return {};
-    if (StoreResult made = createFile(file); !made.ok()) return {{}, std::move(made)};
+    // Not opened: closing a descriptor would end the locks that another connection of this process already
+    // holds on the file.
+    const int error = site.folder->makeFileUnopened(place.name);
+    if (error != 0 && error != EEXIST) return {{}, cannotCreate(place, error)};
+    if (!place.files->makeDurable()) return {{}, cannotCreate(place, EIO)};
   }
 
   SqliteDatabase database;
-  if (database.open(file, SqliteMode::ReadWrite, busyTimeout) != SQLITE_OK) {
-    return {{}, storeFailure(database, file)};
+  if (site.open(database, SqliteMode::ReadWrite) != SQLITE_OK) {
+    return {{}, storeFailure(database, place)};
   }
-  verdict = examine(database, file, Examination::Layout);
+  verdict = examine(database, place, Examination::Layout);
   if (verdict.state == StoreState::New) {
     if (missing == MissingStore::Leave) return {};
-    if (createTables(database, file) != SQLITE_OK) return {{}, storeFailure(database, file)};
-    verdict = examine(database, file, Examination::Layout);
+    if (createTables(database, place) != SQLITE_OK) return {{}, storeFailure(database, place)};
+    verdict = examine(database, place, Examination::Layout);
   }
   if (verdict.state != StoreState::Usable) return {{}, std::move(verdict.result)};
-  if (switchToLog(database, busyTimeout) != SQLITE_OK) return {{}, storeFailure(database, file)};
+  if (switchToLog(database, site.patience()) != SQLITE_OK) return {{}, storeFailure(database, place)};
   return {std::move(database), {}};
 }
 

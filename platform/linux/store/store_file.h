@@ -4,17 +4,15 @@
 // is, and nothing is left beside it.
 #pragma once
 
-#include <chrono>
-#include <filesystem>
 #include <optional>
 #include <string>
 #include <string_view>
 
 #include "platform/linux/store/sqlite_database.h"
+#include "platform/linux/store/store_place.h"
 
 namespace tbdaily {
 
-inline constexpr std::chrono::milliseconds kStoreBusyTimeout{5000};
 inline constexpr std::size_t kLongestAnalyticsKey = 1024;  // bytes
 
 // Why a failed operation on the store failed.
@@ -45,20 +43,23 @@ struct OpenedStore {
 
 // A connection in a read transaction. A store that is missing or new (empty) gives a closed connection
 // without a fault.
-OpenedStore openStoreForReading(const std::filesystem::path& file, std::chrono::milliseconds busyTimeout);
+OpenedStore openStoreForReading(const StorePlace& place);
+
+// The same over a copy of the store that has no name: its file and the log that belongs to it, which is
+// written back. `original` is what messages tell of.
+OpenedStore openStoreCopy(FileDescriptor file, FileDescriptor log, const StorePlace& original);
 
 enum class MissingStore { Leave, Create };
 
 // A connection that writes to a write-ahead log. A missing store is made (folders of mode 0700, file of mode
 // 0600) or gives a closed connection without a fault.
-OpenedStore openStoreForWriting(const std::filesystem::path& file, MissingStore missing,
-                                std::chrono::milliseconds busyTimeout);
+OpenedStore openStoreForWriting(const StorePlace& place, MissingStore missing);
 
-// What the last failed operation on the connection means.
-StoreResult storeFailure(const SqliteDatabase& database, const std::filesystem::path& file);
-StoreResult unusableStore(const std::filesystem::path& file, std::string_view reason);
+// What the last failed operation on the connection means; the store's condition remembers it.
+StoreResult storeFailure(const SqliteDatabase& database, const StorePlace& place);
+StoreResult unusableStore(const StorePlace& place, std::string_view reason);
 
-// The write-ahead log beside the file.
-std::filesystem::path storeLogOf(const std::filesystem::path& file);
+// The name of the write-ahead log beside the file.
+std::string storeLogOf(const std::string& name);
 
 }  // namespace tbdaily

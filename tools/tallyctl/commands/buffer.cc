@@ -3,12 +3,11 @@
 #include <CLI/CLI.hpp>
 #include <array>
 
-#include "platform/linux/base/file_io.h"
-#include "platform/linux/base/host_notes.h"
 #include "storage/snapshot_renderer.h"
 #include "storage/stats_context.h"
 #include "tools/tallyctl/controller_buffer.h"
 #include "tools/tallyctl/input_file.h"
+#include "tools/tallyctl/output_file.h"
 #include "tools/tallyctl/tool.h"
 
 namespace tbdaily {
@@ -33,9 +32,7 @@ void saveBuffer(Tool& tool, const std::string& kind, std::uint16_t list, const s
   if (!tool.hasUsableRoot()) return;
   const auto buffer = fetchControllerBuffer(tool.platform().services().driverRegistry, kind, list);
   if (!buffer) return tool.fail(kind + ": " + buffer.reason());
-  const std::filesystem::path place = std::filesystem::absolute(file);
-  const int error = replaceFile(place, {reinterpret_cast<const char*>(buffer->data()), buffer->size()});
-  if (error != 0) return tool.fail(file + ": " + errorText(error));
+  if (const auto written = writeOutputFile(file, *buffer); !written) return tool.fail(written.reason());
   if (tool.printedAsJson(PlistValue::dictionary(
           {{"file", PlistValue::string(file)},
            {"bytes", PlistValue::int64(static_cast<std::int64_t>(buffer->size()))}}))) {

@@ -11,6 +11,7 @@
 #include "platform/analytics_home.h"
 #include "platform/kernel.h"
 #include "platform/linux/base/host_notes.h"
+#include "platform/linux/store/store_place.h"
 #include "tools/tallyctl/tool.h"
 
 namespace tbdaily {
@@ -19,15 +20,14 @@ namespace {
 
 // The store of the device, or nothing, with the reason said.
 std::unique_ptr<AnalyticsStore> deviceStore(Tool& tool) {
-  const Host& host = tool.platform().host();
+  // The store makes its own folders, but must not make a root that is not there.
+  if (!tool.hasUsableRoot()) return nullptr;
   const std::string* home = tool.platform().services().analyticsHome.find().path;
   if (home == nullptr) {
     tool.fail("the device is in multi-user mode and its analytics container cannot be found");
     return nullptr;
   }
-  // The store makes its own folders, but must not make a root that is not there.
-  if (!tool.hasUsableRoot()) return nullptr;
-  return std::make_unique<AnalyticsStore>(host.devicePath(analyticsDatabasePath(*home)));
+  return std::make_unique<AnalyticsStore>(storePlaceOf(tool.platform().host().files(), analyticsDatabasePath(*home)));
 }
 
 PlistValue count(std::uint64_t n) {

@@ -1,8 +1,12 @@
 // tallyctl report: shows a daily report, or the one that would leave the device.
 
 #include <CLI/CLI.hpp>
-#include <filesystem>
+#include <cerrno>
+#include <optional>
+#include <utility>
+#include <vector>
 
+#include "platform/linux/base/host_notes.h"
 #include "platform/linux/log_spool.h"
 #include "tools/tallyctl/input_file.h"
 #include "tools/tallyctl/report_preview.h"
@@ -10,8 +14,6 @@
 #include "tools/tallyctl/tool.h"
 
 namespace tbdaily {
-
-namespace fs = std::filesystem;
 
 namespace {
 
@@ -22,35 +24,69 @@ constexpr std::size_t kStampLength = sizeof("2026-11-24-090704") - 1;
 // Sorts by the time in the name, then by the number behind it.
 using ReportAge = std::pair<std::string, unsigned long>;
 
-void considerFolder(const fs::path& folder, ReportAge& newestAge, fs::path& newest) {
-  std::error_code error;
-  for (fs::directory_iterator it(folder, error); !error && it != fs::directory_iterator();
-       it.increment(error)) {
-    const std::string name = it->path().filename().native();
-    if (!name.starts_with(kReportPrefix) || !name.ends_with(kReportExtension)) continue;
-    const std::string rest = name.substr(kReportPrefix.size());
-    if (rest.size() <= kStampLength) continue;
-    const ReportAge age{rest.substr(0, kStampLength),
-                        std::strtoul(rest.c_str() + kStampLength + 1, nullptr, 10)};
-    if (!newest.empty() && age <= newestAge) continue;
-    newestAge = age;
-    newest = it->path();
-  }
+std::optional<ReportAge> ageOf(std::string_view name) {
+  if (!name.starts_with(kReportPrefix) || !name.ends_with(kReportExtension)) return std::nullopt;
+  const std::string rest(name.substr(kReportPrefix.size()));
+  if (rest.size() <= kStampLength) return std::nullopt;
+  return ReportAge{rest.substr(0, kStampLength), std::strtoul(rest.c_str() + kStampLength + 1, nullptr, 10)};
 }
 
-// The newest report that waits or was handed over; empty when there is none.
-fs::path newestReport(Tool& tool) {
-  LinuxPlatform& platform = tool.platform();
-  const LogSpool spool(platform.host(), platform.services().propertyListCodec);
-  ReportAge age;
-  fs::path newest;
-  considerFolder(spool.pending(), age, newest);
-  std::error_code error;
-  for (fs::directory_iterator it(spool.outbox(), error); !error && it != fs::directory_iterator();
-       it.increment(error)) {
-    considerFolder(it->path(), age, newest);
+// The newest report of several folders.
+class NewestReport {
+ public:
+  explicit NewestReport(const DeviceFiles& files) : files_(files) {}
+
+  // A folder that is missing holds none.
+  Outcome<Nothing> consider(const std::string& folder) {
+    auto names = namesIn(folder);
+    if (!names) return Failure{names.reason()};
+    for (const std::string& name : *names) {
+      const auto age = ageOf(name);
+      if (!age || (!path_.empty() && *age <= age_)) continue;
+      age_ = *age;
+      path_ = folder + "/" + name;
+    }
+    return Nothing{};
   }
-  return newest;
+  Outcome<Nothing> considerFoldersIn(const std::string& folder) {
+    auto names = namesIn(folder);
+    if (!names) return Failure{names.reason()};
+    for (const std::string& name : *names) {
+      if (auto considered = consider(folder + "/" + name); !considered) return considered;
+    }
+    return Nothing{};
+  }
+
+  const std::string& path() const { return path_; }  // on the device; empty when there is none
+
+ private:
+  Outcome<std::vector<std::string>> namesIn(const std::string& path) const {
+    DeviceFolder folder;
+    std::vector<std::string> names;
+    int error = files_.openFolder(path, folder);
+    if (error == ENOENT || error == ENOTDIR) return names;
+    if (error == 0) error = folder.names(names);
+    if (error != 0) return Failure{files_.place(path).native() + ": " + errorText(error)};
+    return names;
+  }
+
+  const DeviceFiles& files_;
+  ReportAge age_;
+  std::string path_;
+};
+
+// The newest report that waits, is withheld or was handed over.
+Outcome<std::string> newestReport(const DeviceFiles& files) {
+  const auto folder = [](std::string_view name) {
+    return std::string(LogSpool::kFolder).append("/").append(name);
+  };
+  NewestReport newest(files);
+  for (const std::string_view name : {LogSpool::kPending, LogSpool::kWithheld}) {
+    if (auto considered = newest.consider(folder(name)); !considered) return Failure{considered.reason()};
+  }
+  if (auto considered = newest.considerFoldersIn(folder(LogSpool::kOutbox)); !considered)
+    return Failure{considered.reason()};
+  return newest.path();
 }
 
 void show(Tool& tool, const PlistValue& report) {
@@ -59,15 +95,24 @@ void show(Tool& tool, const PlistValue& report) {
   if (!tool.printedAsJson(report)) printReport(tool.out(), *report.asDictionary());
 }
 
-void showFile(Tool& tool, std::string file) {
-  if (file.empty()) {
-    file = newestReport(tool).native();
-    if (file.empty()) {
-      if (!tool.hasUsableRoot()) return;
-      return tool.fail("there is no report yet in " + tool.platform().host().root().native() +
-                       "; run tbdaily -f, or look at what it would write with --preview");
-    }
+void showNewest(Tool& tool) {
+  if (!tool.hasUsableRoot()) return;
+  const DeviceFiles& files = tool.platform().host().files();
+  const auto path = newestReport(files);
+  if (!path) return tool.fail(path.reason());
+  if (path->empty()) {
+    return tool.fail("there is no report yet in " + files.root().native() +
+                     "; run tbdaily -f, or look at what it would write with --preview");
   }
+  FileContents contents;
+  const std::string shown = files.place(*path).native();
+  if (const int error = files.readFile(*path, contents); error != 0)
+    return tool.fail(shown + ": " + errorText(error));
+  const PlistParseResult report = tool.platform().services().propertyListCodec.parse(contents.bytes);
+  report.error.empty() ? show(tool, report.value) : tool.fail(shown + ": " + report.error);
+}
+
+void showFile(Tool& tool, const std::string& file) {
   const auto report = readPlistFile(tool.platform().services().propertyListCodec, file);
   report ? show(tool, *report) : tool.fail(report.reason());
 }
@@ -92,8 +137,10 @@ void addReportCommand(CLI::App& app, Tool& tool) {
   command->add_option("--day", *day, "With --preview: days since 1970-01-01 (default: yesterday)")
       ->type_name("N")
       ->needs(previewOption);
-  command->callback(
-      [&tool, file, preview, day] { *preview ? showPreview(tool, *day) : showFile(tool, *file); });
+  command->callback([&tool, file, preview, day] {
+    if (*preview) return showPreview(tool, *day);
+    file->empty() ? showNewest(tool) : showFile(tool, *file);
+  });
 }
 
 }  // namespace tbdaily

@@ -46,8 +46,13 @@ void sendMessage(Tool& tool, Operation operation, const PlistDictionary& fields)
   if (written.bytes.size() > LinuxServiceListener::kMaximumMessageLength)
     return tool.fail("the message is longer than 16 MiB");
 
-  const std::filesystem::path endpoint = endpointPath(tool.platform().host(), kEndpointName);
-  const SocketResult connected = connectUnixSocket(endpoint);
+  const DeviceFiles& files = tool.platform().host().files();
+  const std::string socketName = endpointSocketName(kEndpointName);
+  const std::filesystem::path endpoint = files.place(kEndpointFolder) / socketName;
+  DeviceFolder folder;
+  SocketResult connected;
+  connected.error = files.openFolder(kEndpointFolder, folder);
+  if (connected.error == 0) connected = connectUnixSocket(folder, socketName);
   if (connected.error == ENOENT || connected.error == ECONNREFUSED) {
     return tool.fail("no job is listening at " + endpoint.native() +
                      "; start tbdaily without arguments first");

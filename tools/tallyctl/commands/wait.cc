@@ -41,13 +41,15 @@ void waitForPost(Tool& tool, const std::string& name, std::optional<double> time
   if (!tool.hasUsableRoot()) return;
   const Host& host = tool.platform().host();
   const LinuxNotifications notifications(host);
-  if (const int error = host.makeFolders(notifications.folder()); error != 0) {
-    return tool.fail(notifications.folder().native() + ": " + errorText(error));
+  const std::string shown = host.files().place(LinuxNotifications::kFolder).native();
+  DeviceFolder folder;
+  if (const int error = host.files().makeFolder(LinuxNotifications::kFolder, folder); error != 0) {
+    return tool.fail(shown + ": " + errorText(error));
   }
   const FileDescriptor watcher(::inotify_init1(IN_CLOEXEC | IN_NONBLOCK));
   if (!watcher.isOpen() ||
-      ::inotify_add_watch(watcher.get(), notifications.folder().c_str(), IN_MOVED_TO) < 0) {
-    return tool.fail(notifications.folder().native() + " cannot be watched: " + errorText(errno));
+      ::inotify_add_watch(watcher.get(), folder.throughDescriptor(".").c_str(), IN_MOVED_TO) < 0) {
+    return tool.fail(shown + " cannot be watched: " + errorText(errno));
   }
   std::optional<Clock::time_point> deadline;
   if (timeout)

@@ -7,13 +7,13 @@
 #include "driver/daily_tasks.h"
 #include "driver/environment_probes.h"
 #include "platform/analytics_home.h"
-#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host_notes.h"
 #include "platform/linux/replay/recordings.h"
 #include "platform/linux/store/analytics_store.h"
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
 #include "report/tb_config.h"
+#include "tools/tallyctl/input_file.h"
 #include "tools/tallyctl/sample/controller.h"
 #include "tools/tallyctl/sample/history.h"
 #include "tools/tallyctl/sample/metrics.h"
@@ -146,13 +146,13 @@ class SampleDevice {
       : platform_(platform), profile_(profile), host_(platform.host()) {}
 
   Outcome<Nothing> make() {
-    if (const int error = makeFolders(host_.root()); error != 0) {
+    if (const int error = makeRoot(); error != 0) {
       return Failure{host_.root().native() + " cannot be made: " + errorText(error)};
     }
     const DayNumber today = platform_.services().analyticsClient.currentDayNumber();
     const std::vector<SampleFile> files = sampleFiles(profile_, today);
-    const fs::path store = host_.devicePath(analyticsDatabasePath("/var/mobile"));
-    if (const std::string taken = firstTaken(files, store); !taken.empty()) {
+    const StorePlace store = storePlaceOf(host_.files(), analyticsDatabasePath("/var/mobile"));
+    if (const std::string taken = firstTaken(files); !taken.empty()) {
       return Failure{
           taken + " is already there; a sample device is never made over another one: choose an empty root"};
     }
@@ -161,21 +161,28 @@ class SampleDevice {
     }
     if (auto written = writeStackSnapshot(); !written) return written;
     if (auto placed = placeSupportLibrary(); !placed) return placed;
-    if (const int failure = host_.makeFolders(store.parent_path()); failure != 0)
-      return Failure{store.native() + ": " + errorText(failure)};
     AnalyticsStore analytics(store);
     if (auto reason = addSampleHistory(analytics, dayBefore(today))) return Failure{std::move(*reason)};
     return Nothing{};
   }
 
  private:
-  std::string firstTaken(const std::vector<SampleFile>& files, const fs::path& store) const {
-    std::vector<fs::path> places{store, host_.devicePath(kSupportLibraryPath),
-                                 host_.devicePath(recordingPath(recording::kStackSnapshot))};
-    for (const SampleFile& file : files) places.push_back(host_.devicePath(file.path));
-    for (const fs::path& place : places) {
-      std::error_code ignored;
-      if (fs::exists(fs::symlink_status(place, ignored))) return place.native();
+  int makeRoot() const {
+    std::error_code error;
+    fs::create_directories(host_.root(), error);
+    return error.value();
+  }
+
+  std::string firstTaken(const std::vector<SampleFile>& files) const {
+    std::vector<std::string> paths{analyticsDatabasePath("/var/mobile"), std::string(kSupportLibraryPath),
+                                   recordingPath(recording::kStackSnapshot)};
+    for (const SampleFile& file : files) paths.push_back(file.path);
+    for (const std::string& path : paths) {
+      DeviceFolder folder;
+      const fs::path whole(path);
+      const int error = host_.files().openFolder(whole.parent_path().native(), folder);
+      if (error != ENOENT && (error != 0 || folder.has(whole.filename())))
+        return host_.files().place(path).native();
     }
     return {};
   }
@@ -188,10 +195,11 @@ class SampleDevice {
   }
 
   Outcome<Nothing> writeBytes(std::string_view path, std::string_view bytes) const {
-    const fs::path place = host_.devicePath(path);
-    int error = host_.makeFolders(place.parent_path());
-    if (error == 0) error = replaceFile(place, bytes);
-    if (error != 0) return Failure{place.native() + ": " + errorText(error)};
+    const fs::path whole(path);
+    DeviceFolder folder;
+    int error = host_.files().makeFolder(whole.parent_path().native(), folder);
+    if (error == 0) error = folder.replaceFile(whole.filename(), bytes);
+    if (error != 0) return Failure{host_.files().place(path).native() + ": " + errorText(error)};
     return Nothing{};
   }
 
@@ -206,14 +214,9 @@ class SampleDevice {
     if (built.empty())
       return Failure{
           "the support library FaultdeskSupport is missing beside tallyctl; build or install it again"};
-    const fs::path place = host_.devicePath(kSupportLibraryPath);
-    if (const int error = host_.makeFolders(place.parent_path()); error != 0)
-      return Failure{place.native() + ": " + errorText(error)};
-    std::error_code error;
-    fs::copy_file(built, place, error);
-    if (!error) fs::permissions(place, fs::perms::owner_read | fs::perms::owner_write, error);
-    if (error) return Failure{place.native() + ": " + error.message()};
-    return Nothing{};
+    const auto library = readInput(built);
+    if (!library) return Failure{library.reason()};
+    return writeBytes(kSupportLibraryPath, {reinterpret_cast<const char*>(library->data()), library->size()});
   }
 
   LinuxPlatform& platform_;
