@@ -19,7 +19,9 @@ project(user LANGUAGES CXX)
 set(CMAKE_CXX_VISIBILITY_PRESET hidden)
 include_directories(BEFORE ${CMAKE_SOURCE_DIR})
 if(TREE)
-  add_subdirectory(${TREE} tree EXCLUDE_FROM_ALL)
+  include(FetchContent)
+  FetchContent_Declare(kdreport SOURCE_DIR ${TREE})
+  FetchContent_MakeAvailable(kdreport)
   add_library(storage INTERFACE)
 else()
   find_package(kdreport 0.1 REQUIRED COMPONENTS ${COMPONENTS})
@@ -160,12 +162,23 @@ class InstalledPackage(unittest.TestCase):
                 run(compiler, f"-std={standard}", "-Wall", "-Wextra", "-Werror", *sources, *flags, "-o", program, cwd=self.user)
                 run(program, env={**os.environ, "LD_LIBRARY_PATH": str(pc.parent)})
 
-    def test_part_of_another_project_needs_nothing_of_the_programs(self):
+    def test_part_of_another_project_needs_nothing_of_the_programs_and_leaves_nothing_there(self):
         absent = [f"-DCMAKE_DISABLE_FIND_PACKAGE_{name}=ON" for name in ("SQLite3", "CLI11", "nlohmann_json", "GTest")]
         done = self.configured("part", f"-DTREE={TREE}", *absent)
         self.assertEqual(done.returncode, 0, done.stderr)
-        run("cmake", "--build", self.folder / "build-part", "--target", "static", "-j2")
-        run(self.folder / "build-part" / "static")
+        build = self.folder / "build-part"
+        targets = set(re.findall(r"^\.\.\. (\w+)$", run("cmake", "--build", build, "--target", "help"), re.M))
+        self.assertIn("kdreport_host", targets)
+        own = {"static", "shared", "plugin", "example", "all", "clean", "depend", "edit_cache", "rebuild_cache"}
+        self.assertEqual({t for t in targets - own if not re.match("install|list_install|kdreport|tbdaily_", t)}, set())
+        settings = set(re.findall(r"^(\w+):", (build / "CMakeCache.txt").read_text(), re.M))
+        theirs = ".*CMAKE_|FETCHCONTENT_|FIND_PACKAGE_|.*EXPAT|PKG_CONFIG_|prefix_result$|TREE$|user_|kdreport|tbdaily_|TBDAILY_"
+        self.assertEqual({name for name in settings if not re.match(theirs, name)}, set())
+        run("cmake", "--build", build, "--target", "static", "-j2")
+        run(build / "static")
+        run("cmake", "--install", build, "--prefix", self.folder / "empty")
+        self.assertFalse((self.folder / "empty").exists())
+        run("cmake", "-S", TREE, "-B", self.folder / "build-library", "-DTBDAILY_PROGRAMS=OFF", "-DTBDAILY_TESTS=OFF", *absent)
 
 
 if __name__ == "__main__":
