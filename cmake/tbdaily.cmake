@@ -3,10 +3,10 @@
 # The targets of libraries are called tbdaily_<name>, since the tree may be part of a larger project. DEPENDS names them without
 # the prefix.
 
-find_program(CCACHE ccache)
-if(CCACHE AND NOT CMAKE_CXX_COMPILER_LAUNCHER)
+find_program(TBDAILY_CCACHE ccache)
+if(TBDAILY_CCACHE AND NOT CMAKE_CXX_COMPILER_LAUNCHER)
   # Headers that are read once cannot be told apart by their time.
-  set(CMAKE_CXX_COMPILER_LAUNCHER ${CMAKE_COMMAND} -E env CCACHE_SLOPPINESS=pch_defines,time_macros ${CCACHE})
+  set(CMAKE_CXX_COMPILER_LAUNCHER ${CMAKE_COMMAND} -E env CCACHE_SLOPPINESS=pch_defines,time_macros ${TBDAILY_CCACHE})
   add_compile_options($<$<COMPILE_LANG_AND_ID:CXX,GNU>:-fpch-preprocess>)
 endif()
 

@@ -48,7 +48,9 @@ const AnswerCache::Kept* AnswerCache::retained(const Kept* kept) {
 }
 
 void AnswerCache::release(const Kept* kept) {
-  while (kept != nullptr && kept->owners.fetch_sub(1, std::memory_order_acq_rel) == 1)
+  // The only owner need not count down: nobody is left who could make another.
+  while (kept != nullptr && (kept->owners.load(std::memory_order_acquire) == 1 ||
+                             kept->owners.fetch_sub(1, std::memory_order_acq_rel) == 1))
     delete std::exchange(kept, kept->before);
 }
 

@@ -6,32 +6,17 @@
 namespace kdreport {
 namespace {
 
-using testing::channelOf, testing::channelsIn, testing::channelType, testing::ScriptedDriver;
+using testing::channelOf, testing::channelsIn, testing::channelType, testing::publishingDriver;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 
-PlistValue entry(std::int64_t identifier, std::int64_t type, const char* name = nullptr) {
-  PlistArray places{PlistValue::int64(identifier), PlistValue::int64(type)};
-  if (name != nullptr) places.push_back(PlistValue::string(name));
-  return PlistValue::array(places);
+PlistValue entry(std::int64_t identifier, std::uint64_t type, const char* name = nullptr) {
+  return testing::legendEntry(identifier, {type}, name);
 }
 
 PlistValue group(const char* name, const char* subGroup, PlistArray channels) {
-  PlistDictionary fields{{"KdReportChannels", PlistValue::array(std::move(channels))},
-                         {"KdReportChannelInfo", KdReportCreateUnitInfo(0x64'00000000000000)}};
-  if (name != nullptr) fields.set("KdReportGroupName", PlistValue::string(name));
-  if (subGroup != nullptr) fields.set("KdReportSubGroupName", PlistValue::string(subGroup));
-  return PlistValue::dictionary(fields);
-}
-
-ScriptedDriver driver(std::uint64_t identifier, const char* name, PlistValue legend) {
-  PlistDictionary properties{{"KdReportLegendPublic", PlistValue::boolean(true)}};
-  properties.set("KdReportLegend", std::move(legend));
-  return {.identifier = identifier,
-          .name = name,
-          .serviceClass = "Driver",
-          .properties = properties,
-          .parent = {}};
+  return testing::legendGroup(name, subGroup, KdReportCreateUnitInfo(0x64'00000000000000),
+                              std::move(channels));
 }
 
 class Discovery : public ::testing::Test {
@@ -40,7 +25,8 @@ class Discovery : public ::testing::Test {
 
   // What one driver with this legend gives: names and statuses.
   std::string read(PlistValue legend, std::uint32_t options = kKdReportFlat) {
-    registry_.drivers = {driver(0x2A, "D", std::move(legend))};
+    registry_.drivers = {publishingDriver(0x2A, "D", {})};
+    registry_.drivers[0].properties.set("KdReportLegend", std::move(legend));
     const KdHandle handle = registry_.KdServiceGetMatchingService(registry_.KdServiceMatching("Driver"));
     std::optional<ReportError> error;
     const auto channels = KdReportCopyChannelsForDriver(registry_, handle, options, &error);
@@ -116,9 +102,8 @@ TEST_F(Discovery, TakesAnyKindOfValueInALegend) {
 }
 
 TEST_F(Discovery, FilesChannelsByDriverGroupAndSubgroup) {
-  registry_.drivers = {driver(0x2A, "D",
-                              PlistValue::array({group("G", "S", {entry(1, 0x1000001, "a")}),
-                                                 group(nullptr, nullptr, {entry(2, 1, "b")})}))};
+  registry_.drivers = {publishingDriver(
+      0x2A, "D", {group("G", "S", {entry(1, 0x1000001, "a")}), group(nullptr, nullptr, {entry(2, 1, "b")})})};
   const KdReportCollection filed = KdReportCopyAllChannels(registry_, 3);
   const ChannelCollection* one = filed->drivers.get()->find("D <id 0x2a>");
   ASSERT_NE(one, nullptr);
@@ -139,8 +124,9 @@ TEST_F(Discovery, FilesChannelsByDriverGroupAndSubgroup) {
 }
 
 TEST_F(Discovery, NamesDriversThatFailAndGoesOn) {
-  registry_.drivers = {driver(1, "Bad", PlistValue::int64(1)),
-                       driver(2, "Good", PlistValue::array({group(nullptr, nullptr, {entry(0x41, 1)})}))};
+  registry_.drivers = {publishingDriver(1, "Bad", {}),
+                       publishingDriver(2, "Good", {group(nullptr, nullptr, {entry(0x41, 1)})})};
+  registry_.drivers[0].properties.set("KdReportLegend", PlistValue::int64(1));
   ::testing::internal::CaptureStderr();
   const KdReportCollection all = KdReportCopyAllChannels(registry_, 0);
   EXPECT_EQ(::testing::internal::GetCapturedStderr(), "Bad <id 0x1>: bad legend\n");
@@ -171,17 +157,18 @@ TEST_F(Discovery, NamesDriversThatFailAndGoesOn) {
   registry_.iteratorsAreValid = false;
   EXPECT_EQ(KdReportCopyAllChannels(registry_, 0, &error), nullptr);
   EXPECT_EQ(error->code, kKdAborted);
-  AbsentDriverRegistry absent;
-  EXPECT_EQ(KdReportCopyAllChannels(absent, 0, &error), nullptr);
+  registry_.drivers.clear();
+  EXPECT_EQ(KdReportCopyAllChannels(registry_, 0, &error), nullptr);
+  EXPECT_EQ(error->code, kKdNotFound);
 }
 
 TEST_F(Discovery, SelectsByCategoryFormatUnitAndGroup) {
-  registry_.drivers = {driver(1, "D",
-                              PlistValue::array({
-                                  group("G", "S", {entry(0x41, 0x1000001), entry(0x42, 0x2000002)}),
-                                  group("G", nullptr, {entry(0x43, 2)}),
-                                  group("H", "S", {entry(0x44, 0x1000001)}),
-                              }))};
+  registry_.drivers = {publishingDriver(1, "D",
+                                        {
+                                            group("G", "S", {entry(0x41, 0x1000001), entry(0x42, 0x2000002)}),
+                                            group("G", nullptr, {entry(0x43, 2)}),
+                                            group("H", "S", {entry(0x44, 0x1000001)}),
+                                        })};
   const auto names = [](const KdReportCollection& channels) {
     std::string all;
     for (ChannelRecord* channel : channelsIn(channels.get()))

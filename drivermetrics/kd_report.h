@@ -249,9 +249,9 @@ std::uint32_t KdReportGetChannelCount(const ChannelCollection* collection);
 
 // Tells the kernel's hub which channels are wanted and maps the buffer in which it keeps their values. On
 // success `subscribedChannels` receives a new collection, against which samples are taken. The subscription
-// holds its connection and mapping until its last reference goes, and must not outlive the registry or the
-// allocator; another set of channels needs another one. `allocator` holds the object (null: the default),
-// `options` are not looked at. Null on failure, and nothing stays open:
+// holds its connection and mapping until its last reference goes, and must not outlive the registry or, weak
+// references included, the allocator; another set of channels needs another one. `allocator` holds the object
+// (null: the default), `options` are not looked at. Null on failure, and nothing stays open:
 //   "bad arguments", "iteration error", "no channels" (kKdBadArgument), "createInterestList() failed"
 //   (kKdNoMemory), "Could not open KdReportHub", "kKdReportUserClientOpen failed",
 //   "kKdReportUserClientConfigureInterests failed", "KdConnectMapMemory() failed" (the hub's status); without

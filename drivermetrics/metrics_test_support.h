@@ -1,18 +1,13 @@
-// Channels, collections and element buffers for the tests of the library.
+// Channels and collections as they are inside, for the tests of the library.
 #pragma once
 
 #include "drivermetrics/channel_collection.h"
+#include "drivermetrics/kd_report_test_support.h"
 #include "drivermetrics/raw_elements.h"
-#include "platform/byte_writer.h"
-#include "testing/fake_drivers.h"
 
 namespace kdreport::testing {
 
-using namespace tbdaily::testing;
-
-inline ChannelType channelType(unsigned format, unsigned elements = 1, unsigned categories = 0) {
-  return {std::uint64_t{format} | std::uint64_t{categories} << 16 | std::uint64_t{elements} << 32};
-}
+using namespace fakes;
 
 // A record as discovery makes it, of the driver "D<driver>".
 inline KdReportChannel channelOf(std::int64_t driver, std::int64_t identifier,
@@ -51,21 +46,6 @@ inline std::vector<ChannelRecord*> channelsIn(const ChannelCollection* collectio
     return kKdReportKeep;
   });
   return channels;
-}
-
-struct Element {
-  std::uint64_t stamp = 0;
-  std::vector<std::int64_t> words;
-};
-
-inline void appendElement(PlistData& bytes, std::int64_t driver, std::int64_t identifier, ChannelType type,
-                          const Element& element = {}) {
-  for (const std::uint64_t field :
-       {static_cast<std::uint64_t>(driver), static_cast<std::uint64_t>(identifier), type.bits, element.stamp})
-    tbdaily::appendLittleEndian(bytes, field);
-  for (std::size_t i = 0; i < kElementWords; ++i)
-    tbdaily::appendLittleEndian(bytes,
-                                i < element.words.size() ? static_cast<std::uint64_t>(element.words[i]) : 0);
 }
 
 // A channel with elements in it, as a sample holds it.

@@ -16,7 +16,6 @@ using tbdaily::PlistDictionary;
 using tbdaily::PlistNumber;
 using tbdaily::PlistValue;
 
-using tbdaily::AbsentDriverRegistry;
 using tbdaily::DriverHandle;
 using tbdaily::DriverRegistry;
 using tbdaily::KdHandle;

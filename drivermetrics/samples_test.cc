@@ -6,7 +6,6 @@
 #include "drivermetrics/subscription.h"
 #include "platform/byte_reader.h"
 #include "platform/byte_writer.h"
-#include "testing/scripted_hub.h"
 
 namespace kdreport {
 namespace {

@@ -81,49 +81,4 @@ class DriverRegistry {
                                         std::span<std::byte> memory) = 0;
 };
 
-// The answers of a host without a driver registry.
-class AbsentDriverRegistry : public DriverRegistry {
- public:
-  PlistValue KdServiceMatching(std::string_view) override { return {}; }
-  KdHandle KdServiceGetMatchingService(const PlistValue&) override { return 0; }
-  KdStatus KdServiceGetMatchingServices(const PlistValue&, KdHandle& iterator) override {
-    iterator = 0;
-    return kKdNotFound;
-  }
-  KdHandle KdIteratorNext(KdHandle) override { return 0; }
-  bool KdIteratorIsValid(KdHandle) override { return true; }
-  KdStatus KdObjectRelease(KdHandle) override { return kKdBadArgument; }
-  std::uint32_t KdObjectGetUserRetainCount(KdHandle) override { return 0; }
-  PlistValue KdRegistryEntryCreateCFProperty(KdHandle, std::string_view) override { return {}; }
-  PlistValue KdRegistryEntrySearchCFProperty(KdHandle, KdRegistryPlane, std::string_view,
-                                             KdSearchOptions) override {
-    return {};
-  }
-  KdStatus KdRegistryEntryGetRegistryEntryID(KdHandle, std::uint64_t&) override { return kKdNotFound; }
-  KdStatus KdRegistryEntryGetName(KdHandle, std::string&) override { return kKdNotFound; }
-  KdStatus KdServiceOpen(KdHandle, std::uint32_t, KdHandle& connection) override {
-    connection = 0;
-    return kKdNotFound;
-  }
-  KdStatus KdServiceClose(KdHandle) override { return kKdBadArgument; }
-  KdStatus KdConnectCallStructMethod(KdHandle, std::uint32_t, std::span<const std::byte>,
-                                     std::span<std::byte>, std::size_t&) override {
-    return kKdBadArgument;
-  }
-  KdStatus KdConnectCallScalarMethod(KdHandle, std::uint32_t, std::span<const std::uint64_t>,
-                                     std::span<std::uint64_t>, std::size_t&) override {
-    return kKdBadArgument;
-  }
-  KdStatus KdConnectCallMethod(KdHandle, std::uint32_t, const KdMethodInput&, KdMethodOutput&) override {
-    return kKdBadArgument;
-  }
-  KdStatus KdConnectMapMemory(KdHandle, std::uint32_t, std::span<std::byte>& memory) override {
-    memory = {};
-    return kKdBadArgument;
-  }
-  KdStatus KdConnectUnmapMemory(KdHandle, std::uint32_t, std::span<std::byte>) override {
-    return kKdBadArgument;
-  }
-};
-
 }  // namespace tbdaily

@@ -2,7 +2,7 @@
 // test's.
 #pragma once
 
-#include "testing/fake_drivers.h"
+#include "testing/fake_driver_registry.h"
 
 namespace tbdaily::testing {
 
@@ -37,7 +37,7 @@ class ScriptedHub {
   KdStatus userClientOpenStatus = 0, configureStatus = 0, mapStatus = 0, updateStatus = 0;
   std::size_t scalars = 1;  // that configuring answers
   PlistData interestList;   // what it was told last
-  PlistData buffer;
+  PlistData buffer;         // keeps its length while a subscription maps it
 };
 
 }  // namespace tbdaily::testing
