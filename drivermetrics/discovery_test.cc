@@ -34,8 +34,7 @@ ScriptedDriver driver(std::uint64_t identifier, const char* name, PlistValue leg
           .parent = {}};
 }
 
-class Discovery : public ::testing::Test {
- protected:
+struct Discovery : ::testing::Test {
   ~Discovery() override { EXPECT_EQ(registry_.openHandles(), 0U); }
 
   // What one driver with this legend gives: names and statuses.

@@ -50,7 +50,3 @@ class Arrows(unittest.TestCase):
                     file.write_text(before)
                     self.assertEqual((status, output.count("\n")), (1, 1), output)
                     self.assertTrue(output.startswith(path + ": ") and said in output, output)
-
-
-if __name__ == "__main__":
-    unittest.main()

@@ -105,7 +105,3 @@ class Companion(DeviceTest):
             self.assertIn(reason, device.tally("send", "app-info", "-", stdin=records, status=1))
         self.assertIn("no job is listening", device.tally("send", "logging-status", status=1))
         self.assertIn("in time", device.tally("wait", "some.name", "--timeout", "0.2", status=1))
-
-
-if __name__ == "__main__":
-    unittest.main()

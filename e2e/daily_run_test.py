@@ -85,7 +85,3 @@ class DailyRun(DeviceTest):
         (swap,) = re.findall(r"SwapTotal: +(\d+)", pathlib.Path("/proc/meminfo").read_text())
         self.assertLessEqual(scalars[uptime_key], minutes + 2)
         self.assertEqual(scalars[swap_key], int(swap) * 1024)
-
-
-if __name__ == "__main__":
-    unittest.main()

@@ -107,7 +107,3 @@ class Faults(unittest.TestCase):
                 while all(pool.map(lambda n: self.case(mode, n), range(at, at + AT_ONCE))):
                     at += AT_ONCE
                 self.assertGreater(at, 20, "the shim does not reach the program")
-
-
-if __name__ == "__main__":
-    unittest.main()

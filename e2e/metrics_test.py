@@ -147,7 +147,3 @@ class Metrics(unittest.TestCase):
                 arguments = [*words.split(), "--group", "none"]
                 outputs = [self.metrics(*arguments, *more) for more in ([], ["--json"], ["--describe"])]
                 self.assertEqual(outputs, [said, "[]\n", ""])
-
-
-if __name__ == "__main__":
-    unittest.main()

@@ -105,7 +105,3 @@ class Storage(DeviceTest):
         device.path("System/Device/registry.plist").unlink()
         self.assertIn("no storage controller", device.tally("buffer", "stats", "-o", "x", status=1))
         self.assertIn("cannot be had", device.tally("nand", status=1))
-
-
-if __name__ == "__main__":
-    unittest.main()

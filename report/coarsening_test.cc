@@ -1,7 +1,6 @@
 #include <gmock/gmock.h>
 
 #include <cmath>
-#include <limits>
 
 #include "platform/plist_text.h"
 #include "report/distribution_summary.h"

@@ -2,8 +2,6 @@
 
 #include <gmock/gmock.h>
 
-#include <algorithm>
-
 #include "platform/preferences_store.h"
 #include "storage/nand_key_map.h"
 #include "storage/stats_table.h"
@@ -131,8 +129,7 @@ TEST(NandInfo, IsCopiedFromTheControllerAndMergedIntoALog) {
   EXPECT_EQ(log.size(), 26U);
 }
 
-// Every byte of a buffer is made wrong in turn; parser and dictionary come through.
-TEST(NandInfo, SurvivesCorruptBuffers) {
+TEST(NandInfo, HoldsAtMostSixtyKeysWhicheverByteOfItsBufferIsWrong) {
   StatsBuffer buffer = full().record(327, std::vector<std::uint64_t>(22, 3)).record(265, {1, 2, 3, 4, 5});
   buffer.record(289, {1, 1, 1, 1}).record(86, {9}).record(85, {4}).record(142, {123456});
   for (std::byte& byte : buffer.bytes) {

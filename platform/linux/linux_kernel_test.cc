@@ -23,13 +23,13 @@ TEST(LinuxKernelTest, FillsSysctlsFromIntegersErrorsAndEvents) {
     buffer.resize(length);
     return plistText(PlistValue::data(buffer));
   };
-  device.record("kernel.plist", "sysctl", device.json(R"({"int": -2, "text": "x", "bad": "x"})"));
+  device.record("kernel.plist", "sysctl", testing::plistOf(R"({"int": -2, "text": "x", "bad": "x"})"));
   device.record(
       "kernel.plist", "eccEvents",
       PlistValue::array({PlistValue::data(PlistData(3, std::byte{1})), PlistValue::data(PlistData(1))}));
   const auto setErrors = [&](const std::string& number) {
     device.record("kernel.plist", "errno",
-                  device.json(R"({"bad": )" + number + R"(, "kern.next_ecc_event": )" + number + "}"));
+                  testing::plistOf(R"({"bad": )" + number + R"(, "kern.next_ecc_event": )" + number + "}"));
   };
   setErrors("5");
   EXPECT_EQ(read("int", 4), "<feffffff>");
@@ -45,7 +45,7 @@ TEST(LinuxKernelTest, FillsSysctlsFromIntegersErrorsAndEvents) {
   EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 2");
 
   TestPlatform live(true);
-  live.record("clock.plist", "numerator", device.json("4294967296"));
+  live.record("clock.plist", "numerator", testing::plistOf("4294967296"));
   EXPECT_EQ(live.services.kernel.timebase()->numerator, 1U);
 }
 
