@@ -35,25 +35,23 @@ TEST(Units, HaveLabels) {
 }
 
 TEST(Units, HaveExactFactors) {
-  struct Row {
-    std::uint64_t scale, numerator, denominator;
-  };
-  const std::vector<Row> rows = {{0, 1, 1},
-                                 {0x7980000018, 1, 24000000},
-                                 {0x8C0000000004, 32768, 1},
-                                 {5, 5, 1},
-                                 {0x80000000, 1, 1},
-                                 {0x7F7F00000000, 1, 1},
-                                 {0x828200000003, 3 * 8 * 1000, 1},
-                                 {0x9200000000, 10000000000000000000U, 1},
-                                 {0x0100000000, 1, 0},     // 10^126 in 64 bits
-                                 {0xFFFF00000000, 1, 0},   // an exponent of 128 is one of -128
-                                 {0xBF0000000000, 0, 1}};  // shifted out
-  for (const Row& row : rows) {
-    std::uint64_t numerator = 9, denominator = 9;
-    EXPECT_EQ(KdReportUnitGetScale(static_cast<std::int64_t>(row.scale), numerator, denominator), kKdSuccess);
-    EXPECT_EQ(std::pair(numerator, denominator), std::pair(row.numerator, row.denominator))
-        << std::hex << row.scale;
+  using Number = std::uint64_t;
+  // At the end: 10^126 in 64 bits, an exponent of 128, which is one of -128, and one that is shifted out.
+  const std::tuple<std::int64_t, Number, Number> rows[] = {{0, 1, 1},
+                                                           {0x7980000018, 1, 24000000},
+                                                           {0x8C0000000004, 32768, 1},
+                                                           {5, 5, 1},
+                                                           {0x80000000, 1, 1},
+                                                           {0x7F7F00000000, 1, 1},
+                                                           {0x828200000003, 3 * 8 * 1000, 1},
+                                                           {0x9200000000, 10000000000000000000U, 1},
+                                                           {0x0100000000, 1, 0},
+                                                           {0xFFFF00000000, 1, 0},
+                                                           {0xBF0000000000, 0, 1}};
+  for (const auto& [scale, multiplier, divisor] : rows) {
+    Number numerator = 9, denominator = 9;
+    EXPECT_EQ(KdReportUnitGetScale(scale, numerator, denominator), kKdSuccess);
+    EXPECT_EQ(std::pair(numerator, denominator), std::pair(multiplier, divisor)) << std::hex << scale;
   }
   EXPECT_DOUBLE_EQ(KdReportScaleValue(1500, kNanoseconds, kKdReportSeconds), 1.5e-6);
   EXPECT_EQ(KdReportScaleValue(~std::uint64_t{0}, kKdReportSeconds, kKdReportSeconds),

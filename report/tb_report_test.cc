@@ -67,7 +67,7 @@ TEST_F(TBReportTest, CarriesTheWhitelistedRowsOfTwoDaysTheLaterOneWinning) {
   EXPECT_TRUE(fake_.systemLog.has("debug: Treating key d as a histogram"));
 }
 
-TEST_F(TBReportTest, IsWrittenOnceAndAnswersNoKeyAfterwards) {
+TEST_F(TBReportTest, IsWrittenOnce) {
   TBReport report(fake_.platform, {[] { return 1; }, [] { return 7; }});
   for (int i = 0; i < 2; ++i) report.writeLogForYesterdayWithAppInfo(kDay, PlistValue());
   EXPECT_EQ(fake_.logSubmission.logs.size(), 1U);
@@ -93,7 +93,7 @@ TEST_F(TBReportTest, IsNotWrittenWhenNothingWhitelistedHappened) {
 }
 
 TEST_F(TBReportTest, RemembersTheOSVersionBeforeTheLogIsWritten) {
-  fake_.propertyListCodec.failNextWrite("too odd");
+  fake_.propertyListCodec.writeError = "too odd";
   writeLog();
   EXPECT_TRUE(fake_.systemLog.has("error: Could not create tallyd plist: too odd"));
   EXPECT_THAT(fake_.preferences.writes, IsEmpty());

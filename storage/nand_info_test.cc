@@ -90,15 +90,13 @@ TEST(NandInfo, HoldsEachFieldAsFarAsTheExportVersionAllows) {
 }
 
 TEST(NandInfo, DerivesItsOwnValues) {
-  const auto choke = [](std::uint64_t value) { return full().record(142, {value}); };
-  const auto formatted = [](std::uint64_t time) { return full().record(56, {time}); };
   const std::vector<std::tuple<StatsBuffer, const char*, std::optional<std::int64_t>>> cases = {
-      {formatted(946684800 + 604799), "formatDaysSince2000", 0},
-      {formatted(946684800 + 604800), "formatDaysSince2000", 1},
-      {choke(999), "maxMemChokeDuration", 999},
-      {choke(1235), "maxMemChokeDuration", 1240},
-      {choke(9995), "maxMemChokeDuration", 10000},
-      {choke((1ULL << 32) + 5), "maxMemChokeDuration", 5},
+      {full().record(56, {946684800 + 604799}), "formatDaysSince2000", 0},
+      {full().record(56, {946684800 + 604800}), "formatDaysSince2000", 1},
+      {full().record(142, {999}), "maxMemChokeDuration", 999},
+      {full().record(142, {1235}), "maxMemChokeDuration", 1240},
+      {full().record(142, {9995}), "maxMemChokeDuration", 10000},
+      {full().record(142, {(1ULL << 32) + 5}), "maxMemChokeDuration", 5},
       {full().record(188, {12345}), "maxMemExtremeDuration", 12300},
       {full().record(86, {3}).record(85, {0xFFFFFFFF}), "IntermediatePartitionSize", {}},
       {full().record(86, {3}).record(85, {5}), "IntermediatePartitionSize", -2},

@@ -87,9 +87,8 @@ TEST(FetchStatsContext, TellsEachTroubleAndReleasesEverything) {
 
 TEST(FetchStatsContext, FollowsTheSelectorsOfTheDescriptor) {
   static constexpr STXSelectorPair kUnserved = {kNoSelector, 13};
-  const SelectorGetter getters[] = {[]() -> const STXSelectorPair* { return nullptr; },
-                                    [] { return &kUnserved; }};
-  for (const SelectorGetter getter : getters) {
+  for (const SelectorGetter getter : {SelectorGetter([]() -> const STXSelectorPair* { return nullptr; }),
+                                      SelectorGetter([] { return &kUnserved; })}) {
     std::array<NandExporter, 2> table = {nand_exporters[0], {}};
     table[0].statsSelectors = getter;
     Fetch fetch;

@@ -32,15 +32,16 @@ TEST(LinuxKernelTest, FillsSysctlsFromIntegersErrorsAndEvents) {
                   testing::plistOf(R"({"bad": )" + number + R"(, "kern.next_ecc_event": )" + number + "}"));
   };
   setErrors("5");
-  EXPECT_EQ(read("int", 4), "<feffffff>");
-  EXPECT_EQ(read("int", 8), "<feffffffffffffff>");
-  EXPECT_EQ(read("int", 5), "errno 22");
-  EXPECT_EQ(read("text", 8), "errno 2");
-  EXPECT_EQ(read("bad", 8), "errno 5");
-  EXPECT_EQ(read("vm.swapusage", 32), "errno 2");
-  EXPECT_EQ(read("kern.next_ecc_event", 8), "<010101>");
-  EXPECT_EQ(read("kern.next_ecc_event", 8), "<00>");
-  EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 5");
+  const std::tuple<const char*, std::size_t, const char*> answers[] = {{"int", 4, "<feffffff>"},
+                                                                       {"int", 8, "<feffffffffffffff>"},
+                                                                       {"int", 5, "errno 22"},
+                                                                       {"text", 8, "errno 2"},
+                                                                       {"bad", 8, "errno 5"},
+                                                                       {"vm.swapusage", 32, "errno 2"},
+                                                                       {"kern.next_ecc_event", 8, "<010101>"},
+                                                                       {"kern.next_ecc_event", 8, "<00>"},
+                                                                       {"kern.next_ecc_event", 8, "errno 5"}};
+  for (const auto& [name, room, answer] : answers) EXPECT_EQ(read(name, room), answer) << name << room;
   setErrors("1099511627776");  // no error number
   EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 2");
 

@@ -1,4 +1,4 @@
-"""Days on a recorded clock: tasking and updates for a month, held against a state machine; network usage."""
+"""Days on a recorded clock: tasking, updates and network usage, and what each day leaves behind."""
 
 import datetime
 import plistlib
@@ -11,45 +11,6 @@ OWN = "com.velmora.sysmetrics.tbdaily"
 CRASHFERRY = "com.velmora.Crashferry"
 
 
-class TaskingModel:
-    """Preferences by domain, and what a run does to them."""
-
-    def __init__(self):
-        self.domains, self.posts, self.submissions = {}, 0, 0
-
-    def domain(self, name):
-        return self.domains.setdefault(name, {})
-
-    def run(self, today, build, scheduled):
-        job = self.domain(JOB)
-        last = job.get("LastOSUpdate")
-        if build is not None and (last is None or last["version"] != build):
-            last = job["LastOSUpdate"] = {"version": build, "day": today}
-        if scheduled is None or "TaskingID" not in scheduled:
-            return
-        applied = (job.get("TaskingID"), job.get("TaskingOS"))
-        if build is None or applied != (scheduled["TaskingID"], build):
-            if "TaskingID" in job:
-                for item in job.get("TaskingPayload", []):
-                    self.domain(item["Domain"]).pop(item["Key"], None)
-                for key in ("TaskingID", "TaskingDigest", "TaskingPayload"):
-                    job.pop(key, None)
-            if "TaskingPayload" in scheduled:
-                for item in scheduled["TaskingPayload"]:
-                    self.domain(item["Domain"])[item["Key"]] = item["Value"]
-                job.update(TaskingID=scheduled["TaskingID"], TaskingDigest=scheduled["TaskingDigest"],
-                           TaskingPayload=scheduled["TaskingPayload"])
-                job["TaskingOS"] = build
-                if build is None:
-                    del job["TaskingOS"]
-            self.posts += 1
-        # A tasking that was applied in this run counts at once.
-        if abs(today - (last["day"] if last else 0)) < self.domain("com.velmora.da").get("AggressiveSubmissionDays", 0):
-            self.submissions += 1
-
-
-
-
 def tasking(identifier, items, digest="d"):
     scheduled = {"TaskingID": identifier, "TaskingDigest": digest}
     if items is not None:
@@ -57,35 +18,42 @@ def tasking(identifier, items, digest="d"):
     return scheduled
 
 
-class Month(DeviceTest):
+class Days(DeviceTest):
     def set_day(self, device, day, build):
         device.record("clock", {"now": EPOCH + datetime.timedelta(days=day, hours=3)})
         device.record("answers", {"ProductVersion": "1", **({"ProductBuildVersion": build} if build else {})})
 
     def test_tasking(self):
-        device, model = self.device(), TaskingModel()
-        first = tasking("one", [("com.velmora.da", "Group", False), ("org.example.a", "x", [1, {"y": b"z"}])])
-        second = tasking("two", [("com.velmora.da", "AggressiveSubmissionDays", 3), ("org.example.b", "x", 2.5)])
-        builds = ["A"] * 6 + ["B"] * 9 + [None] * 3 + ["B"] * 4 + ["C"] * 8
-        for index, build in enumerate(builds):
-            today = TODAY + index - (20 if index in (24, 25) else 0)  # on two days the clock is wrong
-            scheduled = (None if index < 2 or index in (20, 21) else first if index < 5 else second if index < 12
-                         else tasking("three", None) if index < 15 else second)
-            crashferry = model.domains[CRASHFERRY] = {"DiagnosticLogSubmissionEnabled": False}
-            if scheduled is not None:
-                crashferry["ScheduledTasking"] = scheduled
-            device.preferences(CRASHFERRY, crashferry)
-            device.write("var/mobile/Library/Logs/Pending/waits.txt", b"to be submitted")
-            self.set_day(device, today, build)
-            model.run(today, build, scheduled)
-            device.run("-f")
-            for name, values in model.domains.items():
-                self.assertEqual(device.preferences(name), values, (index, name))
-            self.assertEqual(device.posts("com.velmora.da.tasking_changed"), model.posts, index)
-            outbox = device.path("var/mobile/Library/Logs/Outbox").glob("*")
-            self.assertEqual(len(list(outbox)), model.submissions, index)
-        self.assertGreater(model.submissions, 4)
-        self.assertGreater(model.posts, 5)
+        device = self.device()
+        items = [("com.velmora.da", "AggressiveSubmissionDays", 2), ("org.example.a", "x", [1, {"y": b"z"}])]
+        one, other = tasking("one", items), tasking("two", [("org.example.b", "x", 2.5)])
+        applied = {"com.velmora.da": {"AggressiveSubmissionDays": 2}, "org.example.a": {"x": [1, {"y": b"z"}]}}
+        # Day, build, what is scheduled: preferences, tasking and its build, day of the update, posts and submissions so far.
+        for day, build, scheduled, preferences, known, updated, posts, submissions in (
+                (0, "A", None, {}, (None, None), 0, 0, 0),
+                (1, "A", one, applied, ("one", "A"), 0, 1, 1),
+                (2, "A", one, applied, ("one", "A"), 0, 1, 1),  # the two days are over
+                (3, "B", one, applied, ("one", "B"), 3, 2, 2),  # again, for the new build
+                (2, "B", None, applied, ("one", "B"), 3, 2, 2),  # nothing is scheduled
+                (2, "B", one, applied, ("one", "B"), 3, 2, 3),  # the clock was set back
+                (4, None, one, applied, ("one", None), 3, 3, 4),  # no build is known: applied each time
+                (5, None, other, {"org.example.b": {"x": 2.5}}, ("two", None), 3, 4, 4),
+                (6, "B", other, {"org.example.b": {"x": 2.5}}, ("two", "B"), 3, 5, 4),
+                (7, "B", tasking("three", None), {}, (None, "B"), 3, 6, 4)):
+            with self.subTest(day=day, build=build):
+                device.preferences(CRASHFERRY, {"DiagnosticLogSubmissionEnabled": False,
+                                                **({"ScheduledTasking": scheduled} if scheduled else {})})
+                device.write("var/mobile/Library/Logs/Pending/waits.txt", b"to be submitted")
+                self.set_day(device, TODAY + day, build)
+                device.run("-f")
+                for domain in applied.keys() | {"org.example.b"}:
+                    self.assertEqual(device.preferences(domain), preferences.get(domain, {}), domain)
+                job = device.preferences(JOB)
+                self.assertEqual((job.get("TaskingID"), job.get("TaskingOS")), known)
+                self.assertEqual(job["LastOSUpdate"]["day"], TODAY + updated)
+                self.assertEqual(device.posts("com.velmora.da.tasking_changed"), posts)
+                outbox = device.path("var/mobile/Library/Logs/Outbox").glob("*")
+                self.assertEqual(len(list(outbox)), submissions)
 
     def test_large_tasking(self):
         device = self.device()
