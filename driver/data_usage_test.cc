@@ -2,9 +2,8 @@
 
 #include <gmock/gmock.h>
 
-#include <limits>
-
 #include "testing/fake_platform.h"
+#include "testing/json_test_support.h"
 
 namespace tbdaily {
 namespace {
@@ -23,8 +22,7 @@ PlistValue record(const char* nameKey, const char* name, PlistDate since,
   return PlistValue::dictionary(std::move(entries));
 }
 
-class DataUsageTest : public ::testing::Test {
- protected:
+struct DataUsageTest : ::testing::Test {
   DataUsageTest() { fake_.analyticsClient.today = kToday; }
   // The increments of one run.
   std::vector<std::string> run(PlistArray records) {
@@ -63,16 +61,13 @@ TEST_F(DataUsageTest, FirstRunsCountWhatBeganSinceYesterdayAndLaterOnesTheDiffer
 }
 
 TEST_F(DataUsageTest, WhatIsNotAsItShouldBeIsSkipped) {
-  const auto odd = PlistValue::dictionary({{"bundleName", PlistValue::int64(5)},
-                                           {"procName", PlistValue::string("p")},
-                                           {"since", PlistValue(kMorning)},
-                                           {"wifiInBytes", PlistValue::string("x")},
-                                           {"wwanOutBytes", PlistValue::float64(2048.9)}});
-  fake_.preferences.domains[kOwn] = {
-      {std::string(kUsageBaselineKey), PlistValue::dictionary({{"p", PlistValue::array({})}})}};
+  PlistDictionary odd = testing::dictionaryOf(
+      R"({"bundleName": 5, "procName": "p", "wifiInBytes": "x", "wwanOutBytes": 2048.9})");
+  odd.set("since", PlistValue(kMorning));
+  fake_.preferences.domains[kOwn].set(kUsageBaselineKey, testing::plistOf(R"({"p": []})"));
   EXPECT_THAT(
-      run({PlistValue::string("no record"), odd, record("other", "n", kMorning, {4096}),
-           PlistValue::dictionary({{"procName", PlistValue::string("no since")}}),
+      run({PlistValue::string("no record"), PlistValue::dictionary(odd),
+           record("other", "n", kMorning, {4096}), testing::plistOf(R"({"procName": "no since"})"),
            record("procName", "bad\x01name", kMorning, {4096}), record("bundleName", "b", kMorning, {1024})}),
       ElementsAre("add datausage.wwanOutKB.com.velmora.p 2", "add datausage.wifiInKB.b 1"));
 }

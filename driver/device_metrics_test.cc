@@ -4,6 +4,7 @@
 
 #include "platform/plist_text.h"
 #include "testing/fake_platform.h"
+#include "testing/json_test_support.h"
 
 namespace tbdaily {
 namespace {
@@ -12,11 +13,10 @@ using ::testing::ElementsAre;
 
 TEST(DeviceMetrics, DiskUsageIsInMebibytesOrMinusOne) {
   testing::FakePlatform fake;
-  const PlistValue both = PlistValue::dictionary(
-      {{"TotalDiskCapacity", PlistValue::int64(1048575)}, {"TotalDataAvailable", PlistValue::int64(-1)}});
-  const PlistValue one = PlistValue::dictionary({{"TotalDataAvailable", PlistValue::int64(3 << 20)}});
   const std::tuple<PlistValue, const char*, const char*> cases[] = {
-      {{}, "-1", "-1"}, {both, "0", "-1"}, {one, "-1", "3"}};
+      {{}, "-1", "-1"},
+      {testing::plistOf(R"({"TotalDiskCapacity": 1048575, "TotalDataAvailable": -1})"), "0", "-1"},
+      {testing::plistOf(R"({"TotalDataAvailable": 3145728})"), "-1", "3"}};
   for (const auto& [answer, total, free] : cases) {
     fake.deviceAnswers.answers.set("DiskUsage", answer);
     fake.analyticsClient.calls.clear();

@@ -2,7 +2,9 @@
 
 #include <gmock/gmock.h>
 
+#include "drivermetrics/metrics_test_support.h"
 #include "testing/fake_platform.h"
+#include "testing/json_test_support.h"
 #include "testing/scripted_hub.h"
 
 namespace tbdaily {
@@ -11,50 +13,30 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-constexpr std::int64_t kOneElement = std::int64_t{1} << 32;
-constexpr std::int64_t kDaily = 0x100 << 16;
-constexpr std::int64_t kOther = 0x200 << 16;
-
-// Identifier, type and, unless null, name of each channel.
-using Channels = std::vector<std::tuple<std::int64_t, std::int64_t, const char*>>;
-
-testing::ScriptedDriver driverWith(std::uint64_t identifier, const Channels& channels) {
-  PlistArray entries;
-  for (const auto& [channel, type, name] : channels) {
-    PlistArray entry{PlistValue::int64(channel), PlistValue::int64(type)};
-    if (name != nullptr) entry.push_back(PlistValue::string(name));
-    entries.push_back(PlistValue::array(entry));
-  }
-  const PlistValue group = PlistValue::dictionary({{"KdReportChannels", PlistValue::array(entries)}});
-  return {.identifier = identifier,
-          .name = "Driver",
-          .serviceClass = "Driver",
-          .properties = {{"KdReportLegendPublic", PlistValue::boolean(true)},
-                         {"KdReportLegend", PlistValue::array({group})}},
-          .parent = {}};
+// The identifier, type and perhaps name of each channel.
+testing::ScriptedDriver driverWith(std::uint64_t identifier, const std::string& channels) {
+  return {
+      .identifier = identifier,
+      .name = "Driver",
+      .serviceClass = "Driver",
+      .properties = testing::dictionaryOf(
+          R"({"KdReportLegendPublic": true, "KdReportLegend": [{"KdReportChannels": )" + channels + "}]}"),
+      .parent = {}};
 }
 
 TEST(DriverMetrics, SimpleChannelsOfTheDailyCategoryBecomeScalars) {
   testing::FakePlatform fake;
   testing::ScriptedHub hub(fake.driverRegistry);
-  const std::int64_t simple = kOneElement | kDaily | 1;
-  const auto element = [&](std::uint64_t driver, std::uint64_t channel, std::int64_t value) {
-    for (const std::uint64_t word : {driver, channel, static_cast<std::uint64_t>(simple), std::uint64_t{1},
-                                     static_cast<std::uint64_t>(value)})
-      for (unsigned shift = 0; shift < 64; shift += 8)
-        hub.buffer.push_back(static_cast<std::byte>(word >> shift));
-    hub.buffer.resize(hub.buffer.size() + 24);
-  };
-  fake.driverRegistry.drivers.push_back(driverWith(10, {{1, simple, "Temp"},
-                                                        {2, kOneElement | kDaily | 2, "State"},
-                                                        {3, kOneElement | kOther | 1, "Other category"},
-                                                        {4, simple, nullptr},
-                                                        {0x434F55, simple, nullptr}}));
-  fake.driverRegistry.drivers.push_back(driverWith(11, {{1, simple, "Temp"}, {2, simple, "Missing"}}));
-  element(10, 1, 42);
-  element(10, 4, 1);
-  element(10, 0x434F55, -7);
-  element(11, 1, 43);
+  // One element each: simple ones of the daily category, a state of it, and a simple one of another category.
+  fake.driverRegistry.drivers.push_back(
+      driverWith(10, R"([[1, 4311744513, "Temp"], [2, 4311744514, "State"], [3, 4328521729, "Other category"],
+              [4, 4311744513], [4411221, 4311744513]])"));
+  fake.driverRegistry.drivers.push_back(
+      driverWith(11, R"([[1, 4311744513, "Temp"], [2, 4311744513, "Missing"]])"));
+  for (const auto& [driver, channel, value] :
+       {std::tuple{10, 1, 42}, {10, 4, 1}, {10, 0x434F55, -7}, {11, 1, 43}})
+    kdreport::testing::appendElement(hub.buffer, driver, channel, kdreport::testing::channelType(1, 1, 0x100),
+                                     {1, {value}});
 
   CollectDriverMetricScalars(fake.platform);
   EXPECT_THAT(fake.analyticsClient.calls,

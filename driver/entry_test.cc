@@ -9,6 +9,7 @@
 #include "report/internal_device.h"
 #include "report/tb_config.h"
 #include "testing/fake_platform.h"
+#include "testing/json_test_support.h"
 
 namespace tbdaily {
 namespace {
@@ -33,8 +34,7 @@ PlistValue app(const char* bundle, std::size_t uuidLength = 16) {
                                  {"uuid", PlistValue::data(PlistData(uuidLength, std::byte{0xab}))}});
 }
 
-class EntryTest : public ::testing::Test {
- protected:
+struct EntryTest : ::testing::Test {
   EntryTest() {
     gCommandState.gAppInfoRequested = false;
     gInternalDeviceAnswer.once.reset();
@@ -44,8 +44,7 @@ class EntryTest : public ::testing::Test {
     fake_.usageService.records = PlistValue::array({});  // a reply at once
     fake_.analyticsHistory.addScalar("k", kToday - 1, 1);
     fake_.analyticsHistory.addScalar("k", kToday, 2);
-    const PlistValue keys = PlistValue::dictionary({{"k", PlistValue::dictionary({})}});
-    fake_.putPlist(kWhitelistPath, {{"G", PlistValue::dictionary({{"ScalarKeys", keys}})}});
+    fake_.putPlist(kWhitelistPath, testing::dictionaryOf(R"({"G": {"ScalarKeys": {"k": {}}}})"));
   }
 
   // Runs the process and answers its log lines between the first and the last.

@@ -4,6 +4,7 @@
 
 #include "platform/plist_text.h"
 #include "testing/fake_platform.h"
+#include "testing/json_test_support.h"
 
 namespace tbdaily {
 namespace {
@@ -14,23 +15,13 @@ using ::testing::IsEmpty;
 const std::string kJob = "com.velmora.tallyd.tbdaily";
 constexpr DayNumber kToday = 20781;
 
-PlistValue text(const char* t) {
-  return PlistValue::string(t);
-}
-PlistValue item(const char* domain, const char* key, const PlistValue& value) {
-  return PlistValue::dictionary({{"Domain", text(domain)}, {"Key", text(key)}, {"Value", value}});
-}
-
-class TaskingTest : public ::testing::Test {
- protected:
+struct TaskingTest : ::testing::Test {
   TaskingTest() {
     fake_.analyticsClient.today = kToday;
     fake_.deviceAnswers.build = "A1";
   }
-  void schedule(const char* id, PlistValue payload) {
-    PlistDictionary tasking{{"TaskingID", text(id)}, {"TaskingDigest", PlistValue::int64(7)}};
-    tasking.set("TaskingPayload", std::move(payload));
-    fake_.preferences.setValue("ScheduledTasking", PlistValue::dictionary(tasking), "com.velmora.Crashferry");
+  void schedule(std::string_view tasking) {
+    fake_.preferences.setValue("ScheduledTasking", testing::plistOf(tasking), "com.velmora.Crashferry");
   }
   // What a run writes, posts and logs.
   std::vector<std::string> run() {
@@ -46,8 +37,8 @@ class TaskingTest : public ::testing::Test {
 };
 
 TEST_F(TaskingTest, AppliesWithdrawsAndAppliesAgainInOrder) {
-  schedule("t1", PlistValue::array(
-                     {item("b", "x", PlistValue::int64(1)), text("malformed"), item("a", "y", text("v"))}));
+  schedule(R"({"TaskingID": "t1", "TaskingDigest": 7, "TaskingPayload": [
+      {"Domain": "b", "Key": "x", "Value": 1}, "malformed", {"Domain": "a", "Key": "y", "Value": "v"}]})");
   EXPECT_THAT(run(), ElementsAre("set " + kJob + "/LastOSUpdate", "set b/x", "set a/y",
                                  "set " + kJob + "/TaskingID", "set " + kJob + "/TaskingOS",
                                  "set " + kJob + "/TaskingDigest", "set " + kJob + "/TaskingPayload",
@@ -66,7 +57,7 @@ TEST_F(TaskingTest, AppliesWithdrawsAndAppliesAgainInOrder) {
   EXPECT_EQ(job("TaskingOS").asString(), "A2");
   EXPECT_EQ(fake_.preferences.getValue("x", "b").asInteger(), 1);
 
-  schedule("t2", {});  // no payload: withdrawn, nothing new, and announced every time
+  schedule(R"({"TaskingID": "t2"})");  // no payload: withdrawn, nothing new, and announced every time
   run();
   EXPECT_TRUE(fake_.preferences.getValue("x", "b").isNone());
   EXPECT_TRUE(job("TaskingID").isNone() && job("TaskingPayload").isNone());
@@ -76,8 +67,8 @@ TEST_F(TaskingTest, AppliesWithdrawsAndAppliesAgainInOrder) {
 }
 
 TEST_F(TaskingTest, SubmitsOnTheFirstDaysAfterAnUpdate) {
-  schedule("t1", PlistValue::array({}));
-  fake_.logSubmission.taskingValues.set("AggressiveSubmissionDays", text(" 3 days"));
+  schedule(R"({"TaskingID": "t1", "TaskingPayload": []})");
+  fake_.logSubmission.taskingValues.set("AggressiveSubmissionDays", PlistValue::string(" 3 days"));
   for (const DayNumber day : {kToday, kToday + 3, kToday - 2}) {
     fake_.analyticsClient.today = day;
     run();
@@ -88,13 +79,15 @@ TEST_F(TaskingTest, SubmitsOnTheFirstDaysAfterAnUpdate) {
 
 TEST(AggressiveDays, ReadsNumbersAndDecimalTexts) {
   EXPECT_EQ(aggressiveDays({}), 0);
-  EXPECT_EQ(aggressiveDays(PlistValue::float64(2.9)), 2);
-  EXPECT_EQ(aggressiveDays(PlistValue::boolean(true)), 0);
-  EXPECT_EQ(aggressiveDays(PlistValue::int64(1LL << 40)), 2147483647);
-  for (const auto& [given, days] :
-       {std::pair{"+7", 7}, {"-2", -2}, {"x", 0}, {"", 0}, {"99999999999999999999", 2147483647}}) {
-    EXPECT_EQ(aggressiveDays(text(given)), days) << given;
-  }
+  for (const auto& [given, days] : {std::pair{"2.9", 2},
+                                    {"true", 0},
+                                    {"1099511627776", 2147483647},
+                                    {R"("+7")", 7},
+                                    {R"("-2")", -2},
+                                    {R"("x")", 0},
+                                    {R"("")", 0},
+                                    {R"("99999999999999999999")", 2147483647}})
+    EXPECT_EQ(aggressiveDays(testing::plistOf(given)), days) << given;
 }
 
 }  // namespace

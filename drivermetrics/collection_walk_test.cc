@@ -1,7 +1,6 @@
 #include <gmock/gmock.h>
 
 #include <cstdlib>
-#include <map>
 #include <new>
 #include <random>
 #include <stdexcept>
@@ -18,10 +17,6 @@ thread_local std::size_t allocations = 0;
   void* memory = std::malloc(size);
   if (memory == nullptr) throw std::bad_alloc();
   return memory;
-}
-[[gnu::noinline]] void* operator new(std::size_t size, const std::nothrow_t&) noexcept {
-  ++allocations;
-  return std::malloc(size);
 }
 [[gnu::noinline]] void operator delete(void* memory) noexcept {
   std::free(memory);
@@ -60,26 +55,30 @@ class RandomChannels {
   std::mt19937 random_{20261124};
 };
 
-// The order of a filed collection's walk, said once more: per driver in the order of its first channel, then
-// without group, then per group and subgroup in their order.
+// Where a filed collection has the channel: driver, group, subgroup, as far as they are there.
+std::vector<PlistValue> pathOf(const ChannelRecord& channel) {
+  const LegendGroup& group = channel.group();
+  std::vector<PlistValue> path{group.driverID};
+  if (group.groupName) path.push_back(group.groupName);
+  if (group.groupName && group.subGroupName) path.push_back(group.subGroupName);
+  return path;
+}
+
+// The order of its walk, said once more: what a level holds itself, then each part in the order in which it
+// began.
 std::vector<ChannelRecord*> inWalkOrder(const std::vector<KdReportChannel>& channels) {
-  const auto rank = [&channels](auto key, const ChannelRecord* channel) {
-    return std::ranges::find_if(channels, [&](const auto& other) { return key(*other) == key(*channel); }) -
-           channels.begin();
-  };
-  using Key = std::vector<std::ptrdiff_t>;
-  std::multimap<Key, ChannelRecord*> keyed;  // equal keys stay in the order of the list
+  std::multimap<std::vector<std::ptrdiff_t>, ChannelRecord*>
+      keyed;  // equal keys stay in the order of the list
   for (const KdReportChannel& channel : channels) {
-    const auto driver = [](const ChannelRecord& c) { return c.group().driverID; };
-    const auto group = [](const ChannelRecord& c) {
-      return std::pair(c.group().driverID, c.group().groupName);
-    };
-    const auto subGroup = [](const ChannelRecord& c) {
-      return std::tuple(c.group().driverID, c.group().groupName, c.group().subGroupName);
-    };
-    Key key{rank(driver, channel.get()), -1, -1};
-    if (channel->group().groupName) key[1] = rank(group, channel.get());
-    if (channel->group().groupName && channel->group().subGroupName) key[2] = rank(subGroup, channel.get());
+    const auto path = pathOf(*channel);
+    std::vector<std::ptrdiff_t> key;
+    for (auto end = path.begin() + 1; key.size() < path.size(); ++end) {
+      const std::span place(path.begin(), end);
+      const auto begins = [&](const KdReportChannel& other) {
+        return std::ranges::mismatch(place, pathOf(*other)).in1 == place.end();
+      };
+      key.push_back(std::ranges::find_if(channels, begins) - channels.begin());
+    }
     keyed.emplace(key, channel.get());
   }
   std::vector<ChannelRecord*> ordered;

@@ -19,8 +19,7 @@ PlistValue group(const char* name, const char* subGroup, PlistArray channels) {
                               std::move(channels));
 }
 
-class Discovery : public ::testing::Test {
- protected:
+struct Discovery : ::testing::Test {
   ~Discovery() override { EXPECT_EQ(registry_.openHandles(), 0U); }
 
   // What one driver with this legend gives: names and statuses.

@@ -15,79 +15,43 @@ using testing::channelType, testing::sampled;
 constexpr std::int64_t kNanoseconds = 0x0100007600000000, kTicks = 0x0101000000000000;
 
 TEST(Units, HaveLabels) {
-  const std::vector<std::pair<std::uint64_t, const char*>> labels = {
-      // Quantities, without a scale.
-      {0, ""},
-      {0x0100000000000000, "s"},
-      {0x0200000000000000, "W"},
-      {0x0300000000000000, "J"},
-      {0x0400000000000000, "A"},
-      {0x0500000000000000, "V"},
-      {0x0600000000000000, "F"},
-      {0x0700000000000000, "H"},
-      {0x0800000000000000, "Hz"},
-      {0x0900000000000000, "b"},
-      {0x0900820000000000, "B"},
-      {0x0900810000000000, ""},
-      {0x0A00000000000000, "C"},
-      {0x0B00000000000000, "??"},
-      {0x3700000000000000, "??"},
-      {0x6400000000000000, "events"},
-      {0x6500000000000000, "packets"},
-      // Prefixes.
-      {0x0100007300000000, "ps"},
-      {0x0100007600000000, "ns"},
-      {0x0100007900000000, "us"},
-      {0x0100007C00000000, "ms"},
-      {0x6500008200000000, "kpackets"},
-      {0x0800008500000000, "MHz"},
-      {0x0800008800000000, "GHz"},
-      {0x0800008B00000000, "THz"},
-      {0x0900890000000000, "Ki"},
-      {0x09008C0000000000, "KiB"},
-      {0x09008C0000000004, "4KiB"},
-      {0x09008C0000000008, "8KiB"},
-      {0x6400930000000000, "Mievents"},
-      {0x0900960000000000, "MiB"},
-      {0x09009D0000000000, "Gi"},
-      {0x0900A00000000000, "GiB"},
-      {0x0900A70000000000, "Ti"},
-      {0x0900AA0000000000, "TiB"},
-      {0x0100007500000000, "s"},  // a scale without a prefix
-      // Whole labels, whatever the quantity.
-      {0x0100007980000018, "24Mticks"},
-      {0x0900007600000001, "1Gticks"},
-      {0x0101000000000000, "hwticks?"},
-      {0x0902000000000000, "hwpage?"},
-      {0x0103000000000000, "s"},
-  };
-  for (const auto& [unit, label] : labels)
-    EXPECT_EQ(KdReportCopyUnitLabel(static_cast<std::int64_t>(unit)), label) << std::hex << unit;
+  // Quantities without a scale, prefixes (75: a scale without one), and units that have whole labels.
+  std::istringstream labels(
+      "0 - 0100000000000000 s 0200000000000000 W 0300000000000000 J 0400000000000000 A 0500000000000000 V "
+      "0600000000000000 F 0700000000000000 H 0800000000000000 Hz 0900000000000000 b 0900820000000000 B "
+      "0900810000000000 - 0A00000000000000 C 0B00000000000000 ?? 3700000000000000 ?? 6400000000000000 events "
+      "6500000000000000 packets 0100007300000000 ps 0100007600000000 ns 0100007900000000 us "
+      "0100007C00000000 ms 6500008200000000 kpackets 0800008500000000 MHz 0800008800000000 GHz "
+      "0800008B00000000 THz 0900890000000000 Ki 09008C0000000000 KiB 09008C0000000004 4KiB "
+      "09008C0000000008 8KiB 6400930000000000 Mievents 0900960000000000 MiB 09009D0000000000 Gi "
+      "0900A00000000000 GiB 0900A70000000000 Ti 0900AA0000000000 TiB 0100007500000000 s "
+      "0100007980000018 24Mticks 0900007600000001 1Gticks 0101000000000000 hwticks? "
+      "0902000000000000 hwpage? 0103000000000000 s");
+  std::int64_t unit = 0;
+  for (std::string label; labels >> std::hex >> unit >> label;)
+    EXPECT_EQ(KdReportCopyUnitLabel(unit), label == "-" ? "" : label) << std::hex << unit;
+  EXPECT_TRUE(labels.eof());
   EXPECT_EQ(KdReportCopyUnitLabel(kKdReportInvalid), std::nullopt);
 }
 
 TEST(Units, HaveExactFactors) {
-  struct Row {
-    std::uint64_t scale, numerator, denominator;
-  };
-  const std::vector<Row> rows = {
-      {0, 1, 1},
-      {0x7980000018, 1, 24000000},
-      {0x8C0000000004, 32768, 1},
-      {5, 5, 1},
-      {0x80000000, 1, 1},
-      {0x7F7F00000000, 1, 1},
-      {0x828200000003, 3 * 8 * 1000, 1},
-      {0x9200000000, 10000000000000000000U, 1},
-      {0x0100000000, 1, 0},    // 10^126 in 64 bits
-      {0xFFFF00000000, 1, 0},  // an exponent of 128 is one of -128
-      {0xBF0000000000, 0, 1},  // shifted out
-  };
-  for (const Row& row : rows) {
-    std::uint64_t numerator = 9, denominator = 9;
-    EXPECT_EQ(KdReportUnitGetScale(static_cast<std::int64_t>(row.scale), numerator, denominator), kKdSuccess);
-    EXPECT_EQ(std::pair(numerator, denominator), std::pair(row.numerator, row.denominator))
-        << std::hex << row.scale;
+  using Number = std::uint64_t;
+  // At the end: 10^126 in 64 bits, an exponent of 128, which is one of -128, and one that is shifted out.
+  const std::tuple<std::int64_t, Number, Number> rows[] = {{0, 1, 1},
+                                                           {0x7980000018, 1, 24000000},
+                                                           {0x8C0000000004, 32768, 1},
+                                                           {5, 5, 1},
+                                                           {0x80000000, 1, 1},
+                                                           {0x7F7F00000000, 1, 1},
+                                                           {0x828200000003, 3 * 8 * 1000, 1},
+                                                           {0x9200000000, 10000000000000000000U, 1},
+                                                           {0x0100000000, 1, 0},
+                                                           {0xFFFF00000000, 1, 0},
+                                                           {0xBF0000000000, 0, 1}};
+  for (const auto& [scale, multiplier, divisor] : rows) {
+    Number numerator = 9, denominator = 9;
+    EXPECT_EQ(KdReportUnitGetScale(scale, numerator, denominator), kKdSuccess);
+    EXPECT_EQ(std::pair(numerator, denominator), std::pair(multiplier, divisor)) << std::hex << scale;
   }
   EXPECT_DOUBLE_EQ(KdReportScaleValue(1500, kNanoseconds, kKdReportSeconds), 1.5e-6);
   EXPECT_EQ(KdReportScaleValue(~std::uint64_t{0}, kKdReportSeconds, kKdReportSeconds),
@@ -123,13 +87,11 @@ TEST(Descriptions, OfSamples) {
             ">                  CH[     OFF] = { # 8        4.500e-06 s / 75.0% }\n");
   EXPECT_EQ(describe(sampled(channelType(2, 1), {{1, {1, 0, 0}}}, unit(kTicks))),
             ">                  CH[     0x1] = { # 0              nan s /  nan% }\n");
+  PlistData bucketsOfTen(16);
+  bucketsOfTen[0] = std::byte{10};
+  bucketsOfTen[12] = std::byte{2};  // so many
   PlistDictionary info = unit(kNanoseconds);
-  info.set("KdReportChannelConfig", PlistValue::data([] {
-             PlistData config;
-             tbdaily::appendLittleEndian(config, std::uint64_t{10});
-             tbdaily::appendLittleEndian(config, std::uint64_t{2} << 32);
-             return config;
-           }()));
+  info.set("KdReportChannelConfig", PlistValue::data(bucketsOfTen));
   EXPECT_EQ(describe(sampled(channelType(3, 2), {{1, {2, 3, 9, 12}}, {1, {0, 0, 0, 0}}}, info)),
             ">                  CH[           0 -           10 ns] = { m            3; M            9; s     "
             "      12; # "

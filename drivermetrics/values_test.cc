@@ -75,8 +75,7 @@ TEST(Values, HistogramBounds) {
       {{{0x80000000, 0, 2}}, {}},  // 32-bit arithmetic: the second bound is 0
       {{{0x80000000, 1, 2}}, {0x80000000, 0x4000000000000000}},
       {{{0xFFFFFFFF, 1, 2}}, {}},  // the second bound is negative
-      {{}, {}},
-  };
+      {{}, {}}};
   for (std::size_t row = 0; row < cases.size(); ++row) {
     const auto& [segments, bounds] = cases[row];
     SCOPED_TRACE("row " + std::to_string(row));

@@ -2,10 +2,7 @@
 
 #include <gtest/gtest.h>
 
-#include <bit>
-#include <cstdlib>
-#include <limits>
-#include <random>
+#include <cmath>
 
 #include "platform/calendar.h"
 
@@ -13,30 +10,16 @@ namespace tbdaily {
 namespace {
 
 TEST(RealText, IsShortAndPositionalWherePeopleReadIt) {
-  const std::pair<double, const char*> cases[] = {{0.0, "0"},
-                                                  {-0.0, "-0"},
-                                                  {10.0, "10"},
-                                                  {0.1, "0.1"},
-                                                  {0.00001, "0.00001"},
-                                                  {1e-6, "1e-06"},
-                                                  {-150.25, "-150.25"},
-                                                  {1e15, "1000000000000000"},
-                                                  {1e16, "1e+16"},
-                                                  {1.7976931348623157e308, "1.7976931348623157e+308"},
-                                                  {std::numeric_limits<double>::infinity(), "inf"},
-                                                  {-std::numeric_limits<double>::infinity(), "-inf"}};
+  const std::pair<double, const char*> cases[] = {
+      {0.0, "0"},           {-0.0, "-0"},
+      {10.0, "10"},         {0.1, "0.1"},
+      {0.00001, "0.00001"}, {1e-6, "1e-06"},
+      {-150.25, "-150.25"}, {1e15, "1000000000000000"},
+      {1e16, "1e+16"},      {HUGE_VAL, "inf"},
+      {-HUGE_VAL, "-inf"},  {1.7976931348623157e308, "1.7976931348623157e+308"}};
   for (const auto& [value, text] : cases) EXPECT_EQ(realText(value), text);
   EXPECT_EQ(realText(0.1F), "0.1");
   EXPECT_EQ(realText(static_cast<double>(0.1F)), "0.10000000149011612");
-}
-
-TEST(RealText, ReadsBackToTheSameValue) {
-  std::mt19937_64 random(7);
-  for (int i = 0; i < 20000; ++i) {
-    const auto value = std::bit_cast<double>(random());
-    if (value != value) continue;
-    ASSERT_EQ(std::strtod(realText(value).c_str(), nullptr), value);
-  }
 }
 
 TEST(DateText, IsUtcWithTheFractionOnlyWhereAsked) {

@@ -1,7 +1,6 @@
 #include <gmock/gmock.h>
 
 #include <cmath>
-#include <limits>
 
 #include "platform/plist_text.h"
 #include "report/distribution_summary.h"
@@ -14,36 +13,36 @@ constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
 constexpr std::int64_t kMin = std::numeric_limits<std::int64_t>::min();
 
 TEST(ScalarRounding, FollowsIntervalThenFigures) {
-  const std::optional<std::int64_t> none;
-  const struct {
-    std::int64_t value;
-    std::optional<std::int64_t> interval, figures;
-    std::int64_t expected;
-  } cases[] = {{14, 10, none, 10},
-               {15, 10, none, 20},
-               {7, 0, none, 0},
-               {-4, 10, none, 0},
-               {-5, 10, none, -10},
-               {kMin, 10, none, kMin},
-               {kMax, 10, none, -9223372036854775806},  // the unsigned result, read as signed
-               {5, -1, none, 0},                        // an interval of 2^64 - 1: half of it is not reached
-               {kMax, -2, none, -2},                    // here it is reached
-               {999, none, 2, 1000},
-               {45, none, 1, 50},
-               {-150, none, 1, -200},
-               {5, none, 0, 10},
-               {0, none, 1, 0},
-               {kMax, none, 0, kMax},
-               {kMin, none, 0, kMin},
-               {7, none, -1000, 0},  // ten to the power of a thousand: nothing is left
-               {1536, 1024, 1, 2000},
-               {kMin, none, none, kMin}};
-  for (const auto& c : cases) {
+  using Option = std::optional<std::int64_t>;
+  const Option none;
+  // In turn: 2^64 wraps to a negative number; intervals of 2^64 - 1 and 2^64 - 2, of which half is not
+  // reached and reached; and ten to the power of a thousand, which leaves nothing.
+  const std::tuple<std::int64_t, Option, Option, std::int64_t> cases[] = {
+      {14, 10, none, 10},
+      {15, 10, none, 20},
+      {7, 0, none, 0},
+      {-4, 10, none, 0},
+      {-5, 10, none, -10},
+      {kMin, 10, none, kMin},
+      {kMax, 10, none, -9223372036854775806},
+      {5, -1, none, 0},
+      {kMax, -2, none, -2},
+      {999, none, 2, 1000},
+      {45, none, 1, 50},
+      {-150, none, 1, -200},
+      {5, none, 0, 10},
+      {0, none, 1, 0},
+      {kMax, none, 0, kMax},
+      {kMin, none, 0, kMin},
+      {7, none, -1000, 0},
+      {1536, 1024, 1, 2000},
+      {kMin, none, none, kMin}};
+  for (const auto& [value, interval, figures, expected] : cases) {
     PlistDictionary options{{"unknown", PlistValue::int64(3)}};
-    if (c.interval) options.set("bucket_interval", PlistValue::int64(*c.interval));
-    if (c.figures) options.set("sig_fig", PlistValue::int64(*c.figures));
-    EXPECT_EQ(roundedScalar(c.value, options), c.expected)
-        << c.value << " " << c.interval.value_or(-99) << " " << c.figures.value_or(-99);
+    if (interval) options.set("bucket_interval", PlistValue::int64(*interval));
+    if (figures) options.set("sig_fig", PlistValue::int64(*figures));
+    EXPECT_EQ(roundedScalar(value, options), expected)
+        << value << " " << interval.value_or(-99) << " " << figures.value_or(-99);
   }
 }
 

@@ -2,8 +2,6 @@
 
 #include <gmock/gmock.h>
 
-#include <algorithm>
-
 #include "platform/preferences_store.h"
 #include "storage/nand_key_map.h"
 #include "storage/stats_table.h"
@@ -92,15 +90,13 @@ TEST(NandInfo, HoldsEachFieldAsFarAsTheExportVersionAllows) {
 }
 
 TEST(NandInfo, DerivesItsOwnValues) {
-  const auto choke = [](std::uint64_t value) { return full().record(142, {value}); };
-  const auto formatted = [](std::uint64_t time) { return full().record(56, {time}); };
   const std::vector<std::tuple<StatsBuffer, const char*, std::optional<std::int64_t>>> cases = {
-      {formatted(946684800 + 604799), "formatDaysSince2000", 0},
-      {formatted(946684800 + 604800), "formatDaysSince2000", 1},
-      {choke(999), "maxMemChokeDuration", 999},
-      {choke(1235), "maxMemChokeDuration", 1240},
-      {choke(9995), "maxMemChokeDuration", 10000},
-      {choke((1ULL << 32) + 5), "maxMemChokeDuration", 5},
+      {full().record(56, {946684800 + 604799}), "formatDaysSince2000", 0},
+      {full().record(56, {946684800 + 604800}), "formatDaysSince2000", 1},
+      {full().record(142, {999}), "maxMemChokeDuration", 999},
+      {full().record(142, {1235}), "maxMemChokeDuration", 1240},
+      {full().record(142, {9995}), "maxMemChokeDuration", 10000},
+      {full().record(142, {(1ULL << 32) + 5}), "maxMemChokeDuration", 5},
       {full().record(188, {12345}), "maxMemExtremeDuration", 12300},
       {full().record(86, {3}).record(85, {0xFFFFFFFF}), "IntermediatePartitionSize", {}},
       {full().record(86, {3}).record(85, {5}), "IntermediatePartitionSize", -2},
@@ -131,8 +127,7 @@ TEST(NandInfo, IsCopiedFromTheControllerAndMergedIntoALog) {
   EXPECT_EQ(log.size(), 26U);
 }
 
-// Every byte of a buffer is made wrong in turn; parser and dictionary come through.
-TEST(NandInfo, SurvivesCorruptBuffers) {
+TEST(NandInfo, HoldsAtMostSixtyKeysWhicheverByteOfItsBufferIsWrong) {
   StatsBuffer buffer = full().record(327, std::vector<std::uint64_t>(22, 3)).record(265, {1, 2, 3, 4, 5});
   buffer.record(289, {1, 1, 1, 1}).record(86, {9}).record(85, {4}).record(142, {123456});
   for (std::byte& byte : buffer.bytes) {

@@ -7,6 +7,7 @@
 #include "platform/calendar.h"
 #include "platform/platform.h"
 #include "testing/fake_platform.h"
+#include "testing/json_test_support.h"
 
 namespace tbdaily {
 namespace {
@@ -28,21 +29,16 @@ struct NandLog : ::testing::Test {
 };
 
 TEST_F(NandLog, HasItsHeaderAndOneLineOfNumbersByTheirKind) {
-  const PlistValue string = PlistValue::string("x"), one = PlistValue::int32(1);
-  const auto array = [](PlistArray elements) { return PlistValue::array(std::move(elements)); };
+  PlistDictionary info = testing::dictionaryOf(
+      R"({"string": "x", "a": 0, "b": -8.98846567431158e307, "nested": ["x", [1]], "c": ["x", false, 2.5],
+          "empty": [], "d": true, "ValidityList[2]": [1]})");
+  info.set("a", PlistValue::float32(0.25F));
+  info.set("date", PlistValue(PlistDate{0}));
   fake.logSubmission.identifier = "7f3e";
   fake.logSubmission.model = "V12,1";
   fake.logSubmission.version = "Velmora 9.2";
   EXPECT_EQ(
-      text({{"string", string},
-            {"a", PlistValue::float32(0.25F)},
-            {"b", PlistValue::float64(-0x1p1023)},
-            {"nested", array({string, array({one})})},
-            {"c", array({string, PlistValue::boolean(false), PlistValue::float64(2.5)})},
-            {"empty", array({})},
-            {"d", PlistValue::boolean(true)},
-            {"ValidityList[2]", array({one})},
-            {"date", PlistValue(PlistDate{0})}}),
+      text(info),
       "System ID: 7f3e\nHardware Model: V12,1\nOS Version: Velmora 9.2\nDate: 2026-11-16 09:07:04 -0800\n"
       "Incident ID: incident-1\nFaultdesk Key: error\n\n"
       "2026-11-16 09:07:04 -0800 tbdaily[412]: a:0.25;b:" +

@@ -2,7 +2,6 @@
 
 #include <cstdio>
 #include <random>
-#include <sstream>
 
 #include "platform/byte_writer.h"
 #include "storage/snapshot_format.h"
@@ -147,21 +146,6 @@ TEST(SnapshotDescribedLayout, RendersWhatLiesInsideOfAnUntrustedHeader) {
   const Rendering missing(kFourSlots, 5, &none);
   EXPECT_FALSE(missing.result);
   EXPECT_EQ(missing.text + std::to_string(missing.size + missing.cursor), "?????5");
-}
-
-// A fault shows as a sanitizer's report, a run without an end, or text without one.
-TEST(SnapshotDescribedLayout, SurvivesAnyHeaderAndRecords) {
-  std::mt19937 random(7);
-  for (std::uint32_t round = 0; round < 20000; ++round) {
-    Bytes description = header(random() % 2 + 5, 36, 4, kFields), records = kFourSlots;
-    for (Bytes* bytes : {&description, &records}) {
-      for (auto mutations = random() % 4; mutations > 0; --mutations)
-        (*bytes)[random() % bytes->size()] = static_cast<std::byte>(random() % 3 == 0 ? 0xFF : random());
-      if (random() % 4 == 0) bytes->resize(random() % bytes->size() + 1);
-    }
-    const Rendering rendering(records, random() % 2000 + 1, &description, round % 3);
-    ASSERT_EQ(rendering.size, rendering.text.size() + 1);
-  }
 }
 
 using Arguments = SnapshotFormat::Arguments;

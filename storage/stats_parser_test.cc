@@ -1,7 +1,5 @@
 #include <gmock/gmock.h>
 
-#include <algorithm>
-
 #include "storage/stats_context.h"
 #include "storage/stats_table.h"
 #include "storage/storage_test_support.h"

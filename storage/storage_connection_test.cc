@@ -2,7 +2,6 @@
 
 #include <gmock/gmock.h>
 
-#include <algorithm>
 #include <new>
 
 #include "storage/storage_test_support.h"
@@ -21,19 +20,6 @@ namespace {
 
 using ::testing::ElementsAre;
 using testing::StatsBuffer;
-
-TEST(NandExporters, CarryTheCodesOfTheWireProtocol) {
-  for (const NandExporter& e : std::span(nand_exporters).first(2)) {
-    std::vector<std::uint32_t> codes;
-    for (const SelectorGetter getter :
-         {e.statsSelectors, e.defectsListSelectors, e.telemetryListSelectors, e.taskSchedulerSelectors,
-          e.snapshotSelectors, e.snapshotHeaderSelectors, e.bandStatsSelectors}) {
-      EXPECT_EQ(getter()->sizeQuery, getter()->dataFetch);
-      codes.push_back(getter()->sizeQuery);
-    }
-    EXPECT_THAT(codes, ElementsAre(13, 15, 17, 39, 22, 145, 11));
-  }
-}
 
 TEST(StxRequest, HasItsLayout) {
   constexpr STXSelectorPair kPair = {0x01020304, 0xA1B2C3D4};
@@ -101,9 +87,8 @@ TEST(FetchStatsContext, TellsEachTroubleAndReleasesEverything) {
 
 TEST(FetchStatsContext, FollowsTheSelectorsOfTheDescriptor) {
   static constexpr STXSelectorPair kUnserved = {kNoSelector, 13};
-  const SelectorGetter getters[] = {[]() -> const STXSelectorPair* { return nullptr; },
-                                    [] { return &kUnserved; }};
-  for (const SelectorGetter getter : getters) {
+  for (const SelectorGetter getter : {SelectorGetter([]() -> const STXSelectorPair* { return nullptr; }),
+                                      SelectorGetter([] { return &kUnserved; })}) {
     std::array<NandExporter, 2> table = {nand_exporters[0], {}};
     table[0].statsSelectors = getter;
     Fetch fetch;

@@ -3,33 +3,25 @@
 #include <gmock/gmock.h>
 
 #include <cmath>
-#include <limits>
 
+#include "platform/byte_writer.h"
 #include "platform/plist_text.h"
 #include "storage/storage_test_support.h"
 #include "storage/write_amplification.h"
 #include "testing/fake_platform.h"
+#include "testing/json_test_support.h"
 
 namespace tbdaily {
 namespace {
 
-using ::testing::ElementsAre;
 using ::testing::HasSubstr;
+using testing::plistOf;
 
 constexpr const char* kNvme = "VelmoraEmbeddedNVMeController";
 
-PlistValue number(std::int64_t n) {
-  return PlistValue::int64(n);
-}
-PlistValue text(const char* t) {
-  return PlistValue::string(t);
-}
-
 std::vector<std::byte> words(const std::vector<std::uint32_t>& values) {
   std::vector<std::byte> bytes;
-  for (const std::uint32_t value : values) {
-    for (int shift = 0; shift < 32; shift += 8) bytes.push_back(static_cast<std::byte>(value >> shift));
-  }
+  for (const std::uint32_t value : values) appendLittleEndian(bytes, value);
   return bytes;
 }
 
@@ -41,12 +33,14 @@ std::vector<std::byte> telemetry(std::uint32_t channels) {
   return words(values);
 }
 
-PlistDictionary characteristics(std::int64_t buses) {
-  return {{"chip-id", text("Q8A")}, {"manufacturer-id", text("4582603A5700")}, {"num-bus", number(buses)}};
+PlistValue characteristics(std::string_view key = {}, PlistValue value = {}) {
+  PlistDictionary all =
+      testing::dictionaryOf(R"({"chip-id": "Q8A", "manufacturer-id": "4582603A5700", "num-bus": 1})");
+  if (!key.empty()) all.set(key, std::move(value));
+  return PlistValue::dictionary(all);
 }
 
-class StructuredLogsTest : public ::testing::Test {
- protected:
+struct StructuredLogsTest : ::testing::Test {
   StructuredLogsTest() { gStorageLogState = {}; }
   ~StructuredLogsTest() override { EXPECT_EQ(fake.driverRegistry.openHandles(), 0U); }
 
@@ -74,19 +68,15 @@ TEST(WriteAmplification, CountsErasedUnitsForEachUnitWritten) {
   EXPECT_EQ(computeWriteAmplification(context).user, static_cast<double>(1000.0F * 16 / (1 << 20)));
   EXPECT_EQ(computeWriteAmplification(context).system, 8.0 * 16 * 16 / (1 << 20));
   context.hostWrites = 0;
-  EXPECT_EQ(computeWriteAmplification(context).user, std::numeric_limits<double>::infinity());
+  EXPECT_EQ(computeWriteAmplification(context).user, HUGE_VAL);
   EXPECT_TRUE(std::isnan(computeWriteAmplification({}).user));
 }
 
 TEST(WriteAmplification, TheThresholdIsARealNumberBetweenZeroAndTen) {
   const std::tuple<double, PlistValue, bool> cases[] = {
-      {1.7, PlistValue::float32(1.5F), true},
-      {1.7, PlistValue::float64(12), false},
-      {1.7, number(1), false},
-      {2.0, {}, false},
-      {2.5, PlistValue::float64(0), true},
-      {std::numeric_limits<double>::infinity(), {}, true},
-  };
+      {1.7, PlistValue::float32(1.5F), true}, {1.7, PlistValue::float64(12), false},
+      {1.7, PlistValue::int64(1), false},     {2.0, {}, false},
+      {2.5, PlistValue::float64(0), true},    {HUGE_VAL, {}, true}};
   for (const auto& [user, threshold, isAbove] : cases) {
     testing::FakePreferences preferences;
     preferences.setValue("userWAmp", threshold, "com.velmora.NANDInfo");
@@ -117,7 +107,8 @@ TEST_F(StructuredLogsTest, ValidityListsAreCollectedByIndexOrRefused) {
 
 TEST_F(StructuredLogsTest, TelemetryLogsOneRecordForEachChannel) {
   auto bytes = telemetry(2);
-  EXPECT_EQ(verdict(HandleTelemetryList, bytes, PlistValue::dictionary(characteristics(2))), "accepted. ");
+  const auto buses = [](std::int64_t count) { return characteristics("num-bus", PlistValue::int64(count)); };
+  EXPECT_EQ(verdict(HandleTelemetryList, bytes, buses(2)), "accepted. ");
   ASSERT_EQ(logs().size(), 2U);
   EXPECT_EQ(logs()[1].first, 176);
   const PlistDictionary& second = logs()[1].second;
@@ -126,39 +117,35 @@ TEST_F(StructuredLogsTest, TelemetryLogsOneRecordForEachChannel) {
   EXPECT_TRUE(second.contains("readStage[32]") && second.contains("retentionIndication[11]"));
   EXPECT_FALSE(second.contains("readStage[33]") || second.contains("algoNANDAccessesBin[0]"));
   EXPECT_EQ(second.size(), 7U + 33 + 23 + 8 + 38 + 12 + 10 + 10 + 10 + 12 + 12);
-  EXPECT_EQ(verdict(HandleTelemetryList, bytes, PlistValue::dictionary(characteristics(0))), "accepted. ");
+  EXPECT_EQ(verdict(HandleTelemetryList, bytes, buses(0)), "accepted. ");
   bytes.pop_back();
-  for (const std::int64_t buses : {2LL, -1LL, 0x7FFFFFFFLL})
-    EXPECT_EQ(verdict(HandleTelemetryList, bytes, PlistValue::dictionary(characteristics(buses))),
+  for (const std::int64_t odd : {2LL, -1LL, 0x7FFFFFFFLL})
+    EXPECT_EQ(verdict(HandleTelemetryList, bytes, buses(odd)),
               "refused. ERROR: Attempting to parse beyond the bounds of the buffer\n");
 }
 
 TEST_F(StructuredLogsTest, TelemetrySaysWhatTheCharacteristicsLack) {
   const std::tuple<const char*, PlistValue, std::string> cases[] = {
       {"chip-id", {}, "Could not determine the chip-id"},
-      {"chip-id", number(1), "chip-id is not stored as a PVStringTypeID"},
+      {"chip-id", PlistValue::int64(1), "chip-id is not stored as a PVStringTypeID"},
       {"chip-id", PlistValue::string(std::string(64, 'x')),
        "Unable to obtain chip-id as conversion from the UniChar contents of PVString failed, "
        "or the buffer of 64 bytes is too small"},
       {"manufacturer-id", {}, "Could not determine the manufacturer-id"},
-      {"manufacturer-id", number(1), "manufacturer-id is NULL"},
-      {"num-bus", text("2"), "could not determine the number of channels"}};
+      {"manufacturer-id", PlistValue::int64(1), "manufacturer-id is NULL"},
+      {"num-bus", PlistValue::string("2"), "could not determine the number of channels"}};
   const auto bytes = telemetry(1);
-  for (const auto& [key, value, error] : cases) {
-    PlistDictionary odd = characteristics(1);
-    odd.set(key, value);
-    EXPECT_EQ(verdict(HandleTelemetryList, bytes, PlistValue::dictionary(odd)),
+  for (const auto& [key, value, error] : cases)
+    EXPECT_EQ(verdict(HandleTelemetryList, bytes, characteristics(key, value)),
               "refused. ERROR: " + error + "\n");
-  }
-  EXPECT_EQ(verdict(HandleTelemetryList, bytes, text("?")),
+  EXPECT_EQ(verdict(HandleTelemetryList, bytes, PlistValue::string("?")),
             "refused. ERROR: Could not parse the Device Characteristics dictionary\n");
 }
 
 TEST_F(StructuredLogsTest, DefectsAreLoggedWithTheirModeInTheReason) {
   const auto bytes =
       words({0, 42, 1000, 0x00030002, 4, 5, 6, 3, 7, 0x180, 1, 0, 0, 0, 0, 3, 0, 0, 9, 1, 2, 3});
-  const PlistValue properties = PlistValue::dictionary({{"nand-device-desc", number(-2)}});
-  EXPECT_EQ(verdict(HandleDefectsList, bytes, properties),
+  EXPECT_EQ(verdict(HandleDefectsList, bytes, plistOf(R"({"nand-device-desc": -2})")),
             "accepted. Encountered unexpected defectMode: 0x9");
   ASSERT_EQ(logs().size(), 3U);  // entries that do not lie wholly inside are left out
   EXPECT_EQ(plistText(PlistValue::dictionary(logs()[0].second)),
@@ -167,7 +154,7 @@ TEST_F(StructuredLogsTest, DefectsAreLoggedWithTheirModeInTheReason) {
             R"({"Bus": 2, "CE": 3, "CAU": 4, "Block": 5, "Cycle": 6, "Reason": 203, "Page": 7, )"
             R"("Temperature": -128})");
   EXPECT_EQ(logs()[2].second.get("Reason").asInteger(), 3);
-  verdict(HandleDefectsList, bytes, PlistValue::dictionary({}), "STXStorage");
+  verdict(HandleDefectsList, bytes, plistOf("{}"), "STXStorage");
   EXPECT_EQ(logs()[4].second.get("Reason").asInteger(), 3);
 }
 
@@ -177,19 +164,15 @@ TEST_F(StructuredLogsTest, EveryListIsFetchedWhateverBecameOfTheOthers) {
   controller.buffers[15] = words({0, 1, 0});
   EXPECT_FALSE(DumpStorageStructuredLog(fake.platform, true));
   EXPECT_EQ(diagnostics.errors, "failed to create dictionary");
-  fake.driverRegistry.drivers[0].properties.set("Controller Characteristics",
-                                                PlistValue::dictionary(characteristics(1)));
+  fake.driverRegistry.drivers[0].properties.set("Controller Characteristics", characteristics());
   controller.requests.clear();
   EXPECT_TRUE(DumpStorageStructuredLog(fake.platform, true));
   EXPECT_EQ(logs().size(), 4U);  // three telemetry lists and the defects
-  std::vector<std::pair<int, int>> codesAndFlags;
-  for (const auto& request : controller.requests) {
-    codesAndFlags.emplace_back(std::to_integer<int>(request[0]), std::to_integer<int>(request[4]));
-  }
-  EXPECT_THAT(codesAndFlags,
-              ElementsAre(std::pair{13, 1}, std::pair{13, 0}, std::pair{11, 3}, std::pair{17, 3},
-                          std::pair{17, 2}, std::pair{17, 7}, std::pair{17, 6}, std::pair{17, 11},
-                          std::pair{17, 10}, std::pair{15, 3}, std::pair{15, 2}));
+  std::string codesAndFlags;
+  for (const auto& request : controller.requests)
+    codesAndFlags += std::to_string(std::to_integer<int>(request[0])) + "." +
+                     std::to_string(std::to_integer<int>(request[4])) + " ";
+  EXPECT_EQ(codesAndFlags, "13.1 13.0 11.3 17.3 17.2 17.7 17.6 17.11 17.10 15.3 15.2 ");
   controller.sizeStatus = kKdBadArgument;
   EXPECT_TRUE(DumpStorageStructuredLog(fake.platform, false));
   controller.sizeStatus = 0;

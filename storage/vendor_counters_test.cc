@@ -16,8 +16,7 @@ TEST(NandCounters, FollowTheLayoutOfTheController) {
       {parseCounters1xSandisk, 0x4635F243086D0DEF},
       {parseCounters1xHynix, 0x626B08811F682406},
       {parseCountersAlgoGeneric, 0x039CF5CA0FFFAD09},
-      {parseCountersAlgoGenericQ8, 0x9E14960BE3317C69},
-  };
+      {parseCountersAlgoGenericQ8, 0x9E14960BE3317C69}};
   for (const auto& [parser, sum] : layouts) {
     NandCounterRecord record;
     parser(block, record);

@@ -16,12 +16,10 @@ TYPED_TEST_SUITE_P(AbsentServicesContract);
 
 TYPED_TEST_P(AbsentServicesContract, AnswersNothing) {
   Platform& host = this->services;
-  EXPECT_TRUE(host.preferences.getValue("k", "d").isNone());
-  EXPECT_FALSE(host.deviceAnswers.booleanAnswer("InternalBuild"));
-  EXPECT_TRUE(host.deviceAnswers.copyAnswer("DiskUsage").isNone());
-  EXPECT_FALSE(host.deviceAnswers.currentOSBuildVersion());
-  EXPECT_FALSE(host.deviceAnswers.multiUserMode());
-  EXPECT_FALSE(host.deviceAnswers.systemGroupContainerPath("g").path);
+  DeviceAnswers& answers = host.deviceAnswers;
+  EXPECT_TRUE(host.preferences.getValue("k", "d").isNone() && answers.copyAnswer("DiskUsage").isNone());
+  EXPECT_FALSE(answers.booleanAnswer("InternalBuild") || answers.currentOSBuildVersion() ||
+               answers.multiUserMode() || answers.systemGroupContainerPath("g").path);
   LogSubmission& logs = host.logSubmission;
   EXPECT_FALSE(logs.isDiagnosticLogSubmissionEnabled());
   EXPECT_TRUE(logs.taskingValue("k").isNone());
@@ -38,9 +36,8 @@ TYPED_TEST_P(AbsentServicesContract, AnswersNothing) {
   std::size_t length = buffer.size();
   EXPECT_EQ(host.kernel.sysctlByName("vm.swapusage", buffer, length), 2);
   EXPECT_EQ(host.kernel.sysctlByName("kern.next_ecc_event", buffer, length), 2);
-  EXPECT_EQ(host.kernel.tickCount(), 0U);
-  EXPECT_FALSE(host.kernel.timebase());
-  EXPECT_EQ(host.kernel.currentTime().unixSeconds(), 0);
+  EXPECT_TRUE(host.kernel.tickCount() == 0 && !host.kernel.timebase() &&
+              host.kernel.currentTime().unixSeconds() == 0);
   EXPECT_FALSE(host.fileSystem.status("/file") || host.fileSystem.readFile("/file"));
   EXPECT_EQ(host.dynamicLoader.open("/library"), nullptr);
   const auto configuration = host.stackSnapshot.createConfiguration();

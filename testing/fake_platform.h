@@ -44,7 +44,7 @@ struct FakePlatform {
                     localeSettings,   serviceListener,   notifications, systemLog,     kernel,
                     fileSystem,       dynamicLoader,     messageDigest, diagnostics,   analyticsHome};
 
-  // Puts a property list into a file, through the fake codec.
+  // Puts a property list into a file.
   void putPlist(std::string_view path, const PlistDictionary& root);
   // The value that a log's bytes hold.
   PlistValue plistOf(const FakeLogSubmission::Log& log);

@@ -1,7 +1,6 @@
 // The fakes keep the contracts of the families that they stand in for.
 #include "testing/absent_services_contract.h"
 #include "testing/analytics_contract.h"
-#include "testing/property_list_codec_contract.h"
 #include "testing/service_contracts.h"
 
 namespace tbdaily::testing {
@@ -58,7 +57,6 @@ struct FakeSubject : FakePlatform {
 };
 
 INSTANTIATE_TYPED_TEST_SUITE_P(Fake, ServiceContract, FakeSubject);
-INSTANTIATE_TYPED_TEST_SUITE_P(Fake, PropertyListCodecContract, FakeSubject);
 INSTANTIATE_TYPED_TEST_SUITE_P(Fake, AnalyticsContract, FakeSubject);
 INSTANTIATE_TYPED_TEST_SUITE_P(Fake, AbsentServicesContract, FakeSubject);
 

@@ -85,21 +85,19 @@ TYPED_TEST_P(ServiceContract, SysctlsFillNoMoreThanTheRoomAndSayHowMuch) {
   constexpr std::byte kUntouched{0xEE};
   constexpr int kNoSuchName = 2, kTooSmall = 12;
   this->subject.setSysctl("kern.three", bytesOf("abc"));
-  struct Case {
-    std::string_view name;
-    std::size_t room;
-    int error;
-  };
-  for (const Case& c : {Case{"kern.three", 8, 0}, Case{"kern.three", 3, 0}, Case{"kern.three", 2, kTooSmall},
-                        Case{"kern.three", 0, kTooSmall}, Case{"kern.other", 8, kNoSuchName}}) {
+  for (const auto& [name, room, error] : {std::tuple("kern.three", std::size_t{8}, 0),
+                                          {"kern.three", 3, 0},
+                                          {"kern.three", 2, kTooSmall},
+                                          {"kern.three", 0, kTooSmall},
+                                          {"kern.other", 8, kNoSuchName}}) {
     PlistData buffer(8, kUntouched);
-    std::size_t length = c.room;
-    EXPECT_EQ(this->services.kernel.sysctlByName(c.name, buffer, length), c.error) << c.room;
-    if (c.error == 0) {
+    std::size_t length = room;
+    EXPECT_EQ(this->services.kernel.sysctlByName(name, buffer, length), error) << name << room;
+    if (error == 0) {
       EXPECT_EQ(length, 3U);
       EXPECT_EQ(PlistData(buffer.begin(), buffer.begin() + 3), bytesOf("abc"));
     }
-    EXPECT_EQ(buffer[c.error == 0 ? 3 : 0], kUntouched) << c.room;
+    EXPECT_EQ(buffer[error == 0 ? 3 : 0], kUntouched) << name << room;
   }
   const PlistDate now = PlistDate::fromUnixSeconds(1795511224.25);
   this->subject.setTime(now, 123456789012, {125, 3});
@@ -264,18 +262,15 @@ GTEST_ALLOW_UNINSTANTIATED_PARAMETERIZED_TEST(ComputationContract);
 
 TYPED_TEST_P(ComputationContract, ChoosesTheBestLocalizations) {
   using Texts = std::vector<std::string>;
-  struct Case {
-    Texts available, preferred, best;
-  };
-  for (const Case& c : {
-           Case{{"de", "en"}, {"en-GB"}, {"en"}},
-           Case{{"en", "en-GB"}, {"en-GB", "en-US"}, {"en-GB", "en"}},
-           Case{{"zh", "ZH_hant", "zh-Hant-HK"}, {"zh-Hant-TW"}, {"ZH_hant"}},
-           Case{{"pt-BR"}, {"pt", "PT_br"}, {"pt-BR"}},
-           Case{{"de", "en"}, {"en-GB", "de", "en-US"}, {"en", "de"}},
-           Case{{"", "de"}, {"fr", ""}, {}},
-       }) {
-    EXPECT_EQ(this->services.localeSettings.bestLocalizations(c.available, c.preferred), c.best);
+  const std::tuple<Texts, Texts, Texts> cases[] = {
+      {{"de", "en"}, {"en-GB"}, {"en"}},
+      {{"en", "en-GB"}, {"en-GB", "en-US"}, {"en-GB", "en"}},
+      {{"zh", "ZH_hant", "zh-Hant-HK"}, {"zh-Hant-TW"}, {"ZH_hant"}},
+      {{"pt-BR"}, {"pt", "PT_br"}, {"pt-BR"}},
+      {{"de", "en"}, {"en-GB", "de", "en-US"}, {"en", "de"}},
+      {{"", "de"}, {"fr", ""}, {}}};
+  for (const auto& [available, preferred, best] : cases) {
+    EXPECT_EQ(this->services.localeSettings.bestLocalizations(available, preferred), best);
   }
 }
 

@@ -16,7 +16,7 @@
 #include "platform/linux/linux_platform.h"
 #include "platform/linux/replay/recordings.h"
 #include "platform/plist/codec.h"
-#include "platform/plist/json.h"
+#include "testing/json_test_support.h"
 #include "testing/temporary_folder.h"
 
 namespace tbdaily::testing {
@@ -57,7 +57,6 @@ struct TestHost {
     return all;
   }
 
-  static PlistValue json(std::string_view text) { return plistFromJson(text).value; }
   PlistValue parse(std::string_view list) { return codec.parse(std::as_bytes(std::span(list))).value; }
 
   // Replaces one entry of a recording; a none value takes it away.

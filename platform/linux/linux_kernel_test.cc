@@ -23,29 +23,30 @@ TEST(LinuxKernelTest, FillsSysctlsFromIntegersErrorsAndEvents) {
     buffer.resize(length);
     return plistText(PlistValue::data(buffer));
   };
-  device.record("kernel.plist", "sysctl", device.json(R"({"int": -2, "text": "x", "bad": "x"})"));
+  device.record("kernel.plist", "sysctl", testing::plistOf(R"({"int": -2, "text": "x", "bad": "x"})"));
   device.record(
       "kernel.plist", "eccEvents",
       PlistValue::array({PlistValue::data(PlistData(3, std::byte{1})), PlistValue::data(PlistData(1))}));
   const auto setErrors = [&](const std::string& number) {
     device.record("kernel.plist", "errno",
-                  device.json(R"({"bad": )" + number + R"(, "kern.next_ecc_event": )" + number + "}"));
+                  testing::plistOf(R"({"bad": )" + number + R"(, "kern.next_ecc_event": )" + number + "}"));
   };
   setErrors("5");
-  EXPECT_EQ(read("int", 4), "<feffffff>");
-  EXPECT_EQ(read("int", 8), "<feffffffffffffff>");
-  EXPECT_EQ(read("int", 5), "errno 22");
-  EXPECT_EQ(read("text", 8), "errno 2");
-  EXPECT_EQ(read("bad", 8), "errno 5");
-  EXPECT_EQ(read("vm.swapusage", 32), "errno 2");
-  EXPECT_EQ(read("kern.next_ecc_event", 8), "<010101>");
-  EXPECT_EQ(read("kern.next_ecc_event", 8), "<00>");
-  EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 5");
+  const std::tuple<const char*, std::size_t, const char*> answers[] = {{"int", 4, "<feffffff>"},
+                                                                       {"int", 8, "<feffffffffffffff>"},
+                                                                       {"int", 5, "errno 22"},
+                                                                       {"text", 8, "errno 2"},
+                                                                       {"bad", 8, "errno 5"},
+                                                                       {"vm.swapusage", 32, "errno 2"},
+                                                                       {"kern.next_ecc_event", 8, "<010101>"},
+                                                                       {"kern.next_ecc_event", 8, "<00>"},
+                                                                       {"kern.next_ecc_event", 8, "errno 5"}};
+  for (const auto& [name, room, answer] : answers) EXPECT_EQ(read(name, room), answer) << name << room;
   setErrors("1099511627776");  // no error number
   EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 2");
 
   TestPlatform live(true);
-  live.record("clock.plist", "numerator", device.json("4294967296"));
+  live.record("clock.plist", "numerator", testing::plistOf("4294967296"));
   EXPECT_EQ(live.services.kernel.timebase()->numerator, 1U);
 }
 

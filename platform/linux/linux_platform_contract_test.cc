@@ -9,7 +9,6 @@
 #include "platform/linux/unix_socket.h"
 #include "platform/system_log.h"
 #include "testing/absent_services_contract.h"
-#include "testing/property_list_codec_contract.h"
 #include "testing/service_contracts.h"
 
 namespace tbdaily::testing {
@@ -97,7 +96,6 @@ using AbsentSubjects = ::testing::Types<TestPlatform, MissingRoot>;
 
 INSTANTIATE_TYPED_TEST_SUITE_P(Linux, ServiceContract, LinuxSubject);
 INSTANTIATE_TYPED_TEST_SUITE_P(Linux, ComputationContract, TestPlatform);
-INSTANTIATE_TYPED_TEST_SUITE_P(Linux, PropertyListCodecContract, TestPlatform);
 INSTANTIATE_TYPED_TEST_SUITE_P(Linux, AbsentServicesContract, AbsentSubjects);
 
 TEST(MissingRootTest, TakesNoWritesAndIsNotMade) {

@@ -18,8 +18,7 @@ using testing::TestHost;
 using Names = std::vector<std::string>;
 constexpr const char* kPreferences = "/var/mobile/Library/Preferences/";
 
-class PreferencesTest : public ::testing::Test {
- protected:
+struct PreferencesTest : ::testing::Test {
   std::string path(const char* name) { return std::string(kPreferences) + name; }
   TestHost device;
   LinuxPreferences preferences{device.host, device.codec};

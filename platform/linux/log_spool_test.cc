@@ -15,8 +15,7 @@ constexpr double kNow = 1795511224.99951171875;
 const PlistDate kDate = PlistDate::fromUnixSeconds(kNow);
 constexpr const char* kLogs = "/var/mobile/Library/Logs/";
 
-class SpoolTest : public ::testing::Test {
- protected:
+struct SpoolTest : ::testing::Test {
   bool write(const char* name, bool whole = true, double at = kNow) {
     return spool.writeLog(
         Consent::Yes, "165", name, {}, PlistDate::fromUnixSeconds(at),

@@ -3,9 +3,6 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
-#include <limits>
-#include <string>
-#include <utility>
 
 namespace tbdaily {
 namespace {

@@ -2,9 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <memory>
-#include <sstream>
-
 #include "platform/linux/store/sqlite_analytics_history.h"
 #include "testing/analytics_lines.h"
 #include "testing/temporary_folder.h"
@@ -14,8 +11,7 @@ namespace {
 
 using testing::Lines;
 
-class RecordTest : public ::testing::Test {
- protected:
+struct RecordTest : ::testing::Test {
   std::optional<std::string> import(const std::string& text) {
     const std::unique_ptr<std::FILE, int (*)(std::FILE*)> input(std::tmpfile(), &std::fclose);
     std::fwrite(text.data(), 1, text.size(), input.get());

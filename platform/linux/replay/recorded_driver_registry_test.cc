@@ -19,15 +19,13 @@ using Numbers = std::vector<std::uint64_t>;
 
 constexpr std::int64_t kFailure = 0xE00002C5;
 
-class DriversTest : public ::testing::Test {
- protected:
+struct DriversTest : ::testing::Test {
   void put(PlistArray entries) {
     device.record(recording::kRegistry, "entries", PlistValue::array(std::move(entries)));
   }
   // Opens the user client of the only driver.
-  void open(PlistDictionary client) {
-    put({PlistValue::dictionary(
-        {{"class", PlistValue::string("C")}, {"client", PlistValue::dictionary(std::move(client))}})});
+  void open(PlistValue client) {
+    put({PlistValue::dictionary({{"class", PlistValue::string("C")}, {"client", std::move(client)}})});
     const KdHandle service = registry.KdServiceGetMatchingService(registry.KdServiceMatching("C"));
     openStatus = registry.KdServiceOpen(service, 0, connection);
     registry.KdObjectRelease(service);
@@ -59,7 +57,7 @@ class DriversTest : public ::testing::Test {
 
 TEST_F(DriversTest, AWalkIsNoLongerValidWhenTheRegistryChanged) {
   EXPECT_TRUE(registry.KdServiceMatching("C").isNone());
-  put({PlistValue::dictionary({{"class", PlistValue::string("C")}})});
+  put({testing::plistOf(R"({"class": "C"})")});
   KdHandle iterator = 0;
   ASSERT_EQ(registry.KdServiceGetMatchingServices(registry.KdServiceMatching("C"), iterator), 0);
   EXPECT_TRUE(registry.KdIteratorIsValid(iterator));
@@ -74,19 +72,16 @@ TEST_F(DriversTest, AStorageClientTellsRequestsApartAndIsStrict) {
   device.put("/System/Device/six", "abcdef");
   device.put("/System/Device/seven", "ABCDEFG");
   device.put("/outside", "secret");
-  const PlistValue buffers = device.json(R"([
+  PlistDictionary client = testing::dictionaryOf(R"({"kind": "storage", "closeStatus": 3, "buffers": [
       {"method": 9, "code": 13, "file": "six", "fill": 5},
       {"method": 9, "code": 13, "file": "seven", "list": 1},
       {"method": 9, "code": 15, "file": "six", "size": 4294967295},
       {"method": 9, "code": 16, "sizeStatus": -536870206, "dataStatus": 3758097090},
       {"method": 9, "code": 17, "file": "../../outside"},
-      {"method": 8, "file": "seven"}])");
-  const PlistValue recommendation =
-      PlistValue::dictionary({{"method", PlistValue::int64(5)}, {"data", PlistValue::data(PlistData(2))}});
-  open({{"kind", PlistValue::string("storage")},
-        {"buffers", buffers},
-        {"recommendation", recommendation},
-        {"closeStatus", PlistValue::int64(3)}});
+      {"method": 8, "file": "seven"}]})");
+  client.set("recommendation", PlistValue::dictionary({{"method", PlistValue::int64(5)},
+                                                       {"data", PlistValue::data(PlistData(2))}}));
+  open(PlistValue::dictionary(client));
   EXPECT_EQ(call(9, request(13, 1), 4), (Bytes{6, 0, 0, 0}));
   EXPECT_EQ(call(9, request(13, 0), 6).size(), 5U);
   // The extended flag is the caller's; what fits is filled.
@@ -100,20 +95,18 @@ TEST_F(DriversTest, AStorageClientTellsRequestsApartAndIsStrict) {
   EXPECT_EQ(call(9, request(16, 0), 9), Bytes{-536870206});
   auto reserved = request(13, 1);
   reserved[23] = 1;
-  for (const auto& [method, bad, room] : {std::tuple{9U, reserved, 4UL},
-                                          {9U, Bytes(23, 0), 4UL},
-                                          {9U, request(13, 0), 4UL},
-                                          {9U, request(13, 8), 6UL},
-                                          {8U, request(13, 0), 6UL},
-                                          {9U, request(99, 0), 6UL}}) {
-    EXPECT_EQ(call(method, bad, room), Bytes{kKdBadArgument});
+  const std::tuple<std::uint32_t, Bytes, std::size_t> refused[] = {
+      {9, reserved, 4},       {9, Bytes(23, 0), 4},   {9, request(13, 0), 4},
+      {9, request(13, 8), 6}, {8, request(13, 0), 6}, {9, request(99, 0), 6}};
+  for (const auto& [method, bad, room] : refused) {
+    EXPECT_EQ(call(method, bad, room), Bytes{kKdBadArgument}) << ::testing::PrintToString(bad);
   }
   EXPECT_EQ(call(9, request(17, 0), 6), Bytes{kKdNotFound});
   EXPECT_EQ(registry.KdServiceClose(connection), 3);
   EXPECT_EQ(registry.openHandles(), 0U);
   EXPECT_EQ(call(5, {}, 8), Bytes{kKdBadArgument});
 
-  open({{"kind", PlistValue::string("storage")}, {"openStatus", PlistValue::int64(kFailure)}});
+  open(testing::plistOf(R"({"kind": "storage", "openStatus": 3758097093})"));
   EXPECT_EQ(openStatus, static_cast<KdStatus>(kFailure));
   EXPECT_EQ(registry.openHandles(), 0U);
 }
@@ -122,23 +115,23 @@ std::vector<std::byte> interests(const Numbers& channels) {
   std::vector<std::byte> list;
   appendLittleEndian(list, channels.size());
   for (const std::uint64_t id : channels) {
-    for (const std::uint64_t value : {std::uint64_t{7}, id, std::uint64_t{0}})
-      appendLittleEndian(list, value);
+    appendLittleEndian(list, std::uint64_t{7});
+    appendLittleEndian(list, id);
+    appendLittleEndian(list, std::uint64_t{0});
   }
   return list;
 }
 
-class HubTest : public DriversTest {
- protected:
+struct HubTest : DriversTest {
   HubTest() {
     record(R"([{"driver": 7, "channel": 1, "type": 1, "elements": [{"stamp": 1, "words": [1]}]}])");
   }
   void record(std::string_view channels) {
-    device.record(recording::kHub, "channels", device.json(channels));
+    device.record(recording::kHub, "channels", testing::plistOf(channels));
   }
   void openHub(PlistDictionary client = {}) {
     client.set("kind", PlistValue::string("hub"));
-    open(client);
+    open(PlistValue::dictionary(client));
   }
   KdStatus start(std::uint32_t method = 0) {
     std::size_t count = 0;
@@ -241,7 +234,7 @@ TEST_F(HubTest, LeavesNothingBehind) {
 }
 
 TEST_F(HubTest, IsStrict) {
-  open({{"kind", PlistValue::string("else")}});
+  open(testing::plistOf(R"({"kind": "else"})"));
   EXPECT_EQ(openStatus, kKdNotFound);
   openHub();
   const auto list = interests({1});
@@ -252,13 +245,9 @@ TEST_F(HubTest, IsStrict) {
   longer.resize(list.size() + 1);
   auto countTooLarge = list;
   countTooLarge[3] = std::byte{0xFF};
-  for (const std::span<const std::byte> bad : {std::span<const std::byte>(),
-                                               {list.data(), 7},
-                                               {list.data(), 8},
-                                               {list.data(), 31},
-                                               {longer},
-                                               {countTooLarge}})
-    EXPECT_EQ(configure(bad), kKdBadArgument) << bad.size();
+  for (const std::size_t length : {0U, 7U, 8U, 31U})
+    EXPECT_EQ(configure(std::span(list).first(length)), kKdBadArgument) << length;
+  for (const auto& bad : {longer, countTooLarge}) EXPECT_EQ(configure(bad), kKdBadArgument) << bad.size();
   EXPECT_EQ(configure(list, 0), kKdBadArgument);
   EXPECT_EQ(map(), kKdBadArgument);
   EXPECT_EQ(update(), kKdBadArgument);

@@ -66,7 +66,7 @@ TEST(RecordingsTest, AnswerBeforeTheLiveHostEachForItself) {
   for (std::size_t i = 0; i < live.size(); ++i) {
     Texts expected = live;
     expected[i] = cases[i].answer;
-    device.record(cases[i].file, cases[i].key, device.json(cases[i].recorded));
+    device.record(cases[i].file, cases[i].key, testing::plistOf(cases[i].recorded));
     EXPECT_EQ(answers(), expected) << cases[i].key;
     const bool takesEveryKind = cases[i].key == "DiskUsage";
     device.record(cases[i].file, cases[i].key, takesEveryKind ? PlistValue() : PlistValue::int64(5));

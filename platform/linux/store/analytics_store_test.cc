@@ -7,9 +7,6 @@
 #include <unistd.h>
 
 #include <fstream>
-#include <functional>
-#include <limits>
-#include <map>
 #include <thread>
 
 #include "platform/linux/host_test_support.h"

@@ -3,9 +3,7 @@
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
-#include <cstdlib>
-
+#include "testing/json_test_support.h"
 #include "tools/tallyctl/metrics/hub_legends.h"
 #include "tools/tallyctl/sample/metrics.h"
 
@@ -88,45 +86,34 @@ TEST(HubAdvance, MovesEveryChannelOfTheSample) {
   }
 }
 
-PlistValue hubOf(PlistValue type, PlistArray elements) {
-  const PlistValue channel = PlistValue::dictionary({{"driver", PlistValue::int64(1)},
-                                                     {"channel", PlistValue::int64(2)},
-                                                     {"type", std::move(type)},
-                                                     {"elements", PlistValue::array(std::move(elements))}});
-  return PlistValue::dictionary({{"channels", PlistValue::array({channel})}});
-}
-PlistValue element(std::int64_t stamp, const Words& words) {
-  PlistArray array;
-  for (const std::int64_t word : words) array.push_back(PlistValue::int64(word));
-  return PlistValue::dictionary({{"stamp", PlistValue::int64(stamp)}, {"words", PlistValue::array(array)}});
+PlistValue hubOf(std::string_view type, std::string_view elements) {
+  return testing::plistOf(R"({"channels": [{"driver": 1, "channel": 2, "type": )" + std::string(type) +
+                          R"(, "elements": [)" + std::string(elements) + "]}]}");
 }
 
 TEST(HubAdvance, LeavesWhatItCannotMove) {
-  const PlistValue one = PlistValue::int64(1);
-  const PlistValue textStamp = PlistValue::dictionary({{"stamp", PlistValue::string("1")}});
-  const PlistValue realWord =
-      PlistValue::dictionary({{"stamp", one}, {"words", PlistValue::array({PlistValue::float64(1)})}});
+  constexpr const char* kOne = R"({"stamp": 1, "words": [1]})";
   for (const PlistValue& hub :
-       {PlistValue(), PlistValue::dictionary({}), PlistValue::dictionary({{"channels", one}}),
-        PlistValue::dictionary({{"channels", PlistValue::array({one})}}), hubOf(one, {}), hubOf(one, {one}),
-        hubOf(one, {textStamp}), hubOf(one, {element(1, {1, 2, 3, 4, 5})}),
-        hubOf(PlistValue::int64(4), {element(1, {1}), realWord}),
-        hubOf(PlistValue::int64(0), {element(1, {1})}), hubOf(PlistValue::int64(3), {element(1, {1})}),
-        hubOf(PlistValue::string("1"), {element(1, {1})})}) {
+       {PlistValue(), testing::plistOf("{}"), testing::plistOf(R"({"channels": 1})"),
+        testing::plistOf(R"({"channels": [1]})"), hubOf("1", ""), hubOf("1", "1"), hubOf("0", kOne),
+        hubOf("3", kOne), hubOf(R"("1")", kOne), hubOf("1", R"({"stamp": "1"})"),
+        hubOf("1", R"({"stamp": 1, "words": [1, 2, 3, 4, 5]})"),
+        hubOf("4", R"({"stamp": 1, "words": [1]}, {"stamp": 1, "words": [1.0]})")}) {
     const AdvancedHub later = advancedHub(hub, PlistValue(), 5);
     EXPECT_TRUE(later.root == hub && later.channels == 0);
   }
 }
 
 TEST(HubAdvance, WrapsAndKeepsTheInvalidNumber) {
-  const auto advanced = [](std::int64_t format, PlistArray elements) {
-    const PlistValue hub = hubOf(PlistValue::int64(format), std::move(elements));
-    return channelsOf(advancedHub(hub, PlistValue(), kYear).root)[0];
+  const auto advanced = [](std::string_view type, std::string_view elements) {
+    return channelsOf(advancedHub(hubOf(type, elements), PlistValue(), kYear).root)[0];
   };
-  const Channel state = advanced(2, {element(-1, {}), element(INT64_MAX, {1, INT64_MAX, INT64_MAX, -1})});
+  const Channel state = advanced("2", R"({"stamp": -1, "words": []}, {"stamp": 9223372036854775807,
+      "words": [1, 9223372036854775807, 9223372036854775807, -1]})");
   EXPECT_EQ(total(state, 2), INT64_MIN + static_cast<std::int64_t>(kYear) - 1);
   EXPECT_EQ(state.rows[1][4], -1);
-  const Words kept = advanced(4, {element(1, {INT64_MIN, INT64_MAX})}).rows[0];
+  const Words kept =
+      advanced("4", R"({"stamp": 1, "words": [-9223372036854775808, 9223372036854775807]})").rows[0];
   EXPECT_EQ(kept[1], INT64_MIN);
   EXPECT_NE(kept[2], INT64_MAX);
 }

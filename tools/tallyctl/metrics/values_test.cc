@@ -2,8 +2,7 @@
 
 #include <gmock/gmock.h>
 
-#include "platform/byte_writer.h"
-#include "platform/plist/json.h"
+#include "drivermetrics/metrics_test_support.h"
 #include "tools/tallyctl/metrics/json.h"
 #include "tools/tallyctl/metrics/selection.h"
 #include "tools/tallyctl/metrics/view.h"
@@ -16,30 +15,14 @@ using ::testing::HasSubstr;
 
 constexpr std::int64_t kNanoseconds = 0x0100007600000000;
 
-struct Element {
-  std::uint64_t stamp = 0;
-  std::vector<std::int64_t> words;
-};
+using kdreport::testing::Element;
 
 // A channel of a sample, which may carry other elements than its type announces.
-std::vector<ChannelValues> valuesOf(std::uint64_t format, std::uint64_t announced,
+std::vector<ChannelValues> valuesOf(unsigned format, unsigned announced,
                                     const std::vector<Element>& elements) {
-  const auto type = static_cast<std::int64_t>(format | announced << 32);
-  PlistData bytes;
-  for (Element element : elements) {
-    element.words.resize(kElementWords);
-    for (const auto number :
-         {std::int64_t{1}, std::int64_t{2}, type, static_cast<std::int64_t>(element.stamp)})
-      appendLittleEndian(bytes, static_cast<std::uint64_t>(number));
-    for (const std::int64_t word : element.words) appendLittleEndian(bytes, static_cast<std::uint64_t>(word));
-  }
-  const PlistDictionary record{
-      {std::string(kd_report_key::kLegendChannel),
-       PlistValue::array({PlistValue::int64(2), PlistValue::int64(type)})},
-      {std::string(kd_report_key::kRawElements), elements.empty() ? PlistValue() : PlistValue::data(bytes)}};
-  const auto samples = KdReportCreateAggregateFromPropertyList(PlistValue::dictionary(
-      {{std::string(kd_report_key::kChannels), PlistValue::array({PlistValue::dictionary(record)})}}));
-  return readChannels(samples.get(), ChannelContents::Values).value();
+  const KdReportChannel channel =
+      kdreport::testing::sampled(kdreport::testing::channelType(format, announced), elements);
+  return readChannels(kdreport::testing::collectionOf({channel}).get(), ChannelContents::Values).value();
 }
 
 TEST(MetricsValuesTest, CodesAreDecimalNegativeOrHexadecimal) {
@@ -48,8 +31,7 @@ TEST(MetricsValuesTest, CodesAreDecimalNegativeOrHexadecimal) {
       {"-1", UINT64_MAX},
       {"-9223372036854775808", std::uint64_t{1} << 63},
       {"0x0100007600000000", kNanoseconds},
-      {"0XfF", 255},
-  };
+      {"0XfF", 255}};
   for (const auto& [text, code] : codes) EXPECT_EQ(parseCode(text), code) << text;
   for (const char* bad : {"18446744073709551616", "-9223372036854775809", "0x10000000000000000", "", "0x",
                           "0x-1", "--1", "+1", "1 "})
@@ -58,7 +40,7 @@ TEST(MetricsValuesTest, CodesAreDecimalNegativeOrHexadecimal) {
 
 // A channel that runs over the end of the hub's buffer keeps its place without elements.
 TEST(MetricsValuesTest, ChannelsWithoutTheElementsThatTheirTypeAnnounces) {
-  const auto json = [](std::uint64_t format, std::uint64_t announced, const std::vector<Element>& elements) {
+  const auto json = [](unsigned format, unsigned announced, const std::vector<Element>& elements) {
     JsonWriter writer(JsonLayout::OneLine);
     writeChannels(writer, valuesOf(format, announced, elements), ChannelContents::Values);
     return writer.take();
