@@ -39,6 +39,7 @@ LinuxSystemLog::LinuxSystemLog(const Host& host, Kernel& kernel, DeviceAnswers& 
     : host_(host),
       kernel_(kernel),
       answers_(answers),
+      sender_(kernel.processName() + "[" + std::to_string(kernel.processIdentifier()) + "]"),
       toStandardError_(environmentIs("TBDAILY_LOG", "stderr")),
       journal_(toStandardError_ && std::getenv("JOURNAL_STREAM") != nullptr),
       debug_(environmentIs("TBDAILY_LOG_DEBUG", "1")) {}
@@ -67,8 +68,7 @@ void LinuxSystemLog::writeLine(LogLevel level, std::string_view message) {
   const LevelText& text = kLevels[static_cast<std::size_t>(level)];
   const std::string_view prefix = journal_ ? text.journalPrefix : "";
   std::string lines(prefix);
-  lines.append(stampText(kernel_.currentTime(), 6)).append(" ").append(kernel_.processName());
-  lines.append("[").append(std::to_string(kernel_.processIdentifier())).append("] ");
+  lines.append(stampText(kernel_.currentTime(), 6)).append(" ").append(sender_).append(" ");
   lines.append(text.name).append(": ");
   for (const char c : message) {
     lines += c;

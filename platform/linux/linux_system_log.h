@@ -31,6 +31,7 @@ class LinuxSystemLog : public SystemLog {
   const Host& host_;
   Kernel& kernel_;
   DeviceAnswers& answers_;
+  std::string sender_;  // "tbdaily[412]"
   bool toStandardError_;
   bool journal_;
   bool debug_;

@@ -1,5 +1,6 @@
 #include "platform/linux/log_spool.h"
 
+#include <sys/file.h>
 #include <unistd.h>
 
 #include <array>
@@ -21,6 +22,8 @@ constexpr unsigned kMaximumNumber = 100000;  // of logs with one name and second
 constexpr int kCarewellGenerations = 5;
 constexpr const char* kStructured = "Structured";
 constexpr const char* kCarewell = "Carewell";
+constexpr const char* kLock = ".lock";
+constexpr double kLockPatience = 5.0;  // seconds
 
 std::string dayText(PlistDate now) {
   return dateText(now, DateFraction::Drop).substr(0, 10);
@@ -39,16 +42,6 @@ class FileOutput : public LogOutput {
   int fd_;
   int error_ = 0;
 };
-
-// All of the text or none of it: half a line would spoil the next one too. Callers hold the lock.
-int appendWhole(const DeviceFolder& folder, const std::string& name, std::string_view text) {
-  FileDescriptor file;
-  struct stat before {};
-  if (const int error = folder.openForAppending(name, file); error != 0) return error;
-  if (::fstat(file.get(), &before) != 0) return errno;
-  const int error = writeAll(file.get(), text);
-  return error != 0 && ::ftruncate(file.get(), before.st_size) != 0 ? errno : error;
-}
 
 // What a job that died in the middle may have left: passing names, and meta files whose log never came.
 // Callers hold the lock.
@@ -114,7 +107,7 @@ void LogSpool::noteFailure(std::string_view folder, int error) const {
 
 int LogSpool::lockSpool(DeviceFolder& folder, FileLock& lock) const {
   const int error = host_.files().makeFolder(kFolder, folder);
-  return error == 0 ? lock.acquire(folder, ".lock") : error;
+  return error == 0 ? lock.acquire(folder, kLock) : error;
 }
 
 bool LogSpool::writeLog(Consent consent, std::string_view type, std::string_view name,
@@ -156,17 +149,48 @@ bool LogSpool::writeLog(Consent consent, std::string_view type, std::string_view
   return error == 0;
 }
 
-void LogSpool::appendStructured(int type, const PlistDictionary& data, PlistDate now) {
-  const std::string name = dayText(now) + ".jsonl";
-  const std::string line =
-      "{\"time\": \"" + stampText(now, 3) + "\", \"data\": " + jsonText(PlistValue::dictionary(data)) + "}\n";
+int LogSpool::openStructured(int type, const std::string& day) {
   DeviceFolder spool, structured, folder;
-  FileLock lock;
-  int error = lockSpool(spool, lock);
+  StructuredFile& open = structured_[type];
+  open.day = day;
+  int error = host_.files().makeFolder(kFolder, spool);
   if (error == 0) error = spool.makeFolder(kStructured, structured);
   if (error == 0) error = structured.makeFolder(std::to_string(type), folder);
-  if (error == 0) error = appendWhole(folder, name, line);
-  if (error != 0) noteFailure(std::string(kStructured) + "/" + std::to_string(type) + "/" + name, error);
+  if (error == 0) error = folder.openForAppending(day + ".jsonl", open.file);
+  if (error == 0 && !lockFile_.isOpen()) error = spool.openForLocking(kLock, lockFile_);
+  if (error != 0) structured_.erase(type);
+  return error;
+}
+
+// All of the line or none of it: half a line would spoil the next one too.
+int LogSpool::appendLine(int type, const std::string& day, std::string_view line) {
+  for (int attempt = 0; attempt < 2; ++attempt) {
+    const auto open = structured_.find(type);
+    if (open == structured_.end() || open->second.day != day) {
+      if (const int error = openStructured(type, day); error != 0) return error;
+    }
+    const int file = structured_.at(type).file.get();
+    if (const int error = waitForLock(lockFile_.get(), kLockPatience); error != 0) return error;
+    struct stat before {};
+    int error = ::fstat(file, &before) == 0 ? 0 : errno;
+    // One that was moved on meanwhile, or has got a second name, is left alone.
+    const bool isInPlace = error == 0 && before.st_nlink == 1;
+    if (isInPlace) error = writeAll(file, line);
+    if (isInPlace && error != 0 && ::ftruncate(file, before.st_size) != 0) error = errno;
+    ::flock(lockFile_.get(), LOCK_UN);
+    if (isInPlace || error != 0) return error;
+    structured_.erase(type);
+  }
+  return kSecondName;
+}
+
+void LogSpool::appendStructured(int type, const PlistDictionary& data, PlistDate now) {
+  const std::string day = dayText(now);
+  const std::string line =
+      "{\"time\": \"" + stampText(now, 3) + "\", \"data\": " + jsonText(PlistValue::dictionary(data)) + "}\n";
+  const std::lock_guard guard(mutex_);
+  if (const int error = appendLine(type, day, line); error != 0)
+    noteFailure(std::string(kStructured) + "/" + std::to_string(type) + "/" + day + ".jsonl", error);
 }
 
 int LogSpool::moveOldStructured(const DeviceFolder& from, const std::string& type, std::string_view today,

@@ -3,6 +3,8 @@
 // Carewell logs. One lock file serialises the processes that change them.
 #pragma once
 
+#include <map>
+#include <mutex>
 #include <string>
 #include <string_view>
 
@@ -48,9 +50,20 @@ class LogSpool {
   int moveOldStructured(const DeviceFolder& from, const std::string& type, std::string_view today,
                         const DeviceFolder& to);
   void noteFailure(std::string_view folder, int error) const;
+  int openStructured(int type, const std::string& day);
+  int appendLine(int type, const std::string& day, std::string_view line);
 
   const Host& host_;
   PropertyListCodec& codec_;
+
+  // Lines come in crowds: the file that a type was last written to stays open, and the lock file.
+  struct StructuredFile {
+    std::string day;
+    FileDescriptor file;
+  };
+  std::mutex mutex_;  // over what follows
+  FileDescriptor lockFile_;
+  std::map<int, StructuredFile> structured_;
 };
 
 // "2026-11-24-090704", UTC.

@@ -210,10 +210,11 @@ TEST_F(AnalyticsStoreTest, TruncatesTheLogAtACheckpointUnlessSomebodyReadsIt) {
   addScalar("k", 1, 1);
   EXPECT_TRUE(store.checkpoint().ok());
   EXPECT_EQ(fs::file_size(file.native() + "-wal"), 0U);
+  addScalar("l", 1, 1);
   const auto reader = history();
   addScalar("k", 1, 2);
   EXPECT_TRUE(store.checkpoint().ok());
-  EXPECT_EQ(testing::scalarLines(*reader), Lines{"k 1 1"});
+  EXPECT_EQ(testing::scalarLines(*reader), (Lines{"k 1 1", "l 1 1"}));
   EXPECT_GT(fs::file_size(file.native() + "-wal"), 0U);
 }
 

@@ -186,6 +186,29 @@ std::string_view SqliteStatement::text(int column) const {
   return {static_cast<const char*>(bytes), static_cast<std::size_t>(length)};
 }
 
+SqliteDatabase::SqliteDatabase() = default;
+SqliteDatabase::SqliteDatabase(SqliteDatabase&& other) noexcept = default;
+SqliteDatabase::~SqliteDatabase() = default;
+
+SqliteDatabase& SqliteDatabase::operator=(SqliteDatabase&& other) noexcept {
+  // A connection goes before what it reads.
+  close();
+  unnamed_ = std::move(other.unnamed_);
+  unnamedLog_ = std::move(other.unnamedLog_);
+  folder_ = std::move(other.folder_);
+  image_ = std::move(other.image_);
+  connection_ = std::move(other.connection_);
+  return *this;
+}
+
+void SqliteDatabase::close() {
+  connection_.reset();
+  unnamedLog_.reset();
+  unnamed_.reset();
+  folder_.reset();
+  image_ = {};
+}
+
 void SqliteDatabase::Closer::operator()(sqlite3* connection) const {
   sqlite3_close_v2(connection);
 }
@@ -197,7 +220,7 @@ int SqliteDatabase::open(std::shared_ptr<const DeviceFolder> folder, const std::
                     SQLITE_OPEN_URI | SQLITE_OPEN_NOMUTEX;
   sqlite3* connection = nullptr;
   const std::string uri = fileUri(folder->throughDescriptor(name), mode);
-  connection_.reset();
+  close();
   folder_ = std::move(folder);
   const int code = sqlite3_open_v2(uri.c_str(), &connection, flags, kFileLayer);
   connection_.reset(connection);
@@ -224,7 +247,7 @@ void SqliteDatabase::UnnamedLogCloser::operator()(UnnamedLog* log) const {
 
 int SqliteDatabase::openUnnamed(FileDescriptor file, FileDescriptor log) {
   if (const int code = registerFileLayer(); code != SQLITE_OK) return code;
-  connection_.reset();
+  close();
   unnamed_ = std::move(file);
   const std::string path = descriptorPath(unnamed_.get());
   unnamedLog_.reset(new UnnamedLog(path + "-wal", std::move(log)));
@@ -246,7 +269,7 @@ int SqliteDatabase::openImage(std::vector<std::byte> image) {
   for (const std::size_t version : {kWriteVersion, kReadVersion}) {
     if (image.size() > version && image[version] == kWithLog) image[version] = kWithoutLog;
   }
-  connection_.reset();
+  close();
   image_ = std::move(image);
   sqlite3* connection = nullptr;
   int code = sqlite3_open_v2(":memory:", &connection, SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX, nullptr);

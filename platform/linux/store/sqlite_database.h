@@ -73,7 +73,10 @@ enum class SqliteMode {
 
 class SqliteDatabase {
  public:
-  SqliteDatabase() = default;
+  SqliteDatabase();
+  SqliteDatabase(SqliteDatabase&& other) noexcept;
+  SqliteDatabase& operator=(SqliteDatabase&& other) noexcept;
+  ~SqliteDatabase();
 
   // Opens a file that exists. What its schema holds is not trusted: no triggers, no views, no unsafe
   // functions.
@@ -88,9 +91,11 @@ class SqliteDatabase {
   void setBusyTimeout(std::chrono::milliseconds busyTimeout);
   // Closing then leaves the write-ahead log as it is.
   void keepLogOnClose();
-  void close() { connection_.reset(); }
+  void close();
 
   bool isOpen() const { return connection_ != nullptr; }
+  // Whether it reads memory, and not a file.
+  bool isImage() const { return isOpen() && !image_.empty(); }
   // Whether a statement outside of a transaction would commit by itself.
   bool isOutsideTransaction() const;
   // Whether the path leads to another file than the one that is open.

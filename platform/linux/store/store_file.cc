@@ -145,8 +145,8 @@ Verdict examine(SqliteDatabase& database, const StorePlace& place, Examination e
   return verdict;
 }
 
-Verdict examineUntouched(const Site& site, Examination examination) {
-  SqliteDatabase database;
+// The database is an image of the file, where that is small enough to be examined as one.
+Verdict examineUntouched(const Site& site, Examination examination, SqliteDatabase& database) {
   // All pages are wanted: they are read at once, not one by one.
   FileDescriptor file;
   FileContents contents;
@@ -192,7 +192,8 @@ int judgeFiles(const Site& site) {
   return 0;
 }
 
-Verdict examineFile(const Site& site) {
+// `image` is a connection to the whole store in memory where that is what was examined; else it is closed.
+Verdict examineFile(const Site& site, SqliteDatabase& image) {
   const StorePlace& place = site.place;
   if (place.condition->isDamaged()) return unusable(place, "it is damaged");
   struct stat status {};
@@ -207,13 +208,13 @@ Verdict examineFile(const Site& site) {
   // An interrupted transaction leaves the pages in need of its journal, so that only page 1 with the layout
   // can be judged.
   const Examination examination = site.hasContents(kJournalSuffix) ? Examination::Layout : Examination::Pages;
-  Verdict verdict = examineUntouched(site, examination);
-  if (verdict.state != StoreState::Unusable) return verdict;
-  // A program that wrote meanwhile makes a sound store look torn.
+  Verdict verdict = examineUntouched(site, examination, image);
+  // A program that wrote meanwhile makes a sound store look torn, and the image old.
   struct stat now {};
   const bool untouched = site.folder->status(place.name, now) == 0 &&
                          FileIdentity::of(now) == FileIdentity::of(status) && !site.hasContents(kLogSuffix);
-  return untouched ? verdict : examineWithLog(site);
+  if (!untouched || examination == Examination::Layout || !image.isImage()) image.close();
+  return untouched || verdict.state != StoreState::Unusable ? verdict : examineWithLog(site);
 }
 
 StoreResult cannotCreate(const StorePlace& place, int error) {
@@ -291,12 +292,13 @@ OpenedStore openStoreForReading(const StorePlace& place) {
     if (error == ENOENT || error == kUnusableRoot) return {};
     return {{}, cannotBeExamined(place, error).result};
   }
-  Verdict verdict = examineFile(site);
+  SqliteDatabase database;
+  Verdict verdict = examineFile(site, database);
   if (verdict.state != StoreState::Usable) return {{}, std::move(verdict.result)};
+  if (database.isOpen()) return {std::move(database), {}};
 
   SqliteMode mode = SqliteMode::ReadWrite;
   if (!site.isWritable()) mode = site.hasContents(kLogSuffix) ? SqliteMode::ReadOnly : SqliteMode::Immutable;
-  SqliteDatabase database;
   if (site.open(database, mode) != SQLITE_OK || database.execute("BEGIN") != SQLITE_OK) {
     return {{}, storeFailure(database, place)};
   }
@@ -324,7 +326,9 @@ OpenedStore openStoreForWriting(const StorePlace& place, MissingStore missing) {
     if (missing == MissingStore::Leave && (error == ENOENT || error == kUnusableRoot)) return {};
     return {{}, cannotCreate(place, error)};
   }
-  Verdict verdict = examineFile(site);
+  SqliteDatabase image;
+  Verdict verdict = examineFile(site, image);
+  image.close();
   if (verdict.state == StoreState::Unusable) return {{}, std::move(verdict.result)};
   if (verdict.state == StoreState::Missing) {
     if (missing == MissingStore::Leave) return {};
