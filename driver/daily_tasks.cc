@@ -2,9 +2,12 @@
 
 #include "driver/device_metrics.h"
 #include "driver/environment_probes.h"
+#include "driver/step.h"
 #include "driver/tasking.h"
+#include "platform/file_system.h"
 #include "platform/log_submission.h"
 #include "platform/preferences_store.h"
+#include "platform/run_lock.h"
 #include "platform/system_log.h"
 #include "report/tb_report.h"
 
@@ -18,27 +21,47 @@ DayNumber dayBefore(DayNumber day) {
   return static_cast<DayNumber>(static_cast<std::uint32_t>(day) - 1);
 }
 
-void RunDailyTasks(Platform& platform, DayNumber day, const PlistValue& appInfo) {
+namespace {
+
+// How long a run waits for another one.
+constexpr std::chrono::minutes kPatience(10);
+
+void runTasks(Platform& platform, DayNumber day, const PlistValue& appInfo) {
   platform.systemLog.message(LogLevel::Default, "daily tasks for day %d", day);
-  platform.analyticsClient.checkpoint();
-  if (platform.logSubmission.isDiagnosticLogSubmissionEnabled()) {
+  runStep(platform, "the checkpoint", [&] { platform.analyticsClient.checkpoint(); });
+  runStep(platform, "the report", [&] {
+    if (!platform.logSubmission.isDiagnosticLogSubmissionEnabled()) return;
     TBReport report(platform, storeProbes(platform));
     report.writeLogForYesterdayWithAppInfo(day, appInfo);
-  }
+  });
   CollectDailyDeviceMetrics(platform);
-  platform.logSubmission.dumpAllOldStructuredDataLogs();
-  HandleTaskingAndOSChange(platform);
-  platform.logSubmission.rollCarewellLogs();
+  runStep(platform, "the dump of old structured data",
+          [&] { platform.logSubmission.dumpAllOldStructuredDataLogs(); });
+  runStep(platform, "tasking", [&] { HandleTaskingAndOSChange(platform); });
+  runStep(platform, "the rotation of logs", [&] { platform.logSubmission.rollCarewellLogs(); });
+}
+
+}  // namespace
+
+void RunDailyTasks(Platform& platform, DayNumber day, const PlistValue& appInfo) {
+  const std::unique_ptr<HeldRunLock> lock = platform.runLock.acquire(kPatience);
+  if (lock == nullptr) return;
+  runTasks(platform, day, appInfo);
+  platform.fileSystem.makeDurable();
 }
 
 void RunDailyTasksIfNewDay(Platform& platform, const PlistValue& appInfo) {
+  const std::unique_ptr<HeldRunLock> lock = platform.runLock.acquire(kPatience);
+  if (lock == nullptr) return;
   PreferencesStore& preferences = platform.preferences;
   const DayNumber yesterday = dayBefore(platform.analyticsClient.currentDayNumber());
   if (preferences.getInteger(kLastProcessedDay, preference_domain::kJob) >= yesterday) {
     platform.systemLog.message(LogLevel::Default, "Day unchanged since last run");
     return;
   }
-  RunDailyTasks(platform, yesterday, appInfo);
+  runTasks(platform, yesterday, appInfo);
+  // A day counts as done when all that it wrote would outlive a power cut.
+  if (!platform.fileSystem.makeDurable()) return;
   preferences.setValue(kLastProcessedDay, PlistValue::int32(yesterday), preference_domain::kJob);
   preferences.synchronize(preference_domain::kJob);
 }

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "driver/daily_tasks.h"
+#include "driver/step.h"
 #include "platform/analytics_client.h"
 #include "platform/preferences_store.h"
 #include "platform/system_log.h"
@@ -163,11 +164,11 @@ void CollectDataUsage(Platform& platform, std::chrono::milliseconds replyTimeout
   const std::shared_ptr<UsageFeed> feed = workspace != nullptr ? workspace->createFeed() : nullptr;
   const auto processed = std::make_shared<std::counting_semaphore<>>(0);
   if (feed != nullptr) {
-    feed->requestUsageToDate({}, UsageNameKind::ProcessName,
-                             [&platform, workspace, feed, processed](const PlistValue& records) {
-                               ProcessDataUsageReply(platform, records);
-                               processed->release();
-                             });
+    feed->requestUsageToDate(
+        {}, UsageNameKind::ProcessName, [&platform, workspace, feed, processed](const PlistValue& records) {
+          runStep(platform, "network usage", [&] { ProcessDataUsageReply(platform, records); });
+          processed->release();
+        });
   }
   if (!processed->try_acquire_for(replyTimeout)) {
     platform.systemLog.message(LogLevel::Default, "Netwatch timed out, no datausage available");

@@ -6,6 +6,7 @@
 
 #include "driver/data_usage.h"
 #include "driver/driver_metrics.h"
+#include "driver/step.h"
 #include "platform/analytics_client.h"
 #include "platform/byte_reader.h"
 #include "platform/device_answers.h"
@@ -111,12 +112,12 @@ void CollectECCEvents(Platform& platform) {
 }
 
 void CollectDailyDeviceMetrics(Platform& platform) {
-  CollectDiskUsage(platform);
-  DumpStorageStructuredLog(platform, false);
-  CollectNANDInfo(platform);
-  CollectECCEvents(platform);
-  CollectDataUsage(platform);
-  CollectDriverMetricScalars(platform);
+  runStep(platform, "disk usage", [&] { CollectDiskUsage(platform); });
+  runStep(platform, "storage telemetry", [&] { DumpStorageStructuredLog(platform, false); });
+  runStep(platform, "NAND info", [&] { CollectNANDInfo(platform); });
+  runStep(platform, "ECC events", [&] { CollectECCEvents(platform); });
+  runStep(platform, "network usage", [&] { CollectDataUsage(platform); });
+  runStep(platform, "driver metrics", [&] { CollectDriverMetricScalars(platform); });
 }
 
 }  // namespace tbdaily

@@ -2,6 +2,7 @@
 
 #include "driver/app_info.h"
 #include "driver/daily_tasks.h"
+#include "driver/step.h"
 #include "platform/notifications.h"
 #include "platform/system_log.h"
 
@@ -20,8 +21,9 @@ void HandleNewConnection(Platform& platform, const ServiceEvent& event) {
   if (event.kind != ServiceEventKind::NewPeer) return;
   ServiceListener& listener = platform.serviceListener;
   listener.setDeliveryQueue(event.peer, DeliveryQueue::Main);
-  listener.setEventHandler(event.peer,
-                           [&platform](const ServiceEvent& e) { HandlePeerMessage(platform, e); });
+  listener.setEventHandler(event.peer, [&platform](const ServiceEvent& e) {
+    runStep(platform, "a message", [&] { HandlePeerMessage(platform, e); });
+  });
   listener.resume(event.peer);
 }
 

@@ -18,6 +18,7 @@
 #include "platform/platform.h"
 #include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
+#include "platform/run_lock.h"
 #include "platform/service_listener.h"
 #include "platform/stack_snapshot.h"
 #include "platform/system_log.h"

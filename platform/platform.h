@@ -23,6 +23,7 @@ class MessageDigest;
 class Notifications;
 class PreferencesStore;
 class PropertyListCodec;
+class RunLock;
 class ServiceListener;
 class StackSnapshot;
 class SystemLog;
@@ -48,6 +49,7 @@ struct Platform {
   DynamicLoader& dynamicLoader;
   MessageDigest& messageDigest;
   Diagnostics& diagnostics;
+  RunLock& runLock;
   AnalyticsHome& analyticsHome;  // no family of its own: a rule over two of them
 };
 
@@ -80,7 +82,7 @@ Platform platformWith(const Platform& p, Services&... replacements) {
           of(p.appRegistry),       of(p.localeSettings),  of(p.serviceListener),
           of(p.notifications),     of(p.systemLog),       of(p.kernel),
           of(p.fileSystem),        of(p.dynamicLoader),   of(p.messageDigest),
-          of(p.diagnostics),       of(p.analyticsHome)};
+          of(p.diagnostics),       of(p.runLock),         of(p.analyticsHome)};
 }
 
 }  // namespace tbdaily

@@ -37,12 +37,14 @@ struct FakePlatform {
   FakeDynamicLoader dynamicLoader;
   FakeMessageDigest messageDigest;
   FakeDiagnostics diagnostics;
+  FakeRunLock runLock;
   AnalyticsHome analyticsHome{deviceAnswers, fileSystem};
 
   Platform platform{driverRegistry,   preferences,       deviceAnswers, logSubmission, analyticsClient,
                     analyticsHistory, propertyListCodec, stackSnapshot, usageService,  appRegistry,
                     localeSettings,   serviceListener,   notifications, systemLog,     kernel,
-                    fileSystem,       dynamicLoader,     messageDigest, diagnostics,   analyticsHome};
+                    fileSystem,       dynamicLoader,     messageDigest, diagnostics,   runLock,
+                    analyticsHome};
 
   // Puts a property list into a file.
   void putPlist(std::string_view path, const PlistDictionary& root);

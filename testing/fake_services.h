@@ -21,6 +21,7 @@
 #include "platform/message_digest.h"
 #include "platform/notifications.h"
 #include "platform/preferences_store.h"
+#include "platform/run_lock.h"
 #include "platform/service_listener.h"
 #include "platform/system_log.h"
 
@@ -106,8 +107,34 @@ class FakeFileSystem : public FileSystem {
     return found(files, path);
   }
 
+  bool makeDurable() override {
+    ++timesMadeDurable;
+    return canBeMadeDurable;
+  }
+
+  bool canBeMadeDurable = true;
+  int timesMadeDurable = 0;
   ByName<std::vector<std::byte>> files;
   ByName<std::int64_t> sizes;  // of files whose contents do not matter
+};
+
+class FakeRunLock : public RunLock {
+ public:
+  std::unique_ptr<HeldRunLock> acquire(std::chrono::seconds) override {
+    ++asked;
+    return isFree ? std::make_unique<Held>(*this) : nullptr;
+  }
+
+  bool isFree = true;
+  bool isHeld = false;
+  int asked = 0;
+
+ private:
+  struct Held : HeldRunLock {
+    explicit Held(FakeRunLock& lock) : fake(lock) { fake.isHeld = true; }
+    ~Held() override { fake.isHeld = false; }
+    FakeRunLock& fake;
+  };
 };
 
 class FakeDynamicLoader : public DynamicLoader {

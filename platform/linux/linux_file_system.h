@@ -11,6 +11,7 @@ class LinuxFileSystem : public FileSystem {
   explicit LinuxFileSystem(const Host& host) : host_(host) {}
   std::optional<FileStatus> status(std::string_view path) override;
   std::optional<std::vector<std::byte>> readFile(std::string_view path) override;
+  bool makeDurable() override { return host_.files().makeDurable(); }
 
  private:
   const Host& host_;

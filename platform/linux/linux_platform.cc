@@ -13,6 +13,7 @@
 #include "platform/linux/linux_message_digest.h"
 #include "platform/linux/linux_notifications.h"
 #include "platform/linux/linux_preferences.h"
+#include "platform/linux/linux_run_lock.h"
 #include "platform/linux/linux_service_listener.h"
 #include "platform/linux/linux_system_log.h"
 #include "platform/linux/replay/recorded_driver_registry.h"
@@ -36,6 +37,7 @@ struct LinuxPlatform::Families {
   LinuxKernel kernel{host, recordings};
   LinuxDeviceAnswers deviceAnswers{host, recordings};
   LinuxFileSystem fileSystem{host};
+  LinuxRunLock runLock{host};
   LinuxPreferences preferences{host, codec};
   LinuxLogSubmission logSubmission{host, recordings, codec, preferences, kernel};
   AnalyticsHome analyticsHome{deviceAnswers, fileSystem};
@@ -72,6 +74,7 @@ struct LinuxPlatform::Families {
                     dynamicLoader,
                     messageDigest,
                     standardDiagnostics(),
+                    runLock,
                     analyticsHome};
 };
 

@@ -3,13 +3,17 @@
 #include <dirent.h>
 #include <fcntl.h>
 #include <linux/openat2.h>
+#include <sys/file.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <atomic>
 #include <cerrno>
+#include <charconv>
 #include <climits>
+#include <csignal>
+#include <ctime>
 #include <deque>
 #include <utility>
 
@@ -266,8 +270,11 @@ int TemporaryFile::create(const DeviceFolder& folder) {
     error = folder.open(name_, O_RDWR | O_CREAT | O_EXCL, fd_);
   }
   if (error != 0) name_.clear();
-  if (error == 0) folder.giveToOwner(fd_.get());
-  return error;
+  if (error != 0) return error;
+  // Tells others that somebody is still writing.
+  ::flock(fd_.get(), LOCK_EX | LOCK_NB);
+  folder.giveToOwner(fd_.get());
+  return 0;
 }
 
 int TemporaryFile::replace(const std::string& name) {
@@ -295,11 +302,32 @@ int TemporaryFile::placeNew(const std::string& name) {
   return 0;
 }
 
+namespace {
+
+// Whether nobody writes the passing file any more. The lock says so, but for the moment between the making of
+// a file and its locking: then its process lives, or, where that cannot be told, the file is young.
+bool isAbandoned(const DeviceFolder& folder, const std::string& name) {
+  constexpr std::time_t kLongEnough = 60;
+  FileDescriptor file;
+  const int error = folder.openForReading(name, file);
+  if (error != 0) return error == kLinkInPlace || error == kNotARegularFile;
+  if (::flock(file.get(), LOCK_EX | LOCK_NB) != 0) return false;
+  pid_t writer = 0;
+  const char* digits = name.c_str() + TemporaryFile::kNamePrefix.size();
+  std::from_chars(digits, name.c_str() + name.size(), writer);
+  const bool isWriterAlive = writer > 0 && writer != ::getpid() && (::kill(writer, 0) == 0 || errno == EPERM);
+  struct stat status {};
+  return !isWriterAlive || ::fstat(file.get(), &status) != 0 ||
+         std::time(nullptr) - status.st_mtime > kLongEnough;
+}
+
+}  // namespace
+
 void removePassingFiles(const DeviceFolder& folder) {
   std::vector<std::string> names;
   folder.names(names);
   for (const std::string& name : names) {
-    if (name.starts_with(TemporaryFile::kNamePrefix)) folder.remove(name);
+    if (name.starts_with(TemporaryFile::kNamePrefix) && isAbandoned(folder, name)) folder.remove(name);
   }
 }
 
