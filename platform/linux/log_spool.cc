@@ -6,6 +6,7 @@
 #include <array>
 #include <cerrno>
 #include <cstdio>
+#include <set>
 #include <vector>
 
 #include "platform/calendar.h"
@@ -45,14 +46,15 @@ class FileOutput : public LogOutput {
 
 // What a job that died in the middle may have left: passing names, and meta files whose log never came.
 // Callers hold the lock.
-void removeRemains(const DeviceFolder& folder) {
-  removePassingFiles(folder);
-  std::vector<std::string> names;
-  folder.names(names);
-  for (const std::string& name : names) {
-    if (name.ends_with(kMetaSuffix) && !folder.has(name.substr(0, name.size() - kMetaSuffix.size())))
-      folder.remove(name);
-  }
+// Answers the names that are left.
+std::vector<std::string> removeRemains(const DeviceFolder& folder) {
+  std::vector<std::string> names = removePassingFiles(folder);
+  const std::set<std::string> all(names.begin(), names.end());
+  std::erase_if(names, [&](const std::string& name) {
+    return name.ends_with(kMetaSuffix) && !all.contains(name.substr(0, name.size() - kMetaSuffix.size())) &&
+           folder.remove(name) == 0;
+  });
+  return names;
 }
 
 // Puts both files in place under the first free number. The log comes last: who sees it finds its meta file.
@@ -236,10 +238,7 @@ void LogSpool::submitPending(PlistDate now) {
   if (error == ENOENT || error == kUnusableRoot) return;
   FileLock lock;
   if (error == 0) error = lockSpool(spool, lock);
-  if (error == 0) removeRemains(pending);
-  std::vector<std::string> names;
-  if (error == 0) error = pending.names(names);
-  if (error == 0 && names.empty()) return;
+  if (error == 0 && removeRemains(pending).empty()) return;
   if (error == 0) error = spool.makeFolder(std::string(kOutbox), outbox);
   if (error != 0) return noteFailure(kPending, error);
 

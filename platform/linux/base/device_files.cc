@@ -155,41 +155,39 @@ int DeviceFolder::openForReading(const std::string& name, FileDescriptor& file) 
   return error;
 }
 
-int DeviceFolder::openOrMake(const std::string& name, int flags, FileDescriptor& file) const {
+int DeviceFolder::openOrMake(const std::string& name, int flags, WrittenInPlace writtenInPlace,
+                             FileDescriptor& file) const {
   int error = open(name, flags, file);
-  if (error != ENOENT) return openingError(error);
-  error = open(name, flags | O_CREAT | O_EXCL, file);
-  if (error == EEXIST) error = open(name, flags, file);
-  if (error != 0) return openingError(error);
-  giveToOwner(file.get());
-  touch();
-  return 0;
-}
-
-int DeviceFolder::openForAppending(const std::string& name, FileDescriptor& file) const {
-  int error = openOrMake(name, O_WRONLY | O_APPEND | kFile, file);
-  if (error == 0) error = judgeOpenFile(file.get(), true);
-  if (error != 0) {
-    file.reset();
-    return error;
+  if (error == ENOENT) {
+    error = open(name, flags | O_CREAT | O_EXCL, file);
+    if (error == 0) {
+      giveToOwner(file.get());
+      touch();
+      return 0;
+    }
+    if (error == EEXIST) error = open(name, flags, file);
   }
-  files_->rememberToSync(path_ + "/" + name, false);
-  return 0;
-}
-
-int DeviceFolder::openForLocking(const std::string& name, FileDescriptor& file) const {
-  int error = openOrMake(name, O_RDWR | kFile, file);
-  if (error == 0) error = judgeOpenFile(file.get(), false);
+  error = openingError(error);
+  if (error == 0) error = judgeOpenFile(file.get(), writtenInPlace == WrittenInPlace::Yes);
   if (error != 0) file.reset();
   return error;
 }
 
+int DeviceFolder::openForAppending(const std::string& name, FileDescriptor& file) const {
+  const int error = openOrMake(name, O_WRONLY | O_APPEND | kFile, WrittenInPlace::Yes, file);
+  if (error == 0) files_->rememberToSync(path_ + "/" + name, false);
+  return error;
+}
+
+int DeviceFolder::openForLocking(const std::string& name, FileDescriptor& file) const {
+  return openOrMake(name, O_RDWR | kFile, WrittenInPlace::No, file);
+}
+
 int DeviceFolder::makeFileUnopened(const std::string& name) const {
   if (::mknodat(descriptor_.get(), name.c_str(), S_IFREG | 0600, 0) != 0) return errno;
-  struct stat here {};
-  if (processUser() == 0 && ::fstat(descriptor_.get(), &here) == 0) {
+  if (const Owner here = owner(); here.user != 0 || here.group != 0) {
     [[maybe_unused]] const int ignored =
-        ::fchownat(descriptor_.get(), name.c_str(), here.st_uid, here.st_gid, AT_SYMLINK_NOFOLLOW);
+        ::fchownat(descriptor_.get(), name.c_str(), here.user, here.group, AT_SYMLINK_NOFOLLOW);
   }
   touch();
   return 0;
@@ -203,6 +201,7 @@ int DeviceFolder::openFolder(const std::string& name, DeviceFolder& folder) cons
   }
   folder.files_ = files_;
   folder.path_ = path_ + "/" + name;
+  folder.owner_.reset();
   folder.descriptor_ = std::move(opened);
   return 0;
 }
@@ -248,12 +247,20 @@ int DeviceFolder::sync() const {
   return ::fsync(descriptor_.get()) == 0 ? 0 : errno;
 }
 
+DeviceFolder::Owner DeviceFolder::owner() const {
+  if (processUser() != 0) return {};
+  if (!owner_) {
+    struct stat here {};
+    owner_ = ::fstat(descriptor_.get(), &here) == 0 ? Owner{here.st_uid, here.st_gid} : Owner{};
+  }
+  return *owner_;
+}
+
 void DeviceFolder::giveToOwner(int file) const {
-  if (processUser() != 0) return;
-  struct stat here {};
-  if (::fstat(descriptor_.get(), &here) != 0 || (here.st_uid == 0 && here.st_gid == 0)) return;
+  const Owner here = owner();
+  if (here.user == 0 && here.group == 0) return;
   // Where that is not to be had (a file system without owners), the file stays root's.
-  [[maybe_unused]] const int ignored = ::fchown(file, here.st_uid, here.st_gid);
+  [[maybe_unused]] const int ignored = ::fchown(file, here.user, here.group);
 }
 
 // ---- A file under a passing name
@@ -283,7 +290,8 @@ int TemporaryFile::replace(const std::string& name) {
   if (error == 0 && S_ISLNK(there.st_mode)) return kLinkInPlace;
   if (error == 0 && !S_ISREG(there.st_mode)) return kNotARegularFile;
   if (error != 0 && error != ENOENT) return error;
-  if (error == 0 && processUser() == 0) {
+  if (const DeviceFolder::Owner here = folder_->owner();
+      error == 0 && processUser() == 0 && (there.st_uid != here.user || there.st_gid != here.group)) {
     [[maybe_unused]] const int ignored = ::fchown(fd_.get(), there.st_uid, there.st_gid);
   }
   if (::fsync(fd_.get()) != 0) return errno;
@@ -323,12 +331,14 @@ bool isAbandoned(const DeviceFolder& folder, const std::string& name) {
 
 }  // namespace
 
-void removePassingFiles(const DeviceFolder& folder) {
+std::vector<std::string> removePassingFiles(const DeviceFolder& folder) {
   std::vector<std::string> names;
   folder.names(names);
-  for (const std::string& name : names) {
-    if (name.starts_with(TemporaryFile::kNamePrefix) && isAbandoned(folder, name)) folder.remove(name);
-  }
+  std::erase_if(names, [&folder](const std::string& name) {
+    return name.starts_with(TemporaryFile::kNamePrefix) && isAbandoned(folder, name) &&
+           folder.remove(name) == 0;
+  });
+  return names;
 }
 
 int FileLock::acquire(const DeviceFolder& folder, const std::string& name, double timeoutSeconds) {
@@ -493,6 +503,7 @@ int DeviceFiles::openFolder(std::string_view path, DeviceFolder& folder) const {
   if (const int error = open(path, kFolder, opened); error != 0) return error;
   folder.files_ = this;
   folder.path_ = "/" + belowRoot(path);
+  folder.owner_.reset();
   folder.descriptor_ = std::move(opened);
   return 0;
 }

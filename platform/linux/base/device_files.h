@@ -16,6 +16,7 @@
 #include <filesystem>
 #include <functional>
 #include <mutex>
+#include <optional>
 #include <set>
 #include <string>
 #include <string_view>
@@ -75,13 +76,21 @@ class DeviceFolder {
   friend class DeviceFiles;
   friend class TemporaryFile;
   int open(const std::string& name, int flags, FileDescriptor& file) const;
-  int openOrMake(const std::string& name, int flags, FileDescriptor& file) const;
+  enum class WrittenInPlace : bool { No, Yes };
+  int openOrMake(const std::string& name, int flags, WrittenInPlace writtenInPlace,
+                 FileDescriptor& file) const;
   // Gives what root made to the owner of this folder.
   void giveToOwner(int file) const;
+  struct Owner {
+    uid_t user = 0;
+    gid_t group = 0;
+  };
+  Owner owner() const;
 
   const DeviceFiles* files_ = nullptr;
   FileDescriptor descriptor_;
-  std::string path_;  // on the device
+  std::string path_;                    // on the device
+  mutable std::optional<Owner> owner_;  // once it was asked for
 };
 
 // A file of mode 0600 that is written beside its place under a passing name and then put there; without that,
@@ -110,7 +119,8 @@ class TemporaryFile {
 };
 
 // Removes the passing files that a killed process left in the folder. Nobody else may be writing there.
-void removePassingFiles(const DeviceFolder& folder);
+// Answers the names that are left.
+std::vector<std::string> removePassingFiles(const DeviceFolder& folder);
 
 // An exclusive lock between processes on a file of its own, held until destruction. Waits 5 seconds for
 // another holder.
