@@ -70,20 +70,23 @@ class Companion(DeviceTest):
                   "DistributionKeys": {"d": {"intervals": [2, 1], "odd": 1}}},
             "Off": {"ScalarKeys": {"off": {}}}, "Broken": 3})
         device.preferences("com.velmora.da", {"Off": False})
-        answer = device.tally_json("whitelist", "check", "k", "net.wifi.x", "off")
+        answer = device.tally_json("whitelist", "check", "k", "net.wifi.x", "off", status=1)
         keys = {(k["key"], k["kind"]): k for k in answer["keys"]}
         self.assertEqual(keys["k", "scalar"], {"key": "k", "kind": "scalar", "allowed": True, "by": "exact",
                                                "entry": "k", "group": "B", "options": {"bucket_interval": 0}})
         self.assertEqual(keys["net.wifi.x", "scalar"]["entry"], "net.")
         self.assertEqual((keys["off", "distribution"]["allowed"], answer["internal"]), (False, False))
-        self.assertIn("keyGroup Off is disabled by tasking", device.tally("whitelist", "check"))
+        self.assertIn("keyGroup Off is disabled by tasking", device.tally("whitelist", "check", status=1))
         for oddity in ("Broken is no dictionary", "A has the entry \"Note\"", "empty prefix",
                        "net.wifi. is never reached", "replaces the options that group A", "every value becomes 0",
                        "do not ascend", "\"odd\""):
             self.assertTrue(any(oddity in problem for problem in answer["problems"]), oddity)
         device.record("answers", {"InternalBuild": True})
-        self.assertEqual(device.tally_json("whitelist", "check", "zz")["keys"][0]["by"], "internal")
-        self.assertIn("reported by the prefix net. of A", device.tally("whitelist", "check", "net.x"))
+        self.assertEqual(device.tally_json("whitelist", "check", "zz", status=1)["keys"][0]["by"], "internal")
+        self.assertIn("reported by the prefix net. of A", device.tally("whitelist", "check", "net.x", status=1))
+        device.whitelist({"G": {"ScalarKeys": {"k": {}}, "ScalarKeyPrefixes": {"": {}}}})
+        device.tally("whitelist", "check")
+        device.tally("whitelist", "check", "--strict", status=1)
         device.whitelist(b"")
         self.assertIn("Couldn't parse", device.tally("whitelist", "check", status=1))
 

@@ -121,10 +121,10 @@ class Device:
         assert result.returncode == status, (arguments, result.returncode, result.stdout, result.stderr)
         if status != 0:
             assert len(result.stderr.splitlines()) == 1, result.stderr
-        return result.stdout if status == 0 else result.stderr
+        return result.stdout if status == 0 else result.stdout + result.stderr
 
-    def tally_json(self, *arguments):
-        return json.loads(self.tally("--json", *arguments))
+    def tally_json(self, *arguments, status=0):
+        return json.JSONDecoder().raw_decode(self.tally("--json", *arguments, status=status))[0]
 
     def log(self):
         place = self.path("var/log/tbdaily.log")

@@ -18,10 +18,12 @@ class KeyTable {
   struct Found {
     std::string_view entry;  // the exact key, or the prefix
     std::uint32_t group = 0;
-    const PlistDictionary* options = nullptr;
+    const PlistDictionary* options =
+        nullptr;  // null when they cannot be read: then no key may be reported by this entry
   };
 
-  // A key that is there keeps its place and takes the new options and group. `options` is a dictionary.
+  // A key that is there keeps its place and takes the new options and group. Options that are no dictionary
+  // stand for ones that cannot be read; not none.
   void set(std::string_view key, const PlistValue& options, std::uint32_t group);
   // Once, when all prefixes are set.
   void indexPrefixes();

@@ -107,21 +107,20 @@ void TBConfig::mergeEntries(KeyTable& table, const std::string& where, const Pli
   const auto group = static_cast<std::uint32_t>(groupNames_.size() - 1);
   for (const auto& [key, options] : *keys) {
     const PlistDictionary* rules = options.asDictionary();
-    if (rules == nullptr) {
+    const bool isReadable = rules != nullptr && rulesAreReadable(*rules);
+    if (!isReadable) {
       log_.message(LogLevel::Error,
-                   "options of whitelist key %{public}@ in %{public}@ are no dictionary; the key is skipped",
+                   rules == nullptr ? "options of whitelist key %{public}@ in %{public}@ are no dictionary; "
+                                      "what it matches is not reported"
+                                    : "options of whitelist key %{public}@ in %{public}@ cannot be read; "
+                                      "what it matches is not reported",
                    key, where);
-    } else if (!rulesAreReadable(*rules)) {
-      log_.message(LogLevel::Error,
-                   "options of whitelist key %{public}@ in %{public}@ cannot be read; the key is skipped",
-                   key, where);
-    } else {
-      table.set(key, options, group);
     }
+    table.set(key, isReadable ? options : PlistValue::boolean(false), group);
   }
 }
 
-std::optional<WhitelistMatch> TBConfig::match(KeyKind kind, std::string_view key) const {
+std::optional<WhitelistMatch> TBConfig::listed(KeyKind kind, std::string_view key) const {
   const bool scalar = kind == KeyKind::Scalar;
   if (const auto found = (scalar ? _scalarKeys : _distributionKeys).exact(key)) {
     return WhitelistMatch{MatchKind::Exact, found->entry, groupNames_[found->group], found->options};
@@ -130,9 +129,19 @@ std::optional<WhitelistMatch> TBConfig::match(KeyKind kind, std::string_view key
     log_.message(LogLevel::Debug, "prefix match %@ for %@", found->entry, key);
     return WhitelistMatch{MatchKind::Prefix, found->entry, groupNames_[found->group], found->options};
   }
+  return std::nullopt;
+}
+
+std::optional<WhitelistMatch> TBConfig::match(KeyKind kind, std::string_view key) const {
+  if (const auto found = listed(kind, key)) return found->options != nullptr ? found : std::nullopt;
   if (!_isInternalDevice) return std::nullopt;
   log_.message(LogLevel::Debug, "passing @{} for %@ as device is Velmora Internal", key);
   return WhitelistMatch{MatchKind::Internal, {}, {}, &kNoOptions};
+}
+
+std::optional<WhitelistMatch> TBConfig::unreadableEntry(KeyKind kind, std::string_view key) const {
+  const auto found = listed(kind, key);
+  return found && found->options == nullptr ? found : std::nullopt;
 }
 
 const PlistDictionary* TBConfig::configOptionsForScalarKey(std::string_view key) const {

@@ -29,17 +29,19 @@ enum class MatchKind : std::uint8_t { Exact, Prefix, Internal };
 // Why a key may be reported. Borrowed from the TBConfig.
 struct WhitelistMatch {
   MatchKind by = MatchKind::Exact;
-  std::string_view entry;                    // the exact key or the prefix; empty for Internal
-  std::string_view group;                    // empty for Internal
-  const PlistDictionary* options = nullptr;  // never null
+  std::string_view entry;  // the exact key or the prefix; empty for Internal
+  std::string_view group;  // empty for Internal
+  const PlistDictionary* options = nullptr;
 };
 
 // Read-only once loaded. Keeps a reference to the platform's log.
 class TBConfig {
  public:
+  // An entry whose rules cannot be read shadows: what it would have matched is not reported, on any device.
+  //
   // Reads, digests and parses the whitelist. Null when it cannot be read or is no property list with a
-  // dictionary at its root; the log says why. Groups that a tasking switched off, and entries that are not
-  // understood, are left out with a message.
+  // dictionary at its root; the log says why. Groups that a tasking switched off, and what is not understood,
+  // are left out with a message.
   static std::unique_ptr<TBConfig> init(Platform& platform);
 
   // The key's options, or null when it may not be reported. An exact entry beats every prefix; of several
@@ -50,12 +52,15 @@ class TBConfig {
 
   // The same answer with its reason.
   std::optional<WhitelistMatch> match(KeyKind kind, std::string_view key) const;
+  // The entry with unreadable rules that keeps the key from being reported; its options are null.
+  std::optional<WhitelistMatch> unreadableEntry(KeyKind kind, std::string_view key) const;
 
   // MD5 of the file's bytes as read: 32 lowercase hexadecimal digits.
   const std::string& configFileDigest() const { return _configFileDigest; }
   bool isInternalDevice() const { return _isInternalDevice; }
 
  private:
+  std::optional<WhitelistMatch> listed(KeyKind kind, std::string_view key) const;
   explicit TBConfig(Platform& platform);
 
   bool groupIsEnabled(Platform& platform, std::string_view group) const;

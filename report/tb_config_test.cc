@@ -72,14 +72,29 @@ TEST_F(TBConfigTest, EntriesThatAreNotUnderstoodAreSkippedByNameAndTheRestLoads)
   for (const char* key : {"a", "b", "c", "d"}) EXPECT_EQ(bucketOf(*config, key), -1) << key;
   for (const char* key : {"e", "f"}) EXPECT_EQ(bucketOf(*config, key), 0) << key;
   const auto unreadable = [](const std::string& key) {
-    return "error: options of whitelist key " + key + " in G/ScalarKeys cannot be read; the key is skipped";
+    return "error: options of whitelist key " + key + " in G/ScalarKeys cannot be read; what it matches is not reported";
   };
   EXPECT_THAT(
       fake_.systemLog.lines,
       ElementsAre("error: whitelist group NoGroup is no dictionary and is skipped",
                   "error: whitelist entry G/DistributionKeys is no dictionary and is skipped",
-                  "error: options of whitelist key a in G/ScalarKeys are no dictionary; the key is skipped",
+                  "error: options of whitelist key a in G/ScalarKeys are no dictionary; what it matches is not reported",
                   unreadable("b"), unreadable("c"), unreadable("d")));
+}
+
+TEST_F(TBConfigTest, AnEntryThatCannotBeReadShadowsEverythingBehindIt) {
+  fake_.deviceAnswers.answers.set("InternalBuild", PlistValue::boolean(true));
+  const auto config = load(R"({"A": {"ScalarKeys": {"k": {}, "mended": "?"},
+                                     "ScalarKeyPrefixes": {"net.": {"sig_fig": "?"}, "net.wifi.": {}, "k": {}}},
+                               "B": {"ScalarKeys": {"k": {"bucket_interval": "100"}, "mended": {}, "net.exact": {}}}})");
+  for (const char* key : {"k", "net.x", "net.wifi.x"}) {
+    EXPECT_EQ(bucketOf(*config, key), -1) << key;
+    EXPECT_TRUE(config->unreadableEntry(KeyKind::Scalar, key)) << key;
+  }
+  for (const char* key : {"mended", "net.exact", "kx", "anything"}) {
+    EXPECT_EQ(bucketOf(*config, key), 0) << key;
+    EXPECT_FALSE(config->unreadableEntry(KeyKind::Scalar, key)) << key;
+  }
 }
 
 TEST_F(TBConfigTest, AFileThatCannotBeUsedGivesNoConfig) {

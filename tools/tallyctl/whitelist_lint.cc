@@ -42,10 +42,12 @@ class Linter {
       }
     }
   }
-  std::vector<std::string> takeFindings() { return std::move(findings_); }
+  std::vector<WhitelistOddity> takeFindings() { return std::move(findings_); }
 
  private:
-  void say(const std::string& where, const std::string& what) { findings_.push_back(where + " " + what); }
+  void say(const std::string& where, const std::string& what, bool isUnknownOption = false) {
+    findings_.push_back({where + " " + what, isUnknownOption});
+  }
 
   void visitKey(const std::string& group, const GroupTable& table, const std::string& key,
                 const PlistValue& options) {
@@ -74,7 +76,7 @@ class Linter {
       const bool forScalars =
           name == whitelist_option::kBucketInterval || name == whitelist_option::kSignificantFigures;
       if (!forScalars && name != whitelist_option::kIntervals) {
-        say(where, "has the option \"" + name + "\", which means nothing");
+        say(where, "has the option \"" + name + "\", which means nothing", true);
       } else if (forScalars != table.isScalarTable) {
         say(where, "has the option \"" + name + "\", which has no effect on this kind of key");
       }
@@ -102,12 +104,12 @@ class Linter {
   std::map<std::string_view, std::map<std::string, std::string>>
       seen_;  // by table: key to the group that listed it last
   std::map<std::string_view, std::map<std::string, bool>> prefixes_;  // by table
-  std::vector<std::string> findings_;
+  std::vector<WhitelistOddity> findings_;
 };
 
 }  // namespace
 
-std::vector<std::string> whitelistOddities(const PlistDictionary& root) {
+std::vector<WhitelistOddity> whitelistOddities(const PlistDictionary& root) {
   Linter linter;
   for (const auto& [group, entries] : root) {
     if (const PlistDictionary* dictionary = entries.asDictionary()) linter.visitGroup(group, *dictionary);

@@ -8,7 +8,12 @@
 
 namespace tbdaily {
 
-// One line for each finding, in file order. `root` is the whitelist's root dictionary.
-std::vector<std::string> whitelistOddities(const PlistDictionary& root);
+struct WhitelistOddity {
+  std::string text;              // one line
+  bool isUnknownOption = false;  // a rule that its author meant to hold does not
+};
+
+// In file order. `root` is the whitelist's root dictionary.
+std::vector<WhitelistOddity> whitelistOddities(const PlistDictionary& root);
 
 }  // namespace tbdaily

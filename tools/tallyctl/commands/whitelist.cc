@@ -26,6 +26,7 @@ struct KeyAnswer {
   std::string key;
   KeyKind kind;
   std::optional<WhitelistMatch> match;
+  std::optional<WhitelistMatch> unreadable;  // what keeps it from being reported
 };
 
 void writeAnswer(JsonWriter& json, const KeyAnswer& answer) {
@@ -56,6 +57,11 @@ void writeCheck(JsonWriter& json, const TBConfig& config, const std::vector<std:
 
 void printAnswer(Terminal& out, const KeyAnswer& answer) {
   std::string line = "  " + printable(answer.key) + " as a " + std::string(nameOf(answer.kind)) + ": ";
+  if (answer.unreadable) {
+    return out.line(line + out.styled("not reported", Style::Bad) + ": the rules of " +
+                    printable(answer.unreadable->entry) + " of " + printable(answer.unreadable->group) +
+                    " cannot be read");
+  }
   if (!answer.match) return out.line(line + out.styled("not reported", Style::Dim));
   const WhitelistMatch& match = *answer.match;
   line += out.styled("reported", Style::Good);
@@ -70,7 +76,7 @@ void printAnswer(Terminal& out, const KeyAnswer& answer) {
   out.line(line);
 }
 
-void check(Tool& tool, const std::vector<std::string>& keys) {
+void check(Tool& tool, const std::vector<std::string>& keys, bool strict) {
   CapturedLog log;
   Platform platform = platformWith(tool.platform().services(), log);
   const auto config = TBConfig::init(platform);
@@ -82,18 +88,27 @@ void check(Tool& tool, const std::vector<std::string>& keys) {
   for (const CapturedLog::Message& message : log.messages) {
     (message.level == LogLevel::Error ? problems : disabled).push_back(message.text);
   }
+  bool isFault = !problems.empty();  // what the job itself complains about
   const auto bytes = platform.fileSystem.readFile(kWhitelistPath);
   const PlistValue root = bytes ? platform.propertyListCodec.parse(*bytes).value : PlistValue();
   if (root.asDictionary() != nullptr) {
-    for (std::string& oddity : whitelistOddities(*root.asDictionary())) problems.push_back(std::move(oddity));
+    for (WhitelistOddity& oddity : whitelistOddities(*root.asDictionary())) {
+      isFault |= oddity.isUnknownOption;
+      problems.push_back(std::move(oddity.text));
+    }
   }
   std::vector<KeyAnswer> answers;
   for (const std::string& key : keys) {
     for (const KeyKind kind : {KeyKind::Scalar, KeyKind::Distribution}) {
-      answers.push_back({key, kind, config->match(kind, key)});
+      answers.push_back({key, kind, config->match(kind, key), config->unreadableEntry(kind, key)});
     }
   }
 
+  if (isFault || (strict && !problems.empty())) {
+    tool.fail(std::string(kWhitelistPath) +
+              (isFault ? " has rules that cannot be read or options that are unknown"
+                       : " has something odd in it"));
+  }
   if (tool.printedAsJson([&](JsonWriter& json) { writeCheck(json, *config, problems, answers); })) return;
   Terminal& out = tool.out();
   out.line(out.styled("Whitelist", Style::Heading));
@@ -117,7 +132,10 @@ void addWhitelistCommand(CLI::App& app, Tool& tool) {
                                                "Validate the whitelist, and say for each key whether it may "
                                                "be reported, by which entry, with which options");
   checking->add_option("KEY", *keys, "Keys to look up");
-  checking->callback([&tool, keys] { check(tool, *keys); });
+  auto strict = std::make_shared<bool>(false);
+  checking->add_flag("--strict", *strict,
+                     "Fail for everything odd, not only for rules that cannot be read and unknown options");
+  checking->callback([&tool, keys, strict] { check(tool, *keys, *strict); });
 }
 
 }  // namespace tbdaily
