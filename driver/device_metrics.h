@@ -7,8 +7,8 @@
 namespace tbdaily {
 
 // A step of the daily run: disk usage, storage telemetry, NAND info with the freezer's writes, kernel ECC
-// events, network usage, driver metrics. Each part runs whatever became of the others, and nothing that it meets stops the
-// daily run. Main thread only.
+// events, network usage, driver metrics. Each part runs whatever became of the others, and nothing that it
+// meets stops the daily run. Main thread only.
 void CollectDailyDeviceMetrics(Platform& platform);
 
 // The parts that are the step's own.

@@ -7,6 +7,7 @@
 #include <string>
 
 #include "platform/device_answers.h"
+#include "platform/diagnostics.h"
 #include "platform/log_submission.h"
 #include "platform/notifications.h"
 #include "platform/preferences_store.h"
@@ -43,8 +44,10 @@ class TaskingStep {
     PreferencesStore& preferences = platform_.preferences;
     const PlistValue currentID = preferences.getValue("TaskingID", kJob);
     const PlistValue currentOS = preferences.getValue("TaskingOS", kJob);
-    if (const auto applied = currentID.asString()) {
-      if (*applied == id_ && build_ && currentOS.asString() == std::string_view(*build_)) return;
+    if (!currentID.isNone()) {
+      const bool isApplied =
+          currentID.asString() == id_ && build_ && currentOS.asString() == std::string_view(*build_);
+      if (isApplied) return;
       platform_.systemLog.message(LogLevel::Default,
                                   "Tasking update (%{public}@ -> %{public}@, %{public}@ -> %{public}@)",
                                   currentID, id_, currentOS, stringOrNone(build_));
@@ -65,8 +68,9 @@ class TaskingStep {
     const PlistValue payload = platform_.preferences.getValue("TaskingPayload", kJob);
     std::vector<PreferenceChange> removals;
     if (payload.asArray() != nullptr) {
-      for (const TaskingItem& item : taskingItems(*payload.asArray()))
-        removals.push_back({item.key, {}, item.domain});
+      for (const TaskingItem& item : taskingItems(*payload.asArray())) {
+        if (!isConsent(item)) removals.push_back({item.key, {}, item.domain});
+      }
     }
     change(removals);
     change({{"TaskingID", {}, kJob}, {"TaskingDigest", {}, kJob}, {"TaskingPayload", {}, kJob}});
@@ -76,8 +80,14 @@ class TaskingStep {
     const PlistValue payload = tasking_.get("TaskingPayload");
     if (payload.asArray() == nullptr) return;
     std::vector<PreferenceChange> settings;
-    for (const TaskingItem& item : taskingItems(*payload.asArray()))
-      settings.push_back({item.key, item.value, item.domain});
+    for (const TaskingItem& item : taskingItems(*payload.asArray())) {
+      if (isConsent(item)) {
+        platform_.diagnostics.error(
+            "tbdaily: a tasking cannot say whether logs may leave this device: that item is left out\n");
+      } else {
+        settings.push_back({item.key, item.value, item.domain});
+      }
+    }
     change(settings);
     change({{"TaskingID", PlistValue::string(std::string(id_)), kJob},
             {"TaskingOS", stringOrNone(build_), kJob},
@@ -124,6 +134,10 @@ DayNumber OSUpdate::day() const {
 
 OSUpdate lastOSUpdate(PreferencesStore& preferences) {
   return {preferences.getValue("LastOSUpdate", kJob)};
+}
+
+bool isConsent(const TaskingItem& item) {
+  return item.domain == preference_domain::kLogSubmission && item.key == kConsentKey;
 }
 
 std::vector<TaskingItem> taskingItems(const PlistArray& payload) {

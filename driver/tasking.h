@@ -34,6 +34,8 @@ struct TaskingItem {
 // The well-formed items of a payload, in order: dictionaries with a text as "Domain" and as "Key". The rest
 // is passed over.
 std::vector<TaskingItem> taskingItems(const PlistArray& payload);
+// Whether the item is about consent to log submission, which no tasking gives or takes: it is left out.
+bool isConsent(const TaskingItem& item);
 
 // A number or a text that begins with a decimal number, as 32 bits (saturating); 0 for everything else.
 std::int32_t aggressiveDays(const PlistValue& value);

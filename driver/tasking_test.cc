@@ -66,6 +66,27 @@ TEST_F(TaskingTest, AppliesWithdrawsAndAppliesAgainInOrder) {
   EXPECT_THAT(fake_.notifications.posts, ElementsAre("com.velmora.da.tasking_changed"));
 }
 
+TEST_F(TaskingTest, NeitherGivesNorTakesConsentAndWithdrawsWhatNoTextNames) {
+  fake_.preferences.setValue("DiagnosticLogSubmissionEnabled", PlistValue::boolean(false),
+                             "com.velmora.Crashferry");
+  schedule(R"({"TaskingID": "t1", "TaskingPayload": [
+      {"Domain": "com.velmora.Crashferry", "Key": "DiagnosticLogSubmissionEnabled", "Value": true},
+      {"Domain": "b", "Key": "x", "Value": 1}]})");
+  run();
+  const auto consent = [&] {
+    return fake_.preferences.getValue("DiagnosticLogSubmissionEnabled", "com.velmora.Crashferry");
+  };
+  EXPECT_EQ(consent().asBoolean(), false);
+  EXPECT_EQ(fake_.preferences.getValue("x", "b").asInteger(), 1);
+  EXPECT_EQ(fake_.diagnostics.errors,
+            "tbdaily: a tasking cannot say whether logs may leave this device: that item is left out\n");
+  fake_.preferences.setValue("TaskingID", PlistValue::int64(1), kJob);  // somebody's, and no text
+  schedule(R"({"TaskingID": "t2", "TaskingPayload": []})");
+  run();
+  EXPECT_EQ(consent().asBoolean(), false);
+  EXPECT_TRUE(fake_.preferences.getValue("x", "b").isNone());
+}
+
 TEST_F(TaskingTest, SubmitsOnTheFirstDaysAfterAnUpdate) {
   schedule(R"({"TaskingID": "t1", "TaskingPayload": []})");
   fake_.logSubmission.taskingValues.set("AggressiveSubmissionDays", PlistValue::string(" 3 days"));

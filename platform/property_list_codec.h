@@ -12,8 +12,8 @@ namespace tbdaily {
 
 // Plain: the elements alone, whole-second dates; for other programs. A character that XML cannot carry is
 // replaced by U+FFFD. Exact: number widths and fractions of a second are kept, so that it reads back equal in
-// value and kind; such a character is an error.
-enum class PlistForm : std::uint8_t { Exact, Plain };
+// value and kind; such a character is an error. Carried: exact, but for such a character, which is replaced.
+enum class PlistForm : std::uint8_t { Exact, Plain, Carried };
 
 struct PlistParseResult {
   PlistValue value;   // none on failure

@@ -16,7 +16,7 @@ void LinuxLogSubmission::logStructuredData(int type, const PlistDictionary& data
 }
 
 bool LinuxLogSubmission::isDiagnosticLogSubmissionEnabled() {
-  return preferences_.getBoolean("DiagnosticLogSubmissionEnabled", preference_domain::kLogSubmission).value;
+  return preferences_.getBoolean(kConsentKey, preference_domain::kLogSubmission).value;
 }
 
 Consent LinuxLogSubmission::consent() {

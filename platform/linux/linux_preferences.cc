@@ -64,7 +64,7 @@ bool LinuxPreferences::moveAside(const DeviceFolder& folder, const std::string& 
 bool LinuxPreferences::isWritable(const Change& change, std::string_view name) {
   PlistDictionary alone;
   alone.set(change.key, change.value);
-  const PlistWriteResult written = codec_.write(PlistValue::dictionary(std::move(alone)), PlistForm::Exact);
+  const PlistWriteResult written = codec_.write(PlistValue::dictionary(std::move(alone)), PlistForm::Carried);
   if (!written.ok) noteOnce("a preference of " + std::string(name) + " cannot be written: " + written.error);
   return written.ok;
 }
@@ -85,14 +85,21 @@ PlistDictionary LinuxPreferences::changed(PlistDictionary values, std::span<cons
 
 std::string LinuxPreferences::bytesOf(std::string_view name, const PlistDictionary& stored,
                                       std::span<const Change> changes) {
-  PlistWriteResult result = codec_.write(PlistValue::dictionary(changed(stored, changes)), PlistForm::Exact);
+  const PlistValue whole = PlistValue::dictionary(changed(stored, changes));
+  PlistWriteResult result = codec_.write(whole, PlistForm::Exact);
   if (result.ok) return std::move(result.bytes);
+  result = codec_.write(whole, PlistForm::Carried);
+  if (result.ok) {
+    noteOnce("preferences " + host_.files().place(path(name)).native() +
+             ": characters that a property list cannot carry are stored as U+FFFD");
+    return std::move(result.bytes);
+  }
   // One value that no file can hold must not cost the others their place.
   std::vector<Change> writable;
   for (const Change& change : changes) {
     if (isWritable(change, name)) writable.push_back(change);
   }
-  return codec_.write(PlistValue::dictionary(changed(stored, writable)), PlistForm::Exact).bytes;
+  return codec_.write(PlistValue::dictionary(changed(stored, writable)), PlistForm::Carried).bytes;
 }
 
 void LinuxPreferences::changeDomain(std::string_view name, std::span<const Change> changes) {

@@ -8,6 +8,7 @@
 
 #include "platform/linux/host_test_support.h"
 #include "platform/plist_text.h"
+#include "testing/binary_plist_builder.h"
 
 namespace tbdaily {
 namespace {
@@ -65,11 +66,19 @@ TEST_F(PreferencesTest, MoveDamagedFilesAsideAndNeverOverwriteThem) {
   preferences.setValue("k", PlistValue::int64(1), "folder");
   EXPECT_TRUE(preferences.getValue("k", "folder").isNone());
   EXPECT_TRUE(fs::is_directory(device.host.files().place(path("folder.plist"))));
-  // XML has no such character.
+}
+
+TEST_F(PreferencesTest, KeepADomainWithTextThatXmlCannotCarry) {
+  using Builder = testing::BinaryPlistBuilder;
+  Builder list;
+  for (const std::string& object : {Builder::dictionary({1, 2}, {3, 4}), Builder::ascii("odd"),
+                                    Builder::ascii("good"), Builder::ascii("a\x01"), Builder::ascii("g")})
+    list.add(object);
+  device.put(path("d.plist"), list.build());
   preferences.applyChanges(std::vector<PreferenceChange>{{"k", PlistValue::string("\x01"), "d"},
                                                          {"n", PlistValue::int64(2), "d"}});
-  EXPECT_EQ(preferences.getInteger("k", "d"), 1);
-  EXPECT_EQ(preferences.getInteger("n", "d"), 2);
+  EXPECT_EQ(plistText(device.parse(device.text(path("d.plist")))),
+            "{\"odd\": \"a\uFFFD\", \"good\": \"g\", \"k\": \"\uFFFD\", \"n\": 2}");
 }
 
 TEST_F(PreferencesTest, TouchNoFileForAHostileDomain) {

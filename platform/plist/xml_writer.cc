@@ -46,7 +46,8 @@ std::string_view escapeOf(char c) {
 
 class XmlWriter {
  public:
-  explicit XmlWriter(PlistForm form) : exact_(form == PlistForm::Exact) {}
+  explicit XmlWriter(PlistForm form)
+      : exact_(form != PlistForm::Plain), replaces_(form != PlistForm::Exact) {}
 
   PlistWriteResult write(const PlistValue& value) {
     out_ += kHeader;
@@ -69,6 +70,7 @@ class XmlWriter {
   void indent(int depth) { out_.append(static_cast<std::size_t>(depth), '\t'); }
 
   bool exact_;
+  bool replaces_;  // what XML cannot carry
   std::string out_;
   const char* error_ = "";
 };
@@ -145,7 +147,7 @@ bool XmlWriter::writeText(std::string_view opening, std::string_view text, std::
     }
     std::string_view replacement = escapeOf(text[at]);
     if (replacement.empty()) {
-      if (exact_) return fail("text with a character that XML cannot carry");
+      if (!replaces_) return fail("text with a character that XML cannot carry");
       replacement = kReplacementCharacter;
     }
     out_.append(text, written, at - written);

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 
+#include "driver/tasking.h"
 #include "platform/linux/base/file_io.h"
 
 namespace tbdaily {
@@ -21,6 +22,8 @@ std::optional<std::string> itemFault(const PlistValue& element) {
   }
   if (!key.asString() || key.asString()->empty()) return "has no text as \"Key\"";
   if (element.get("Value").isNone()) return "has no \"Value\"";
+  if (isConsent({*domain.asString(), *key.asString(), {}}))
+    return "says whether logs may leave the device, which no tasking can: it would be left out";
   return std::nullopt;
 }
 
