@@ -47,8 +47,12 @@ class Companion(DeviceTest):
         self.assertEqual(list(rows), [("k", TODAY, 5 - 2 ** 63), ("old", -5, 1)])
         rows = device.store().execute("SELECT day, seq, value FROM distribution_values")
         self.assertEqual(list(rows), [(5, 0, 7.0), (YESTERDAY, 0, 1.5), (YESTERDAY, 1, -2.0), (YESTERDAY, 2, None)])
-        self.assertEqual(device.tally_json("record", "prune", "--before", str(TODAY)),
-                         {"scalars": 1, "distributionValues": 4, "keys": 2})
+        for before in (str(TODAY), "20261124", "today", "2026-11-23"):
+            device.tally("record", "prune", "--before", before, status=2 if len(before) == 8 else 1)
+        self.assertEqual(device.store().execute("SELECT count(*) FROM scalars").fetchone(), (2,))
+        gone = {"before": "2026-11-24", "scalars": 1, "distributionValues": 4, "keys": 2}
+        self.assertEqual(device.tally_json("record", "prune", "--before", "today", "--dry-run"), {**gone, "dryRun": True})
+        self.assertEqual(device.tally_json("record", "prune", "--before", str(TODAY), "--force"), {**gone, "dryRun": False})
 
     def test_property_lists(self):
         device = self.device()

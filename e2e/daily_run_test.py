@@ -72,7 +72,7 @@ class DailyRun(DeviceTest):
         newest = device.tally_json("report", str(device.pending()[-1]))
         self.assertEqual(preview, newest)
         self.assertEqual(preview["TBScalars"]["net.new"], 12300)
-        self.assertIn("day 5", device.tally("report", "--preview", "--day", "5", status=1))
+        self.assertIn("1970-01-06", device.tally("report", "--preview", "--day", "5", status=1))
 
     def test_live_sources_answer_where_no_recording_does(self):
         device = self.device(value=True)

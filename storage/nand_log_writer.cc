@@ -40,7 +40,8 @@ bool isTooEarly(Platform& platform, PlistDate now) {
 // "2026-11-16 09:07:04 -0800", in the time zone that the device is in now. A time that no calendar holds is
 // told as 1970-01-01.
 std::string localDateText(PlistDate date) {
-  const auto seconds = static_cast<std::time_t>(saturatingInt64(std::floor(date.unixSeconds())));
+  const auto seconds = static_cast<std::time_t>(
+      saturatingInt64(std::floor(date.secondsSinceReference) + PlistDate::kUnixEpochOffset));
   constexpr std::time_t kEpoch = 0;
   const std::tm* local = std::localtime(&seconds);
   if (local == nullptr) local = std::gmtime(&kEpoch);

@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <cerrno>  // program_invocation_short_name too
+#include <cmath>
 #include <ctime>
 #include <limits>
 
@@ -116,8 +117,10 @@ PlistDate LinuxKernel::currentTime() {
     return PlistDate::fromUnixSeconds(0);
   }
   const timespec time = clockTime(CLOCK_REALTIME);
-  return {static_cast<double>(time.tv_sec) - PlistDate::kUnixEpochOffset +
-          static_cast<double>(time.tv_nsec) * 1e-9};
+  const double second = static_cast<double>(time.tv_sec) - PlistDate::kUnixEpochOffset;
+  const double moment = second + static_cast<double>(time.tv_nsec) * 1e-9;
+  // The last moments of a second are not the first one of the next, which may be another day.
+  return {moment < second + 1 ? moment : std::nextafter(second + 1, second)};
 }
 
 std::string LinuxKernel::processName() {

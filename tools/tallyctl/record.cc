@@ -186,8 +186,8 @@ Failure recordDistribution(AnalyticsStore& store, std::string_view key, RecordTi
   return failureOf(store.appendDistributionValues(key, time.day, time.secondsInDay, values));
 }
 
-Failure recordPrune(AnalyticsStore& store, DayNumber beforeDay, PrunedRows& pruned) {
-  return failureOf(store.prune(beforeDay, pruned));
+Failure recordPrune(AnalyticsStore& store, DayNumber beforeDay, Pruning pruning, PrunedRows& pruned) {
+  return failureOf(store.prune(beforeDay, pruning, pruned));
 }
 
 std::optional<std::int64_t> parseRecordInteger(std::string_view text) {

@@ -31,7 +31,8 @@ std::optional<std::string> recordScalar(AnalyticsStore& store, std::string_view 
 // `values` may hold "not a number", but nothing infinite.
 std::optional<std::string> recordDistribution(AnalyticsStore& store, std::string_view key, RecordTime time,
                                               std::span<const double> values);
-std::optional<std::string> recordPrune(AnalyticsStore& store, DayNumber beforeDay, PrunedRows& pruned);
+std::optional<std::string> recordPrune(AnalyticsStore& store, DayNumber beforeDay, Pruning pruning,
+                                       PrunedRows& pruned);
 
 // A number as an import and the command line write it: decimal, all of the text, within the range of its
 // type. A real may be "nan"; it may not be infinite.

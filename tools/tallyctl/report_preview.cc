@@ -16,6 +16,7 @@
 #include "platform/property_list_codec.h"
 #include "report/tb_report.h"
 #include "tools/tallyctl/captured_log.h"
+#include "tools/tallyctl/day_argument.h"
 #include "tools/tallyctl/store_copy.h"
 
 namespace tbdaily {
@@ -84,7 +85,7 @@ StoreProbes probesOver(const FileDescriptor& copy, Platform& real) {
 std::string whyNothing(const CapturedLog& log, DayNumber day) {
   const std::vector<std::string> errors = log.errors();
   if (!errors.empty()) return errors.front();
-  return "no report would be written: the store holds nothing for day " + std::to_string(day) +
+  return "no report would be written: the store holds nothing for " + dayText(day) +
          " that the whitelist allows";
 }
 

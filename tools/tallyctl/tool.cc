@@ -4,6 +4,7 @@
 #include <cstdlib>
 
 #include "platform/linux/base/host_notes.h"
+#include "tools/tallyctl/day_argument.h"
 
 namespace tbdaily {
 
@@ -39,6 +40,14 @@ bool Tool::printedAsJson(const std::function<void(JsonWriter& json)>& write) {
   write(json);
   out_.line(json.take());
   return true;
+}
+
+std::optional<DayNumber> Tool::dayOf(const std::string& text) {
+  if (!hasUsableRoot()) return std::nullopt;  // which may hold the clock
+  const auto day = parseDay(text, platform().services().analyticsClient.currentDayNumber());
+  if (day) return *day;
+  fail(day.reason(), kWrongUsage);
+  return std::nullopt;
 }
 
 void Tool::fail(std::string_view reason, int status) {

@@ -4,9 +4,11 @@
 
 #include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 
+#include "platform/analytics_client.h"
 #include "platform/linux/linux_platform.h"
 #include "platform/plist/json_writer.h"
 #include "platform/plist_value.h"
@@ -45,6 +47,9 @@ class Tool {
   // Prints the value, or what the function writes, as JSON when --json was given; answers whether it did.
   bool printedAsJson(const PlistValue& value);
   bool printedAsJson(const std::function<void(JsonWriter& json)>& write);
+
+  // The day that the text names, or nothing, with the reason said: wrong usage.
+  std::optional<DayNumber> dayOf(const std::string& text);
 
   // One line on standard error with the reason.
   void fail(std::string_view reason, int status = kFailed);

@@ -94,7 +94,7 @@ void AnalyticsStore::endLoad() {
   if (database_.isOpen()) database_.execute(kUsualCache);
 }
 
-StoreResult AnalyticsStore::prune(DayNumber beforeDay, PrunedRows& pruned) {
+StoreResult AnalyticsStore::prune(DayNumber beforeDay, Pruning pruning, PrunedRows& pruned) {
   const std::lock_guard lock(mutex_);
   pruned = {};
   if (StoreResult opened = open(MissingStore::Leave); !opened.ok() || !database_.isOpen()) return opened;
@@ -102,16 +102,17 @@ StoreResult AnalyticsStore::prune(DayNumber beforeDay, PrunedRows& pruned) {
   const std::array<std::pair<Query, std::int64_t*>, 3> steps{{{PruneScalars, &removed.scalars},
                                                               {PruneValues, &removed.distributionValues},
                                                               {PruneKeys, &removed.keys}}};
-  StoreResult result = transaction([&] {
+  const auto remove = [&] {
     for (const auto& [query, count] : steps) {
-      SqliteStatement& remove = statement(query);
-      const StatementRun run(remove);
-      if (query != PruneKeys) remove.bind(1, std::int64_t{beforeDay});
-      if (const int code = remove.step(); code != SQLITE_DONE) return code;
+      SqliteStatement& deletion = statement(query);
+      const StatementRun run(deletion);
+      if (query != PruneKeys) deletion.bind(1, std::int64_t{beforeDay});
+      if (const int code = deletion.step(); code != SQLITE_DONE) return code;
       *count = database_.changedRows();
     }
     return SQLITE_OK;
-  });
+  };
+  StoreResult result = transaction(remove, pruning == Pruning::Remove ? Ending::Commit : Ending::RollBack);
   if (result.ok()) pruned = removed;
   return result;
 }
@@ -171,14 +172,16 @@ StoreResult AnalyticsStore::writeRow(std::string_view key, const Write& write) {
 }
 
 template <typename Body>
-StoreResult AnalyticsStore::transaction(const Body& body) {
+StoreResult AnalyticsStore::transaction(const Body& body, Ending ending) {
   if (const int code = database_.execute("BEGIN IMMEDIATE"); code != SQLITE_OK) return failure(code);
   if (const int code = body(); code != SQLITE_OK) {
     StoreResult result = failure(code);
     rollback();
     return result;
   }
-  return commit();
+  if (ending == Ending::Commit) return commit();
+  rollback();
+  return succeeded();
 }
 
 StoreResult AnalyticsStore::commit() {

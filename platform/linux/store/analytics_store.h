@@ -28,6 +28,9 @@ struct PrunedRows {
   std::int64_t keys = 0;  // those that were left without rows
 };
 
+// Whether the rows are removed, or only counted.
+enum class Pruning : bool { Remove, Rehearse };
+
 class AnalyticsStore {
  public:
   explicit AnalyticsStore(StorePlace place) : place_(std::move(place)) {}
@@ -48,7 +51,7 @@ class AnalyticsStore {
   void rollbackLoad();
 
   // Removes the rows of the days before this one. A store that is missing stays so.
-  StoreResult prune(DayNumber beforeDay, PrunedRows& pruned);
+  StoreResult prune(DayNumber beforeDay, Pruning pruning, PrunedRows& pruned);
   // Makes everything that was written so far durable and truncates the write-ahead log.
   StoreResult checkpoint();
 
@@ -78,8 +81,9 @@ class AnalyticsStore {
   StoreResult open(MissingStore missing);
   template <typename Write>  // int(LoadedKey&): a result code of SQLite
   StoreResult writeRow(std::string_view key, const Write& write);
+  enum class Ending : bool { Commit, RollBack };
   template <typename Body>  // int(): the same
-  StoreResult transaction(const Body& body);
+  StoreResult transaction(const Body& body, Ending ending = Ending::Commit);
   void endLoad();
   StoreResult commit();
   void rollback();

@@ -75,7 +75,7 @@ unsigned modeOf(const fs::path& path) {
 TEST_F(AnalyticsStoreTest, IsMadeAtTheFirstWriteForItsOwnerAlone) {
   PrunedRows pruned;
   EXPECT_TRUE(store.checkpoint().ok());
-  EXPECT_TRUE(store.prune(5, pruned).ok());
+  EXPECT_TRUE(store.prune(5, Pruning::Remove, pruned).ok());
   EXPECT_EQ(scalars(), Lines{});
   EXPECT_FALSE(fs::exists(file.parent_path()));
 
@@ -125,7 +125,7 @@ TEST_F(AnalyticsStoreTest, LeavesAStoreThatItCannotUseAsItIs) {
     const auto before = folderContents();
     PrunedRows pruned;
     EXPECT_EQ(store.setScalar("k", 1, 2).fault, StoreFault::Unusable);
-    EXPECT_EQ(store.prune(9, pruned).fault, StoreFault::Unusable);
+    EXPECT_EQ(store.prune(9, Pruning::Remove, pruned).fault, StoreFault::Unusable);
     EXPECT_EQ(store.checkpoint().fault, StoreFault::Unusable);
     EXPECT_EQ(scalars(), Lines{});
     EXPECT_EQ(folderContents(), before);
@@ -198,7 +198,7 @@ TEST_F(AnalyticsStoreTest, PrunesOlderRowsAndKeysWithoutRows) {
   }
   EXPECT_TRUE(store.setScalar("gone", 4, 1).ok());
   PrunedRows pruned;
-  EXPECT_TRUE(store.prune(5, pruned).ok());
+  EXPECT_TRUE(store.prune(5, Pruning::Remove, pruned).ok());
   EXPECT_EQ(pruned.scalars, 3);
   EXPECT_EQ(pruned.distributionValues, 4);
   EXPECT_EQ(pruned.keys, 1);

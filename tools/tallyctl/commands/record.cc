@@ -12,6 +12,7 @@
 #include "platform/kernel.h"
 #include "platform/linux/base/host_notes.h"
 #include "platform/linux/store/store_place.h"
+#include "tools/tallyctl/day_argument.h"
 #include "tools/tallyctl/tool.h"
 
 namespace tbdaily {
@@ -27,7 +28,8 @@ std::unique_ptr<AnalyticsStore> deviceStore(Tool& tool) {
     tool.fail("the device is in multi-user mode and its analytics container cannot be found");
     return nullptr;
   }
-  return std::make_unique<AnalyticsStore>(storePlaceOf(tool.platform().host().files(), analyticsDatabasePath(*home)));
+  return std::make_unique<AnalyticsStore>(
+      storePlaceOf(tool.platform().host().files(), analyticsDatabasePath(*home)));
 }
 
 PlistValue count(std::uint64_t n) {
@@ -40,8 +42,13 @@ void finish(Tool& tool, const std::optional<std::string>& error, const PlistDict
   if (!tool.printedAsJson(PlistValue::dictionary(counts))) tool.out().line(text);
 }
 
-RecordTime timeOf(Tool& tool, std::optional<DayNumber> day) {
-  return recordTime(tool.platform().services().kernel.currentTime(), day);
+// The time of the day that was asked for, or nothing, with the reason said.
+std::optional<RecordTime> timeOf(Tool& tool, const std::string& day) {
+  if (!tool.hasUsableRoot()) return std::nullopt;  // which may hold the clock
+  const PlistDate now = tool.platform().services().kernel.currentTime();
+  if (day.empty()) return recordTime(now, std::nullopt);
+  const auto parsed = tool.dayOf(day);
+  return parsed ? std::optional(recordTime(now, *parsed)) : std::nullopt;
 }
 
 void runImport(Tool& tool, const std::string& path) {
@@ -66,38 +73,60 @@ void runImport(Tool& tool, const std::string& path) {
              std::to_string(imported.distributionValues) + " distribution values");
 }
 
-void runPrune(Tool& tool, DayNumber before) {
+struct PruneArguments {
+  std::string before;
+  bool dryRun = false;
+  bool force = false;
+};
+
+void runPrune(Tool& tool, const PruneArguments& arguments) {
+  const auto before = tool.dayOf(arguments.before);
+  if (!before) return;
   const auto store = deviceStore(tool);
   if (!store) return;
+  // A report is made of yesterday and the day before it.
+  const DayNumber firstNeeded = tool.platform().services().analyticsClient.currentDayNumber() - 2;
+  if (*before > firstNeeded && !arguments.force && !arguments.dryRun) {
+    return tool.fail("a report still needs the days from " + dayText(firstNeeded) + " on: nothing before " +
+                     dayText(*before) + " was deleted; keep them with --before " + dayText(firstNeeded) +
+                     ", or add --force");
+  }
   PrunedRows pruned;
-  const auto error = recordPrune(*store, before, pruned);
+  const auto error =
+      recordPrune(*store, *before, arguments.dryRun ? Pruning::Rehearse : Pruning::Remove, pruned);
   finish(tool, error,
-         {{"scalars", PlistValue::int64(pruned.scalars)},
+         {{"before", PlistValue::string(dayText(*before))},
+          {"dryRun", PlistValue::boolean(arguments.dryRun)},
+          {"scalars", PlistValue::int64(pruned.scalars)},
           {"distributionValues", PlistValue::int64(pruned.distributionValues)},
           {"keys", PlistValue::int64(pruned.keys)}},
-         "removed " + std::to_string(pruned.scalars) + " scalars and " +
-             std::to_string(pruned.distributionValues) + " distribution values; " +
-             std::to_string(pruned.keys) + " keys have no rows any more");
+         (arguments.dryRun ? "would remove " : "removed ") + std::to_string(pruned.scalars) +
+             " scalars and " + std::to_string(pruned.distributionValues) +
+             " distribution values of the days before " + dayText(*before) + "; " +
+             std::to_string(pruned.keys) +
+             (arguments.dryRun ? " keys would have no rows any more" : " keys have no rows any more"));
 }
 
 struct RecordArguments {
   std::string key;
   std::string value;
   std::vector<std::string> values;
-  std::optional<DayNumber> day;
+  std::string day;  // empty: today
   bool add = false;
 };
 
 void runScalar(Tool& tool, const RecordArguments& arguments) {
   const auto value = parseRecordInteger(arguments.value);
   if (!value) return tool.fail("\"" + arguments.value + "\" is no 64-bit integer", kWrongUsage);
+  const auto time = timeOf(tool, arguments.day);
+  if (!time) return;
+  const DayNumber day = time->day;
   const auto store = deviceStore(tool);
   if (!store) return;
-  const DayNumber day = timeOf(tool, arguments.day).day;
   const auto error =
       recordScalar(*store, arguments.key, day, *value, arguments.add ? ScalarChange::Add : ScalarChange::Set);
   finish(tool, error, {{"scalars", count(1)}},
-         (arguments.add ? "added to " : "set ") + arguments.key + " on day " + std::to_string(day));
+         (arguments.add ? "added to " : "set ") + arguments.key + " on " + dayText(day));
 }
 
 void runDistribution(Tool& tool, const RecordArguments& arguments) {
@@ -107,13 +136,14 @@ void runDistribution(Tool& tool, const RecordArguments& arguments) {
     if (!value) return tool.fail("\"" + text + "\" is no finite number", kWrongUsage);
     values.push_back(*value);
   }
+  const auto time = timeOf(tool, arguments.day);
+  if (!time) return;
   const auto store = deviceStore(tool);
   if (!store) return;
-  const RecordTime time = timeOf(tool, arguments.day);
-  const auto error = recordDistribution(*store, arguments.key, time, values);
+  const auto error = recordDistribution(*store, arguments.key, *time, values);
   finish(tool, error, {{"distributionValues", count(values.size())}},
-         "appended " + std::to_string(values.size()) + " values to " + arguments.key + " on day " +
-             std::to_string(time.day));
+         "appended " + std::to_string(values.size()) + " values to " + arguments.key + " on " +
+             dayText(time->day));
 }
 
 }  // namespace
@@ -121,20 +151,20 @@ void runDistribution(Tool& tool, const RecordArguments& arguments) {
 void addRecordCommand(CLI::App& app, Tool& tool) {
   CLI::App* command = app.add_subcommand("record", "Write rows of the analytics store");
   command->require_subcommand(1);
-  const char* dayHelp = "Days since 1970-01-01 (default: today)";
+  const std::string dayHelp = std::string(kDayArgumentHelp) + " (default: today)";
 
   auto arguments = std::make_shared<RecordArguments>();
   CLI::App* scalar = command->add_subcommand("scalar", "Set one scalar row");
   scalar->add_option("KEY", arguments->key)->required();
   scalar->add_option("VALUE", arguments->value, "A signed 64-bit integer")->required();
-  scalar->add_option("--day", arguments->day, dayHelp)->type_name("N");
+  scalar->add_option("--day", arguments->day, dayHelp)->type_name("DAY");
   scalar->add_flag("--add", arguments->add, "Add to the row's value instead");
   scalar->callback([&tool, arguments] { runScalar(tool, *arguments); });
 
   CLI::App* distribution = command->add_subcommand("distribution", "Append values to a distribution row");
   distribution->add_option("KEY", arguments->key)->required();
   distribution->add_option("VALUE", arguments->values, "Numbers; nan for a value that is none")->required();
-  distribution->add_option("--day", arguments->day, dayHelp)->type_name("N");
+  distribution->add_option("--day", arguments->day, dayHelp)->type_name("DAY");
   distribution->callback([&tool, arguments] { runDistribution(tool, *arguments); });
 
   auto file = std::make_shared<std::string>("-");
@@ -144,10 +174,15 @@ void addRecordCommand(CLI::App& app, Tool& tool) {
   importing->add_option("FILE", *file, "Default: standard input");
   importing->callback([&tool, file] { runImport(tool, *file); });
 
-  auto before = std::make_shared<DayNumber>(0);
+  auto pruning = std::make_shared<PruneArguments>();
   CLI::App* prune = command->add_subcommand("prune", "Delete the rows of older days");
-  prune->add_option("--before", *before, "The first day to keep")->required()->type_name("DAY");
-  prune->callback([&tool, before] { runPrune(tool, *before); });
+  prune->add_option("--before", pruning->before, std::string("The first day to keep: ") + kDayArgumentHelp)
+      ->required()
+      ->type_name("DAY");
+  prune->add_flag("--dry-run", pruning->dryRun, "Say what would be deleted, and delete nothing");
+  prune->add_flag("--force", pruning->force,
+                  "Delete days too that a report still needs, or that are to come");
+  prune->callback([&tool, pruning] { runPrune(tool, *pruning); });
 }
 
 }  // namespace tbdaily

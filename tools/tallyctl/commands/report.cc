@@ -8,6 +8,7 @@
 
 #include "platform/linux/base/host_notes.h"
 #include "platform/linux/log_spool.h"
+#include "tools/tallyctl/day_argument.h"
 #include "tools/tallyctl/input_file.h"
 #include "tools/tallyctl/report_preview.h"
 #include "tools/tallyctl/report_view.h"
@@ -117,8 +118,13 @@ void showFile(Tool& tool, const std::string& file) {
   report ? show(tool, *report) : tool.fail(report.reason());
 }
 
-void showPreview(Tool& tool, std::optional<DayNumber> day) {
+void showPreview(Tool& tool, const std::string& dayText) {
   if (!tool.hasUsableRoot()) return;
+  std::optional<DayNumber> day;
+  if (!dayText.empty()) {
+    day = tool.dayOf(dayText);
+    if (!day) return;
+  }
   const auto preview = previewReport(tool.platform(), day);
   preview ? show(tool, *preview) : tool.fail(preview.reason());
 }
@@ -129,13 +135,15 @@ void addReportCommand(CLI::App& app, Tool& tool) {
   CLI::App* command = app.add_subcommand("report", "Show a daily report: the newest one, or that of a file");
   auto file = std::make_shared<std::string>();
   auto preview = std::make_shared<bool>(false);
-  auto day = std::make_shared<std::optional<DayNumber>>();
+  auto day = std::make_shared<std::string>();
   CLI::Option* fileOption = command->add_option("FILE", *file, "A report; - is standard input");
   CLI::Option* previewOption = command->add_flag(
       "--preview", *preview, "Show what would leave the device now; submits and changes nothing");
   previewOption->excludes(fileOption);
-  command->add_option("--day", *day, "With --preview: days since 1970-01-01 (default: yesterday)")
-      ->type_name("N")
+  command
+      ->add_option("--day", *day,
+                   std::string("With --preview: ") + kDayArgumentHelp + " (default: yesterday)")
+      ->type_name("DAY")
       ->needs(previewOption);
   command->callback([&tool, file, preview, day] {
     if (*preview) return showPreview(tool, *day);

@@ -13,6 +13,7 @@
 #include "platform/linux/linux_service_listener.h"
 #include "platform/linux/unix_socket.h"
 #include "tools/tallyctl/app_records.h"
+#include "tools/tallyctl/day_argument.h"
 #include "tools/tallyctl/input_file.h"
 #include "tools/tallyctl/tool.h"
 
@@ -81,11 +82,12 @@ void addSendCommand(CLI::App& app, Tool& tool) {
   command->add_subcommand("logging-status", "Tell the job that logging was asked for (operation 0)")
       ->callback([&tool] { sendMessage(tool, Operation::LoggingStatus, {}); });
 
-  auto day = std::make_shared<DayNumber>(0);
+  auto day = std::make_shared<std::string>();
   CLI::App* run = command->add_subcommand("run", "Run the daily tasks for a day (operation 1)");
-  run->add_option("DAY", *day, "Days since 1970-01-01")->required();
+  run->add_option("DAY", *day, kDayArgumentHelp)->required();
   run->callback([&tool, day] {
-    sendMessage(tool, Operation::RunForDay, {{"value", PlistValue::int64(*day)}});
+    if (const auto number = tool.dayOf(*day))
+      sendMessage(tool, Operation::RunForDay, {{"value", PlistValue::int64(*number)}});
   });
 
   auto file = std::make_shared<std::string>();
