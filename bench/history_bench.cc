@@ -45,13 +45,14 @@ bool fill(AnalyticsStore& store) {
 // Filled once for all benchmarks, and removed at the end.
 std::unique_ptr<OpenAnalyticsHistory> openHistory() {
   static const testing::TemporaryFolder folder;
-  static const std::filesystem::path file = folder.path() / "store";
+  static const DeviceFiles files(folder.path());
+  static const StorePlace place = storePlaceOf(files, "/store");
   static const bool filled = [] {
-    AnalyticsStore store(file);
+    AnalyticsStore store(place);
     return fill(store);
   }();
   if (!filled) std::abort();
-  return SqliteAnalyticsHistory([] { return std::optional(file); }).open();
+  return SqliteAnalyticsHistory([] { return std::optional(place); }).open();
 }
 
 void enumerateScalars(benchmark::State& state) {

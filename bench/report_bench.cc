@@ -96,14 +96,15 @@ void fillStore(AnalyticsStore& store, std::int64_t scalars, std::int64_t values)
 // distribution values.
 void writeWholeReport(benchmark::State& state) {
   const testing::TemporaryFolder folder;
-  const std::filesystem::path file = folder.path() / "store";
+  const DeviceFiles files(folder.path());
+  const StorePlace place = storePlaceOf(files, "/store");
   {
-    AnalyticsStore store(file);
+    AnalyticsStore store(place);
     fillStore(store, state.range(0), state.range(1));
   }
   testing::FakePlatform fake;
   PlistCodec codec;
-  SqliteAnalyticsHistory history([&file] { return std::optional(file); });
+  SqliteAnalyticsHistory history([&place] { return std::optional(place); });
   const PlistValue scalarOptions = PlistValue::dictionary({{"sig_fig", PlistValue::int64(2)}});
   const PlistValue distributionOptions = PlistValue::dictionary(
       {{"intervals",

@@ -502,7 +502,7 @@ int DeviceFiles::openFolder(std::string_view path, DeviceFolder& folder) const {
   FileDescriptor opened;
   if (const int error = open(path, kFolder, opened); error != 0) return error;
   folder.files_ = this;
-  folder.path_ = "/" + belowRoot(path);
+  folder.path_.assign("/").append(belowRoot(path));
   folder.owner_.reset();
   folder.descriptor_ = std::move(opened);
   return 0;
