@@ -16,12 +16,14 @@ inline constexpr std::string_view kJob = "com.velmora.tallyd.tbdaily";
 inline constexpr std::string_view kAnalytics = "com.velmora.tallyd";
 inline constexpr std::string_view kOwnDefaults = "com.velmora.sysmetrics.tbdaily";
 inline constexpr std::string_view kTaskingValues = "com.velmora.da";
-inline constexpr std::string_view kLogSubmission = "com.velmora.Crashferry";  // consent (kConsentKey) among others
+inline constexpr std::string_view kLogSubmission =
+    "com.velmora.Crashferry";  // consent (kConsentKey) among others
 inline constexpr std::string_view kNandInfo = "com.velmora.NANDInfo";
 inline constexpr std::string_view kDemoSettings = "com.velmora.demo-settings";
 }  // namespace preference_domain
 
-// Whether logs may leave this device, in the domain kLogSubmission. Somebody at the device says so; the job never writes it.
+// Whether logs may leave this device, in the domain kLogSubmission. Somebody at the device says so; the job
+// never writes it.
 inline constexpr std::string_view kConsentKey = "DiagnosticLogSubmissionEnabled";
 
 struct PreferenceBoolean {

@@ -69,8 +69,8 @@ TEST(DistributionSummary, KeepsFiveFigures) {
   EXPECT_EQ(DistributionSummary().statistics().asArray()->at(4).asNumber()->kind(), NumberKind::SInt32);
 }
 
-// Computed with another implementation that rounds after every operation. Compiled to fused operations, the sum of squared
-// deviations differs.
+// Computed with another implementation that rounds after every operation. Compiled to fused operations, the
+// sum of squared deviations differs.
 TEST(DistributionSummary, HasTheSameLastDigitsOnEveryProcessor) {
   std::vector<double> values;
   for (int i = 0; i < 40; ++i) values.push_back(0.1 * i * i - 7.3 + 1e6 / (i + 1));

@@ -72,14 +72,15 @@ TEST_F(TBConfigTest, EntriesThatAreNotUnderstoodAreSkippedByNameAndTheRestLoads)
   for (const char* key : {"a", "b", "c", "d"}) EXPECT_EQ(bucketOf(*config, key), -1) << key;
   for (const char* key : {"e", "f"}) EXPECT_EQ(bucketOf(*config, key), 0) << key;
   const auto unreadable = [](const std::string& key) {
-    return "error: options of whitelist key " + key + " in G/ScalarKeys cannot be read; what it matches is not reported";
+    return "error: options of whitelist key " + key +
+           " in G/ScalarKeys cannot be read; what it matches is not reported";
   };
-  EXPECT_THAT(
-      fake_.systemLog.lines,
-      ElementsAre("error: whitelist group NoGroup is no dictionary and is skipped",
-                  "error: whitelist entry G/DistributionKeys is no dictionary and is skipped",
-                  "error: options of whitelist key a in G/ScalarKeys are no dictionary; what it matches is not reported",
-                  unreadable("b"), unreadable("c"), unreadable("d")));
+  EXPECT_THAT(fake_.systemLog.lines,
+              ElementsAre("error: whitelist group NoGroup is no dictionary and is skipped",
+                          "error: whitelist entry G/DistributionKeys is no dictionary and is skipped",
+                          "error: options of whitelist key a in G/ScalarKeys are no dictionary; what it "
+                          "matches is not reported",
+                          unreadable("b"), unreadable("c"), unreadable("d")));
 }
 
 TEST_F(TBConfigTest, AnEntryThatCannotBeReadShadowsEverythingBehindIt) {
