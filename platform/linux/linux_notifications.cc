@@ -3,6 +3,7 @@
 #include <charconv>
 
 #include "platform/linux/base/host_notes.h"
+#include "platform/linux/base/passing_file.h"
 
 namespace tbdaily {
 

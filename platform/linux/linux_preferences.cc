@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "platform/linux/base/host_notes.h"
+#include "platform/linux/base/passing_file.h"
 
 namespace tbdaily {
 

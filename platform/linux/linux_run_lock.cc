@@ -3,6 +3,7 @@
 #include <cerrno>
 
 #include "platform/linux/base/host_notes.h"
+#include "platform/linux/base/passing_file.h"
 #include "platform/linux/linux_notifications.h"
 #include "platform/linux/linux_preferences.h"
 #include "platform/linux/log_spool.h"

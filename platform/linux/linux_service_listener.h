@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "platform/linux/base/host.h"
+#include "platform/linux/base/passing_file.h"
 #include "platform/property_list_codec.h"
 #include "platform/service_listener.h"
 

@@ -11,6 +11,7 @@
 
 #include "platform/calendar.h"
 #include "platform/linux/base/host_notes.h"
+#include "platform/linux/base/passing_file.h"
 #include "platform/linux/host_identity.h"
 #include "platform/plist/json.h"
 
@@ -204,8 +205,8 @@ int LogSpool::moveOldStructured(const DeviceFolder& from, const std::string& typ
     if (name.size() != today.size() + kSuffix.size() || !name.ends_with(kSuffix)) continue;
     const std::string day = name.substr(0, today.size());
     if (day >= today) continue;
-    if (const int error = moveDurably(from, name, to, freeName(to, "structured-" + type + "-" + day));
-        error != 0)
+    const std::string stem = std::string("structured-").append(type).append("-").append(day);
+    if (const int error = moveDurably(from, name, to, freeName(to, stem)); error != 0)
       noteWriteFailure(from.place(name), error);
   }
   return 0;

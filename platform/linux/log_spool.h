@@ -9,6 +9,7 @@
 #include <string_view>
 
 #include "platform/linux/base/host.h"
+#include "platform/linux/base/passing_file.h"
 #include "platform/log_submission.h"
 #include "platform/property_list_codec.h"
 

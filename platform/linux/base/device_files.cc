@@ -1,22 +1,17 @@
 #include "platform/linux/base/device_files.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <linux/openat2.h>
-#include <sys/file.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <atomic>
 #include <cerrno>
-#include <charconv>
 #include <climits>
-#include <csignal>
-#include <ctime>
 #include <deque>
 #include <utility>
 
+#include "platform/linux/base/file_judgement.h"
 #include "platform/linux/base/host_notes.h"
 
 namespace tbdaily {
@@ -25,8 +20,6 @@ namespace fs = std::filesystem;
 
 namespace {
 
-constexpr int kFile = O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
-constexpr int kFolder = O_RDONLY | O_DIRECTORY | O_CLOEXEC;
 constexpr int kLook = O_PATH | O_CLOEXEC;
 constexpr int kMostLinks = 40;
 
@@ -49,11 +42,6 @@ std::string belowRoot(std::string_view path) {
   return text.empty() ? "." : text;
 }
 
-uid_t processUser() {
-  static const uid_t user = ::geteuid();
-  return user;
-}
-
 bool isOurs(const struct stat& status) {
   return status.st_uid == 0 || status.st_uid == processUser();
 }
@@ -74,283 +62,7 @@ bool leadsThrough(const std::vector<FileDescriptor>& way, const struct stat& fol
   });
 }
 
-// The file that was opened is what its place asks for.
-int judgeOpenFile(int file, bool isWrittenInPlace) {
-  struct stat status {};
-  if (::fstat(file, &status) != 0) return errno;
-  if (!S_ISREG(status.st_mode)) return kNotARegularFile;
-  return isWrittenInPlace && status.st_nlink > 1 ? kSecondName : 0;
-}
-
-// What opening without following links failed with, by its reason.
-int openingError(int error) {
-  if (error == ELOOP) return kLinkInPlace;
-  return error == ENXIO || error == EISDIR ? kNotARegularFile : error;
-}
-
-std::string randomName() {
-  static std::atomic<unsigned> count = 0;
-  return std::string(TemporaryFile::kNamePrefix) + std::to_string(::getpid()) + "-" + std::to_string(++count);
-}
-
 }  // namespace
-
-// ---- A folder
-
-fs::path DeviceFolder::place(std::string_view name) const {
-  return files_->place(path_) / name;
-}
-
-fs::path DeviceFolder::throughDescriptor(std::string_view name) const {
-  return fs::path("/proc/self/fd") / std::to_string(descriptor_.get()) / name;
-}
-
-int DeviceFolder::open(const std::string& name, int flags, FileDescriptor& file) const {
-  file = FileDescriptor(::openat(descriptor_.get(), name.c_str(), flags | O_NOFOLLOW | O_CLOEXEC, 0600));
-  return file.isOpen() ? 0 : errno;
-}
-
-int DeviceFolder::names(std::vector<std::string>& names) const {
-  // A descriptor of its own: reading moves its place in the folder.
-  const int copy = ::openat(descriptor_.get(), ".", kFolder);
-  if (copy < 0) return errno;
-  DIR* entries = ::fdopendir(copy);
-  if (entries == nullptr) {
-    const int error = errno;
-    ::close(copy);
-    return error;
-  }
-  errno = 0;
-  while (const dirent* entry = ::readdir(entries)) {
-    const std::string_view name = entry->d_name;
-    if (name != "." && name != "..") names.emplace_back(name);
-    errno = 0;
-  }
-  const int error = errno;
-  ::closedir(entries);
-  return error;
-}
-
-int DeviceFolder::status(const std::string& name, struct stat& status) const {
-  return ::fstatat(descriptor_.get(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 ? 0 : errno;
-}
-
-bool DeviceFolder::has(const std::string& name) const {
-  struct stat ignored {};
-  return status(name, ignored) != ENOENT;
-}
-
-int DeviceFolder::judgePlace(const std::string& name) const {
-  struct stat there {};
-  const int error = status(name, there);
-  if (error != 0) return error == ENOENT ? 0 : error;
-  if (S_ISLNK(there.st_mode)) return kLinkInPlace;
-  return S_ISREG(there.st_mode) ? 0 : kNotARegularFile;
-}
-
-int DeviceFolder::openForReading(const std::string& name, FileDescriptor& file) const {
-  int error = openingError(open(name, O_RDONLY | kFile, file));
-  if (error == 0) error = judgeOpenFile(file.get(), false);
-  if (error != 0) file.reset();
-  return error;
-}
-
-int DeviceFolder::openOrMake(const std::string& name, int flags, WrittenInPlace writtenInPlace,
-                             FileDescriptor& file) const {
-  int error = open(name, flags, file);
-  if (error == ENOENT) {
-    error = open(name, flags | O_CREAT | O_EXCL, file);
-    if (error == 0) {
-      giveToOwner(file.get());
-      touch();
-      return 0;
-    }
-    if (error == EEXIST) error = open(name, flags, file);
-  }
-  error = openingError(error);
-  if (error == 0) error = judgeOpenFile(file.get(), writtenInPlace == WrittenInPlace::Yes);
-  if (error != 0) file.reset();
-  return error;
-}
-
-int DeviceFolder::openForAppending(const std::string& name, FileDescriptor& file) const {
-  const int error = openOrMake(name, O_WRONLY | O_APPEND | kFile, WrittenInPlace::Yes, file);
-  if (error == 0) files_->rememberToSync(path_ + "/" + name, false);
-  return error;
-}
-
-int DeviceFolder::openForLocking(const std::string& name, FileDescriptor& file) const {
-  return openOrMake(name, O_RDWR | kFile, WrittenInPlace::No, file);
-}
-
-int DeviceFolder::makeFileUnopened(const std::string& name) const {
-  if (::mknodat(descriptor_.get(), name.c_str(), S_IFREG | 0600, 0) != 0) return errno;
-  if (const Owner here = owner(); here.user != 0 || here.group != 0) {
-    [[maybe_unused]] const int ignored =
-        ::fchownat(descriptor_.get(), name.c_str(), here.user, here.group, AT_SYMLINK_NOFOLLOW);
-  }
-  touch();
-  return 0;
-}
-
-int DeviceFolder::openFolder(const std::string& name, DeviceFolder& folder) const {
-  FileDescriptor opened;
-  if (const int error = open(name, kFolder, opened); error != 0) {
-    struct stat there {};
-    return error == ENOTDIR && status(name, there) == 0 && S_ISLNK(there.st_mode) ? kLinkInPlace : error;
-  }
-  folder.files_ = files_;
-  folder.path_ = path_ + "/" + name;
-  folder.owner_.reset();
-  folder.descriptor_ = std::move(opened);
-  return 0;
-}
-
-int DeviceFolder::makeFolder(const std::string& name, DeviceFolder& folder) const {
-  int error = openFolder(name, folder);
-  if (error != ENOENT) return error;
-  const bool isMade = ::mkdirat(descriptor_.get(), name.c_str(), 0700) == 0;
-  if (!isMade && errno != EEXIST) return errno;
-  error = openFolder(name, folder);
-  if (error == 0 && isMade) {
-    giveToOwner(folder.descriptor());
-    touch();
-  }
-  return error;
-}
-
-int DeviceFolder::remove(const std::string& name) const {
-  if (::unlinkat(descriptor_.get(), name.c_str(), 0) != 0) return errno;
-  touch();
-  return 0;
-}
-
-int DeviceFolder::rename(const std::string& name, const DeviceFolder& to, const std::string& newName) const {
-  if (::renameat(descriptor_.get(), name.c_str(), to.descriptor(), newName.c_str()) != 0) return errno;
-  touch();
-  to.touch();
-  return 0;
-}
-
-int DeviceFolder::replaceFile(const std::string& name, std::string_view contents) const {
-  TemporaryFile file;
-  if (const int error = file.create(*this); error != 0) return error;
-  if (const int error = writeAll(file.fd(), contents); error != 0) return error;
-  return file.replace(name);
-}
-
-void DeviceFolder::touch() const {
-  files_->rememberToSync(path_, true);
-}
-
-int DeviceFolder::sync() const {
-  return ::fsync(descriptor_.get()) == 0 ? 0 : errno;
-}
-
-DeviceFolder::Owner DeviceFolder::owner() const {
-  if (processUser() != 0) return {};
-  if (!owner_) {
-    struct stat here {};
-    owner_ = ::fstat(descriptor_.get(), &here) == 0 ? Owner{here.st_uid, here.st_gid} : Owner{};
-  }
-  return *owner_;
-}
-
-void DeviceFolder::giveToOwner(int file) const {
-  const Owner here = owner();
-  if (here.user == 0 && here.group == 0) return;
-  // Where that is not to be had (a file system without owners), the file stays root's.
-  [[maybe_unused]] const int ignored = ::fchown(file, here.user, here.group);
-}
-
-// ---- A file under a passing name
-
-TemporaryFile::~TemporaryFile() {
-  if (!name_.empty()) ::unlinkat(folder_->descriptor(), name_.c_str(), 0);
-}
-
-int TemporaryFile::create(const DeviceFolder& folder) {
-  folder_ = &folder;
-  int error = EEXIST;
-  for (int attempt = 0; attempt < 100 && error == EEXIST; ++attempt) {
-    name_ = randomName();
-    error = folder.open(name_, O_RDWR | O_CREAT | O_EXCL, fd_);
-  }
-  if (error != 0) name_.clear();
-  if (error != 0) return error;
-  // Tells others that somebody is still writing.
-  ::flock(fd_.get(), LOCK_EX | LOCK_NB);
-  folder.giveToOwner(fd_.get());
-  return 0;
-}
-
-int TemporaryFile::replace(const std::string& name) {
-  struct stat there {};
-  int error = folder_->status(name, there);
-  if (error == 0 && S_ISLNK(there.st_mode)) return kLinkInPlace;
-  if (error == 0 && !S_ISREG(there.st_mode)) return kNotARegularFile;
-  if (error != 0 && error != ENOENT) return error;
-  if (const DeviceFolder::Owner here = folder_->owner();
-      error == 0 && processUser() == 0 && (there.st_uid != here.user || there.st_gid != here.group)) {
-    [[maybe_unused]] const int ignored = ::fchown(fd_.get(), there.st_uid, there.st_gid);
-  }
-  if (::fsync(fd_.get()) != 0) return errno;
-  error = folder_->rename(name_, *folder_, name);
-  if (error == 0) name_.clear();
-  return error;
-}
-
-int TemporaryFile::placeNew(const std::string& name) {
-  if (::fsync(fd_.get()) != 0) return errno;
-  const int folder = folder_->descriptor();
-  if (::linkat(folder, name_.c_str(), folder, name.c_str(), 0) != 0) return errno;
-  ::unlinkat(folder, name_.c_str(), 0);
-  name_.clear();
-  folder_->touch();
-  return 0;
-}
-
-namespace {
-
-// Whether nobody writes the passing file any more. The lock says so, but for the moment between the making of
-// a file and its locking: then its process lives, or, where that cannot be told, the file is young.
-bool isAbandoned(const DeviceFolder& folder, const std::string& name) {
-  constexpr std::time_t kLongEnough = 60;
-  FileDescriptor file;
-  const int error = folder.openForReading(name, file);
-  if (error != 0) return error == kLinkInPlace || error == kNotARegularFile;
-  if (::flock(file.get(), LOCK_EX | LOCK_NB) != 0) return false;
-  pid_t writer = 0;
-  const char* digits = name.c_str() + TemporaryFile::kNamePrefix.size();
-  std::from_chars(digits, name.c_str() + name.size(), writer);
-  const bool isWriterAlive = writer > 0 && writer != ::getpid() && (::kill(writer, 0) == 0 || errno == EPERM);
-  struct stat status {};
-  return !isWriterAlive || ::fstat(file.get(), &status) != 0 ||
-         std::time(nullptr) - status.st_mtime > kLongEnough;
-}
-
-}  // namespace
-
-std::vector<std::string> removePassingFiles(const DeviceFolder& folder) {
-  std::vector<std::string> names;
-  folder.names(names);
-  std::erase_if(names, [&folder](const std::string& name) {
-    return name.starts_with(TemporaryFile::kNamePrefix) && isAbandoned(folder, name) &&
-           folder.remove(name) == 0;
-  });
-  return names;
-}
-
-int FileLock::acquire(const DeviceFolder& folder, const std::string& name, double timeoutSeconds) {
-  FileDescriptor file;
-  int error = folder.openForLocking(name, file);
-  if (error != 0) return error;
-  error = waitForLock(file.get(), timeoutSeconds);
-  if (error == 0) fd_ = std::move(file);
-  return error;
-}
-
-// ---- The tree
 
 fs::path DeviceFiles::place(std::string_view path) const {
   return root_ / (fs::path("/") / path).lexically_normal().relative_path();
@@ -459,7 +171,7 @@ int DeviceFiles::walk(std::string_view path, int flags, const Rules& rules, File
 }
 
 int DeviceFiles::openForReading(std::string_view path, FileDescriptor& file) const {
-  int error = open(path, O_RDONLY | kFile, file);
+  int error = open(path, O_RDONLY | kOpenFile, file);
   if (error == ENXIO) error = kNotARegularFile;  // a socket
   if (error == 0) error = judgeOpenFile(file.get(), false);
   if (error != 0) file.reset();
@@ -468,7 +180,7 @@ int DeviceFiles::openForReading(std::string_view path, FileDescriptor& file) con
 
 int DeviceFiles::readFile(std::string_view path, FileContents& contents, std::size_t maximumSize) const {
   FileDescriptor file;
-  const int error = open(path, O_RDONLY | kFile, file);
+  const int error = open(path, O_RDONLY | kOpenFile, file);
   if (error != 0) return error == ENXIO ? kNotARegularFile : error;
   return readOpenFile(file.get(), contents, maximumSize);
 }
@@ -479,7 +191,7 @@ int DeviceFiles::readFileBelow(std::string_view folder, std::string_view file, F
   FileDescriptor opened;
   Rules rules;
   rules.fence = &fence;
-  const int error = walk(std::string(folder).append("/").append(file), O_RDONLY | kFile, rules, opened);
+  const int error = walk(std::string(folder).append("/").append(file), O_RDONLY | kOpenFile, rules, opened);
   if (error != 0) return error == ENXIO ? kNotARegularFile : error;
   return readOpenFile(opened.get(), contents);
 }
@@ -500,7 +212,7 @@ bool DeviceFiles::isUnchanged(std::string_view path, const FileIdentity& identit
 
 int DeviceFiles::openFolder(std::string_view path, DeviceFolder& folder) const {
   FileDescriptor opened;
-  if (const int error = open(path, kFolder, opened); error != 0) return error;
+  if (const int error = open(path, kOpenFolder, opened); error != 0) return error;
   folder.files_ = this;
   folder.path_.assign("/").append(belowRoot(path));
   folder.owner_.reset();
@@ -521,7 +233,7 @@ int DeviceFiles::makeFolder(std::string_view path, DeviceFolder& folder) const {
 int DeviceFiles::openJudged(std::string_view path, const Judge& judge, FileDescriptor& file,
                             std::string& complaint) const {
   complaint.clear();
-  int error = walk(path, O_RDONLY | kFile, {&judge, &complaint, nullptr}, file);
+  int error = walk(path, O_RDONLY | kOpenFile, {&judge, &complaint, nullptr}, file);
   if (error == 0) error = judgeOpenFile(file.get(), false);
   if (error != 0) {
     file.reset();
@@ -544,7 +256,7 @@ bool DeviceFiles::makeDurable() const {
     files = touchedFiles_;  // they stay open and may be written to again
   }
   bool isDurable = true;
-  for (const auto& [paths, flags] : {std::pair(&files, O_RDONLY | kFile), {&folders, kFolder}}) {
+  for (const auto& [paths, flags] : {std::pair(&files, O_RDONLY | kOpenFile), {&folders, kOpenFolder}}) {
     for (const std::string& path : *paths) {
       FileDescriptor file;
       int error = open(path, flags, file);

@@ -45,7 +45,7 @@ class NewestReport {
       const auto age = ageOf(name);
       if (!age || (!path_.empty() && *age <= age_)) continue;
       age_ = *age;
-      path_ = folder + "/" + name;
+      path_.assign(folder).append("/").append(name);
     }
     return Nothing{};
   }
@@ -53,7 +53,8 @@ class NewestReport {
     auto names = namesIn(folder);
     if (!names) return Failure{names.reason()};
     for (const std::string& name : *names) {
-      if (auto considered = consider(folder + "/" + name); !considered) return considered;
+      if (auto considered = consider(std::string(folder).append("/").append(name)); !considered)
+        return considered;
     }
     return Nothing{};
   }

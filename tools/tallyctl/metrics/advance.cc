@@ -2,6 +2,7 @@
 
 #include "platform/linux/base/host.h"
 #include "platform/linux/base/host_notes.h"
+#include "platform/linux/base/passing_file.h"
 #include "platform/linux/replay/recordings.h"
 #include "platform/property_list_codec.h"
 #include "tools/tallyctl/metrics/hub_advance.h"
