@@ -4,10 +4,11 @@ import datetime
 import pathlib
 import plistlib
 import re
+import subprocess
 import unittest
 
 import model
-from harness import EPOCH, NOW, YESTERDAY, DeviceTest
+from harness import BIN, EPOCH, NOW, YESTERDAY, DeviceTest
 
 
 class DailyRun(DeviceTest):
@@ -87,6 +88,28 @@ class DailyRun(DeviceTest):
         (swap,) = re.findall(r"SwapTotal: +(\d+)", pathlib.Path("/proc/meminfo").read_text())
         self.assertLessEqual(scalars[uptime_key], minutes + 2)
         self.assertEqual(scalars[swap_key], int(swap) * 1024)
+
+
+    def test_of_many_runs_at_once_one_does_the_work(self):
+        device = self.device(sample=True)
+        jobs = [subprocess.Popen([BIN / "tbdaily", "-d"], env=device.env, stderr=subprocess.DEVNULL) for _ in range(5)]
+        self.assertEqual([job.wait(timeout=120) for job in jobs], [0] * 5)
+        log = device.log()
+        self.assertEqual((log.count("daily tasks for day"), log.count("Day unchanged since last run")), (1, 4))
+        self.assertEqual(len(device.pending(".193")), 1)
+
+    def test_without_consent_logs_are_withheld_and_stay(self):
+        device = self.device(sample=True)
+        device.preferences("com.velmora.Crashferry", {})
+        device.write("var/mobile/Library/Logs/Structured/172/2026-11-20.jsonl", b"{}\n")
+        device.run("-f")
+        logs = device.path("var/mobile/Library/Logs")
+        withheld = [place.name for place in (logs / "Withheld").iterdir()]
+        self.assertIn("structured-172-2026-11-20.jsonl", withheld)
+        self.assertFalse((logs / "Pending").exists() or (logs / "Outbox").exists())
+        device.preferences("com.velmora.Crashferry", {"DiagnosticLogSubmissionEnabled": True})
+        device.run("-f")
+        self.assertLessEqual(set(withheld), {place.name for place in (logs / "Withheld").iterdir()})
 
 
 if __name__ == "__main__":
