@@ -107,6 +107,33 @@ TEST_F(EntryTest, TheStepsRunInTheirOrderWithAndWithoutTheReport) {
   EXPECT_EQ(fake_.analyticsClient.calls[0], "checkpoint");
 }
 
+TEST_F(EntryTest, ADayCountsWhenItsRunWasAloneAndIsDurable) {
+  fake_.runLock.isFree = false;
+  for (const char* argument : {"-d", "-f", "-t"}) EXPECT_THAT(run({argument}), IsEmpty()) << argument;
+  fake_.runLock.isFree = true;
+  fake_.fileSystem.canBeMadeDurable = false;
+  EXPECT_THAT(run({"-d"}), Contains("default: daily tasks for day 20780"));
+  EXPECT_TRUE(lastDay().isNone());
+  fake_.fileSystem.canBeMadeDurable = true;
+  run({"-d"});
+  EXPECT_EQ(lastDay(), PlistValue::int32(kToday - 1));
+  EXPECT_FALSE(fake_.runLock.isHeld);
+}
+
+// A usage service that finds no thread for its reply.
+struct ThreadlessUsage : UsageService {
+  std::unique_ptr<UsageWorkspace> createWorkspace() override { throw std::runtime_error("no thread"); }
+};
+
+TEST_F(EntryTest, AStepThatThrowsEndsAlone) {
+  ThreadlessUsage usage;
+  Platform platform = platformWith(fake_.platform, usage);
+  RunDailyTasksIfNewDay(platform, {});
+  EXPECT_TRUE(fake_.systemLog.has("error: network usage could not be finished: no thread"));
+  EXPECT_EQ(fake_.logSubmission.calls.back(), "roll");
+  EXPECT_EQ(lastDay(), PlistValue::int32(kToday - 1));
+}
+
 TEST_F(EntryTest, TheListenerEndsAfterOneQuietSlice) {
   auto& listener = fake_.serviceListener;
   listener.addError(testing::FakeServiceListener::kListener);

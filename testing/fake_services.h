@@ -107,13 +107,9 @@ class FakeFileSystem : public FileSystem {
     return found(files, path);
   }
 
-  bool makeDurable() override {
-    ++timesMadeDurable;
-    return canBeMadeDurable;
-  }
+  bool makeDurable() override { return canBeMadeDurable; }
 
   bool canBeMadeDurable = true;
-  int timesMadeDurable = 0;
   ByName<std::vector<std::byte>> files;
   ByName<std::int64_t> sizes;  // of files whose contents do not matter
 };
@@ -121,13 +117,11 @@ class FakeFileSystem : public FileSystem {
 class FakeRunLock : public RunLock {
  public:
   std::unique_ptr<HeldRunLock> acquire(std::chrono::seconds) override {
-    ++asked;
     return isFree ? std::make_unique<Held>(*this) : nullptr;
   }
 
   bool isFree = true;
   bool isHeld = false;
-  int asked = 0;
 
  private:
   struct Held : HeldRunLock {

@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <memory>
 
 #include "platform/linux/base/device_files.h"
 #include "platform/linux/base/file_judgement.h"
@@ -31,21 +32,19 @@ int DeviceFolder::names(std::vector<std::string>& names) const {
   // A descriptor of its own: reading moves its place in the folder.
   const int copy = ::openat(descriptor_.get(), ".", kOpenFolder);
   if (copy < 0) return errno;
-  DIR* entries = ::fdopendir(copy);
+  const std::unique_ptr<DIR, int (*)(DIR*)> entries(::fdopendir(copy), &::closedir);
   if (entries == nullptr) {
     const int error = errno;
     ::close(copy);
     return error;
   }
   errno = 0;
-  while (const dirent* entry = ::readdir(entries)) {
+  while (const dirent* entry = ::readdir(entries.get())) {
     const std::string_view name = entry->d_name;
     if (name != "." && name != "..") names.emplace_back(name);
     errno = 0;
   }
-  const int error = errno;
-  ::closedir(entries);
-  return error;
+  return errno;
 }
 
 int DeviceFolder::status(const std::string& name, struct stat& status) const {
@@ -55,14 +54,6 @@ int DeviceFolder::status(const std::string& name, struct stat& status) const {
 bool DeviceFolder::has(const std::string& name) const {
   struct stat ignored {};
   return status(name, ignored) != ENOENT;
-}
-
-int DeviceFolder::judgePlace(const std::string& name) const {
-  struct stat there {};
-  const int error = status(name, there);
-  if (error != 0) return error == ENOENT ? 0 : error;
-  if (S_ISLNK(there.st_mode)) return kLinkInPlace;
-  return S_ISREG(there.st_mode) ? 0 : kNotARegularFile;
 }
 
 int DeviceFolder::openForReading(const std::string& name, FileDescriptor& file) const {

@@ -33,8 +33,6 @@ class DeviceFolder {
   // Of the entry itself.
   int status(const std::string& name, struct stat& status) const;
   bool has(const std::string& name) const;
-  // Whether a file may be put there: nothing has the name, or a regular file.
-  int judgePlace(const std::string& name) const;
 
   int openForReading(const std::string& name, FileDescriptor& file) const;
   // At its end, made when it is missing; a file with a second name is refused. It is forced to storage with

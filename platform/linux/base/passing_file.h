@@ -44,7 +44,6 @@ class FileLock {
  public:
   // 0, or EWOULDBLOCK when the other holder kept it, or what opening the lock file failed with.
   int acquire(const DeviceFolder& folder, const std::string& name, double timeoutSeconds = 5.0);
-  bool isHeld() const { return fd_.isOpen(); }
 
  private:
   FileDescriptor fd_;
