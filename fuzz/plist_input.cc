@@ -6,7 +6,8 @@ namespace tbdaily::fuzz {
 
 namespace {
 
-constexpr std::int64_t kMostSeconds = 10'000'000'000'000'000;  // of dates: the codec knows no others
+constexpr std::int64_t kMostQuarters = std::int64_t{1}
+                                       << 52;  // of a second, in dates: the codec knows no others
 constexpr int kMostLevels = 6;
 constexpr std::size_t kMostEntries = 12;
 
@@ -46,7 +47,7 @@ PlistValue described(Input& input, std::span<const std::string_view> words, int 
       return PlistValue::float32(input.number<float>());
     case 7:
       return PlistValue(
-          PlistDate{static_cast<double>(std::clamp(input.integer(), -kMostSeconds, kMostSeconds)) / 4});
+          PlistDate{static_cast<double>(std::clamp(input.integer(), -kMostQuarters, kMostQuarters)) / 4});
     case 8:
     case 9:
       return PlistValue::string(input.wordOrText(words));
