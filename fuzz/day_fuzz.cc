@@ -9,6 +9,7 @@
 #include "platform/linux/linux_platform.h"
 #include "platform/linux/replay/recordings.h"
 #include "platform/plist/codec.h"
+#include "platform/plist/json.h"
 #include "report/internal_device.h"
 #include "testing/temporary_folder.h"
 
@@ -83,6 +84,13 @@ constexpr std::array<std::string_view, 62> kWords = {"entries",
                                                      "HardwareModel",
                                                      "x"};
 constexpr DayNumber kDay = 20000;
+constexpr const char* kReport = ".193";
+constexpr std::string_view kConsent =
+    "<plist><dict><key>DiagnosticLogSubmissionEnabled</key><true/></dict></plist>";
+constexpr std::string_view kWhitelist =
+    "<plist><dict><key>All</key><dict><key>ScalarKeyPrefixes</key><dict><key>com.</key>"
+    "<dict><key>sig_fig</key><integer>2</integer></dict><key>datausage.</key><dict/></dict></dict></dict></"
+    "plist>";
 
 PlistCodec codec;
 
@@ -109,16 +117,23 @@ PlistValue usageOf(Input& input) {
   return PlistValue::dictionary({{"records", records}});
 }
 
-void leavesReadableFiles(const fs::path& root) {
-  for (const auto& entry : fs::recursive_directory_iterator(root)) {
-    const std::string name = entry.path().filename();
-    require(!name.starts_with(".tmp-"), "no file is left half-written");
-    if (entry.path().extension() != ".plist" ||
-        entry.path().string().find("System/Device") != std::string::npos)
-      continue;
-    std::ifstream file(entry.path(), std::ios::binary);
-    const std::string bytes{std::istreambuf_iterator<char>(file), {}};
-    require(!codec.parse(std::as_bytes(std::span(bytes))).value.isNone(), "what the day wrote, reads");
+std::string contentsOf(const fs::path& place) {
+  std::ifstream file(place, std::ios::binary);
+  return {std::istreambuf_iterator<char>(file), {}};
+}
+
+void leavesReadableFiles(const fs::path& folder) {
+  for (const auto& entry : fs::recursive_directory_iterator(folder)) {
+    const std::string extension = entry.path().extension();
+    require(!entry.path().filename().string().starts_with(".tmp-"), "no file is left half-written");
+    if (extension == ".plist" || extension == kReport) {
+      const std::string bytes = contentsOf(entry.path());
+      require(!codec.parse(std::as_bytes(std::span(bytes))).value.isNone(), "what the day wrote, reads");
+    }
+    if (extension != ".jsonl") continue;
+    std::ifstream records(entry.path(), std::ios::binary);
+    for (std::string line; std::getline(records, line);)
+      require(!plistFromJson(line).value.isNone(), "each record of the day reads");
   }
 }
 
@@ -141,13 +156,17 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
       {reinterpret_cast<const char*>(snapshot.data()), snapshot.size()});
   putRecording(root, recording::kRegistry, fuzz::plistOf(input, kWords));
 
+  // What the first day records is in the report of the second one.
+  put(root / "Library/Application Support/Tallybook/Whitelist_Nimbos.plist", kWhitelist);
+  put(root / "var/mobile/Library/Preferences/com.velmora.Crashferry.plist", kConsent);
+
   gInternalDeviceAnswer.once.reset();
   const std::size_t before = openFiles();
   {
     LinuxPlatform device(Host(root, false));
-    RunDailyTasks(device.services(), kDay, {});
+    for (const DayNumber day : {kDay, kDay + 1}) RunDailyTasks(device.services(), day, {});
   }
   require(openFiles() == before, "no file stays open");
-  leavesReadableFiles(root);
+  leavesReadableFiles(root / "var");
   return 0;
 }

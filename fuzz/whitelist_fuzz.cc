@@ -120,7 +120,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   fake.preferences.domains[std::string(preference_domain::kTaskingValues)].set(
       "Network", PlistValue::boolean(input.flag()));
   roundsAsFarAsSaid(input.integer(), static_cast<std::uint64_t>(input.integer()),
-                    input.number<std::uint8_t>());
+                    static_cast<std::uint64_t>(input.integer()));
   std::vector<std::string> keys;
   for (std::size_t count = 1 + input.below(8); count > 0; --count) {
     std::string key = input.wordOrText(kWords);
