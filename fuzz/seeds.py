@@ -91,8 +91,11 @@ class Seeds:
         self.add("usage_fuzz", "usage", bytes([20]) + section(b"\0") + small(usage, 6000))
         ferry = self.lists["com.velmora.Crashferry"]
         tasking = small(ferry["ScheduledTasking"], 2000)
-        self.add("tasking_fuzz", "tasking", section(small({"TaskingID": "a"}, 500)) + section(small(ferry, 2000))
-                 + b"\1\0" + struct.pack("<i", 20000) + section(b"\2\3") + tasking)
+        self.add("tasking_fuzz", "tasking", b"\0" + section(small({"TaskingID": "a"}, 500)) + section(small(ferry, 2000))
+                 + b"\1\0" + struct.pack("<i", 20000) + section(b"\2\3") + b"\0" + tasking)
+        # A tasking of one item; the item is about consent.
+        self.add("tasking_fuzz", "consent", bytes([1, 0, 0]) + section(b"\0") + b"\0" + struct.pack("<i", 20000)
+                 + section(b"\0") + bytes([1, 1, 14, 15, 1, 5, 1]))
         legends = [entry["properties"]["KdReportLegend"] for entry in self.lists["registry"]["entries"]
                    if "KdReportLegend" in entry["properties"]]
         for number, legend in enumerate(legends):

@@ -29,19 +29,35 @@ constexpr std::array<std::string_view, 18> kWords = {"TaskingID",
                                                      kAggressiveDaysKey,
                                                      "Network"};
 
+// A tasking in its proper shape, around what the input says of it.
+PlistValue taskingOf(Input& input) {
+  PlistArray payload;
+  for (std::size_t count = input.below(5); count > 0; --count) {
+    PlistDictionary item;
+    item.set("Domain", PlistValue::string(input.wordOrText(kWords)));
+    item.set("Key", PlistValue::string(input.wordOrText(kWords)));
+    if (input.flag()) item.set("Value", PlistValue::int64(input.integer()));
+    payload.push_back(PlistValue::dictionary(std::move(item)));
+  }
+  return PlistValue::dictionary({{"TaskingID", PlistValue::string(input.wordOrText(kWords))},
+                                 {"TaskingPayload", PlistValue::array(std::move(payload))}});
+}
+
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   Input input(data, size);
   testing::FakePlatform fake;
   auto& domains = fake.preferences.domains;
-  domains[std::string(preference_domain::kJob)] = fuzz::plistOfSection(input, kWords).mutableDictionary();
+  // What was applied last, and what is to be applied now.
+  domains[std::string(preference_domain::kJob)] =
+      (input.flag() ? taskingOf(input) : fuzz::plistOfSection(input, kWords)).mutableDictionary();
   PlistDictionary& submission = domains[std::string(preference_domain::kLogSubmission)];
   submission = fuzz::plistOfSection(input, kWords).mutableDictionary();
   if (input.flag()) fake.deviceAnswers.build = input.wordOrText(kWords);
   fake.analyticsClient.today = input.number<DayNumber>();
   fake.logSubmission.taskingValues.set(kAggressiveDaysKey, fuzz::plistOfSection(input, kWords));
-  const PlistValue scheduled = fuzz::plistOf(input, kWords);
+  const PlistValue scheduled = input.flag() ? taskingOf(input) : fuzz::plistOf(input, kWords);
   if (scheduled.asDictionary() != nullptr) submission.set("ScheduledTasking", scheduled);
 
   const PlistValue consent = submission.get(kConsentKey);
