@@ -16,8 +16,9 @@ namespace tbdaily {
 enum class PlistForm : std::uint8_t { Exact, Plain, Carried };
 
 struct PlistParseResult {
-  PlistValue value;   // none on failure
-  std::string error;  // one line with the place in the input; empty on success
+  PlistValue value;             // none on failure
+  std::string error;            // one line with the place in the input; empty on success
+  bool ranOutOfMemory = false;  // a failure that says nothing about the input
 };
 
 struct PlistWriteResult {

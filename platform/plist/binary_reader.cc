@@ -124,7 +124,7 @@ std::nullopt_t BinaryReader::fail(std::uint64_t offset, std::string_view reason)
 PlistParseResult BinaryReader::parse() {
   const Object* root =
       readTrailer() ? read(trailer_.rootIndex, whole_.bytes().size() - kTrailerSize, 0) : nullptr;
-  if (root == nullptr) return {{}, std::move(error_)};
+  if (root == nullptr) return {{}, std::move(error_), false};
   return {root->value, {}};
 }
 

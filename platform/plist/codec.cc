@@ -16,7 +16,7 @@ PlistParseResult PlistCodec::parse(std::span<const std::byte> bytes) {
   try {
     return isBinaryPlist(bytes) ? parseBinaryPlist(bytes) : parseXmlPlist(bytes);
   } catch (const std::exception&) {
-    return {{}, kOutOfMemory};
+    return {{}, kOutOfMemory, true};
   }
 }
 

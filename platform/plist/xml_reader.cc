@@ -161,14 +161,14 @@ PlistParseResult XmlReader::parse(std::string_view document) {
   const std::string_view declaration = document.substr(doctype.begin, doctype.end - doctype.begin);
   if (looksWide(document) || !isUtf8(declaration)) {
     fail("the text is not UTF-8");
-    return {{}, std::move(error_)};
+    return {{}, std::move(error_), false};
   }
   if (!declaration.empty()) {
     feed(document.substr(0, doctype.begin), false);
     if (error_.empty()) feed(blankOf(declaration), false);
   }
   if (error_.empty()) feed(document.substr(doctype.end), true);
-  if (!error_.empty()) return {{}, std::move(error_)};
+  if (!error_.empty()) return {{}, std::move(error_), false};
   return {builder_.takeRoot(), {}};
 }
 

@@ -18,8 +18,13 @@ void CachedPlistFile::read(const DeviceFiles& files, const std::string& path, Pr
     fault_ = errorText(error);
     return;
   }
-  identity_ = contents.identity;
   PlistParseResult parsed = codec.parse(contents.bytes);
+  if (parsed.ranOutOfMemory) {  // not damaged, and worth another look
+    state_ = State::Unreadable;
+    fault_ = std::move(parsed.error);
+    return;
+  }
+  identity_ = contents.identity;
   if (parsed.value.asDictionary() != nullptr) {
     state_ = State::Readable;
     root_ = std::move(parsed.value);
