@@ -124,13 +124,16 @@ class IncrementBuffer {
     std::vector<ScalarFigure> increments;
     increments.reserve(pending_.size());
     for (const auto& [key, increment] : pending_) increments.push_back({key, increment});
-    if (!increments.empty()) client_.addValuesForScalarKeys(increments);
+    if (!increments.empty() && !client_.addValuesForScalarKeys(increments)) areStored_ = false;
     pending_.clear();
   }
+  // All that were flushed.
+  bool areStored() const { return areStored_; }
 
  private:
   AnalyticsClient& client_;
   std::vector<std::pair<std::string, std::int64_t>> pending_;
+  bool areStored_ = true;
 };
 
 }  // namespace
@@ -154,6 +157,8 @@ void ProcessDataUsageReply(Platform& platform, const PlistValue& records) {
       records, stored, yesterday,
       [&increments](std::string_view key, std::int64_t increment) { increments.add(key, increment); });
   increments.flush();
+  // Without them the next reply is compared with the old baseline, so that nothing is lost.
+  if (!increments.areStored()) return;
   platform.preferences.setOwnValue(kUsageBaselineKey, PlistValue::dictionary(std::move(baseline)));
   platform.preferences.synchronizeOwn();
 }

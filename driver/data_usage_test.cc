@@ -58,6 +58,14 @@ TEST_F(DataUsageTest, FirstRunsCountWhatBeganSinceYesterdayAndLaterOnesTheDiffer
   for (const auto& [since, counters, calls] : runs)
     EXPECT_EQ(run({record("bundleName", "b", since, counters)}), calls);
   EXPECT_EQ(baseline().asDictionary()->size(), 1U);  // who is not in the reply is forgotten
+
+  // What could not be stored is counted by the next run.
+  fake_.analyticsClient.isFull = true;
+  const PlistDate later{restarted.secondsSinceReference + 1};
+  const PlistArray reply{record("bundleName", "b", later, {4096})};
+  run(reply);
+  fake_.analyticsClient.isFull = false;
+  EXPECT_THAT(run(reply), ElementsAre("add datausage.wifiInKB.b 4"));
 }
 
 TEST_F(DataUsageTest, WhatIsNotAsItShouldBeIsSkipped) {

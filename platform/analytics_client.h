@@ -39,8 +39,10 @@ class AnalyticsClient {
   virtual void setValuesForScalarKeys(std::span<const ScalarFigure> values) {
     for (const auto& [key, value] : values) setValueForScalarKey(key, value);
   }
-  virtual void addValuesForScalarKeys(std::span<const ScalarFigure> increments) {
+  // False when a store that is there took none of them, so that they are still to be added.
+  [[nodiscard]] virtual bool addValuesForScalarKeys(std::span<const ScalarFigure> increments) {
     for (const auto& [key, increment] : increments) addValueForScalarKey(key, increment);
+    return true;
   }
 };
 

@@ -18,6 +18,7 @@ namespace tbdaily::testing {
 class FakeAnalyticsClient : public AnalyticsClient {
  public:
   DayNumber today = 0;
+  bool isFull = false;             // takes no increments that come together
   std::vector<std::string> calls;  // "checkpoint", "set KEY VALUE", "add KEY VALUE", in order
 
   DayNumber currentDayNumber() override { return today; }
@@ -29,6 +30,9 @@ class FakeAnalyticsClient : public AnalyticsClient {
   }
   void addValueForScalarKey(std::string_view key, std::int64_t increment) override {
     calls.push_back("add " + std::string(key) + " " + std::to_string(increment));
+  }
+  bool addValuesForScalarKeys(std::span<const ScalarFigure> increments) override {
+    return !isFull && AnalyticsClient::addValuesForScalarKeys(increments);
   }
 };
 

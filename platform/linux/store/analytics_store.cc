@@ -69,8 +69,8 @@ StoreResult AnalyticsStore::beginLoad() {
   const std::lock_guard lock(mutex_);
   if (StoreResult opened = open(MissingStore::Create); !opened.ok()) return opened;
   if (const int code = database_.execute("BEGIN IMMEDIATE"); code != SQLITE_OK) return failure(code);
-  database_.execute(kLoadCache);
   loading_ = true;
+  database_.execute(kLoadCache);
   return {};
 }
 
@@ -137,6 +137,7 @@ StoreResult AnalyticsStore::checkpoint() {
 StoreResult AnalyticsStore::open(MissingStore missing) {
   // Within a load the connection stays what it is: a new one would have lost what was loaded.
   if (loading_) return {};
+  rollback();  // of an operation that an exception ended
   if (place_.condition->isDamaged()) close();
   if (database_.isOpen() && !database_.hasMoved()) {
     database_.setBusyTimeout(place_.condition->patience());

@@ -20,6 +20,18 @@ void noteLostWrite(const AnalyticsStore& store, std::string_view key, const Stor
   noteOnce(line.append("\" was not written: ").append(result.error));
 }
 
+// Ends a load that was not committed, by an exception too: the store would take no other one.
+class OpenLoad {
+ public:
+  explicit OpenLoad(AnalyticsStore& store) : store_(store) {}
+  ~OpenLoad() { store_.rollbackLoad(); }
+  OpenLoad(const OpenLoad&) = delete;
+  OpenLoad& operator=(const OpenLoad&) = delete;
+
+ private:
+  AnalyticsStore& store_;
+};
+
 }  // namespace
 
 SqliteAnalyticsClient::SqliteAnalyticsClient(AnalyticsStoreLocator locate, Kernel& kernel)
@@ -48,10 +60,10 @@ void SqliteAnalyticsClient::addValueForScalarKey(std::string_view key, std::int6
   writeOne(&AnalyticsStore::addScalar, {key, increment});
 }
 void SqliteAnalyticsClient::setValuesForScalarKeys(std::span<const ScalarFigure> values) {
-  writeAll(&AnalyticsStore::setScalar, values);
+  writeAll(&AnalyticsStore::setScalar, values, AfterFailure::KeepTheRest);
 }
-void SqliteAnalyticsClient::addValuesForScalarKeys(std::span<const ScalarFigure> increments) {
-  writeAll(&AnalyticsStore::addScalar, increments);
+bool SqliteAnalyticsClient::addValuesForScalarKeys(std::span<const ScalarFigure> increments) {
+  return writeAll(&AnalyticsStore::addScalar, increments, AfterFailure::KeepNone);
 }
 
 void SqliteAnalyticsClient::writeOne(Write write, const ScalarFigure& figure) {
@@ -61,19 +73,27 @@ void SqliteAnalyticsClient::writeOne(Write write, const ScalarFigure& figure) {
   if (!result.ok()) noteLostWrite(*target, figure.key, result);
 }
 
-void SqliteAnalyticsClient::writeAll(Write write, std::span<const ScalarFigure> figures) {
+bool SqliteAnalyticsClient::writeAll(Write write, std::span<const ScalarFigure> figures,
+                                     AfterFailure afterFailure) {
   AnalyticsStore* target = store();
-  if (target == nullptr || figures.empty()) return;
+  if (target == nullptr || figures.empty()) return true;
   const DayNumber today = currentDayNumber();
   if (const StoreResult begun = target->beginLoad(); !begun.ok()) {
-    return noteLostWrite(*target, figures.front().key, begun);
+    noteLostWrite(*target, figures.front().key, begun);
+    return false;
   }
+  const OpenLoad load(*target);
+  bool isWhole = true;
   for (const auto& [key, number] : figures) {
     const StoreResult result = (target->*write)(key, today, number);
-    if (!result.ok()) noteLostWrite(*target, key, result);
+    if (result.ok()) continue;
+    noteLostWrite(*target, key, result);
+    if (result.fault != StoreFault::UnusableKey) isWhole = false;
   }
+  if (!isWhole && afterFailure == AfterFailure::KeepNone) return false;
   const StoreResult committed = target->commitLoad();
   if (!committed.ok()) noteLostWrite(*target, figures.front().key, committed);
+  return isWhole && committed.ok();
 }
 
 AnalyticsStore* SqliteAnalyticsClient::store() {

@@ -25,12 +25,15 @@ class SqliteAnalyticsClient : public AnalyticsClient {
   void addValueForScalarKey(std::string_view key, std::int64_t increment) override;
   // In one transaction; a figure that is refused does not keep the others from being written.
   void setValuesForScalarKeys(std::span<const ScalarFigure> values) override;
-  void addValuesForScalarKeys(std::span<const ScalarFigure> increments) override;
+  // The same, but a failure of the store keeps all of them from being written.
+  [[nodiscard]] bool addValuesForScalarKeys(std::span<const ScalarFigure> increments) override;
 
  private:
   using Write = StoreResult (AnalyticsStore::*)(std::string_view key, DayNumber day, std::int64_t number);
   void writeOne(Write write, const ScalarFigure& figure);
-  void writeAll(Write write, std::span<const ScalarFigure> figures);
+  enum class AfterFailure : bool { KeepTheRest, KeepNone };
+  // Whether the store did what it was asked for.
+  bool writeAll(Write write, std::span<const ScalarFigure> figures, AfterFailure afterFailure);
   // Null while the store has no place.
   AnalyticsStore* store();
 
