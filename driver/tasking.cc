@@ -3,8 +3,10 @@
 #include <algorithm>
 #include <charconv>
 #include <limits>
+#include <map>
 #include <set>
 #include <string>
+#include <utility>
 
 #include "platform/device_answers.h"
 #include "platform/diagnostics.h"
@@ -33,17 +35,83 @@ PlistValue stringOrNone(const std::optional<std::string>& text) {
   return text ? PlistValue::string(*text) : PlistValue();
 }
 
-// Applies the scheduled tasking, and remembers which domains have to reach storage.
+// Writes settings, and remembers which domains have to reach storage. What a domain does not take for now
+// waits in the job's own preferences, and the next run makes it up: one bad file neither costs a setting nor
+// keeps later taskings away.
+class SettingsWriter {
+ public:
+  explicit SettingsWriter(PreferencesStore& preferences) : preferences_(preferences) {}
+
+  // What earlier runs could not write. A call before all others.
+  void makeUp() {
+    const PlistValue waiting = preferences_.getValue(kUnwrittenKey, kJob);
+    if (waiting.asArray() == nullptr) return;
+    isWaiting_ = true;
+    std::vector<PreferenceChange> changes;
+    for (const TaskingItem& item : taskingItems(*waiting.asArray())) {
+      if (!isConsent(item)) changes.push_back({item.key, item.value, item.domain});
+    }
+    change(changes);
+    record({});
+    synchronize();
+  }
+  void change(const std::vector<PreferenceChange>& changes) {
+    const std::vector<std::string> refusing = apply(changes);
+    for (const PreferenceChange& change : changes) {
+      const std::pair setting(std::string(change.domain), std::string(change.key));
+      if (std::ranges::find(refusing, change.domain) != refusing.end()) {
+        unwritten_.insert_or_assign(setting, change.value);
+      } else {
+        unwritten_.erase(setting);
+      }
+    }
+  }
+  // Changes of the job's own preferences, together with what waits.
+  void record(std::vector<PreferenceChange> changes) {
+    if (isWaiting_ || !unwritten_.empty()) changes.push_back({kUnwrittenKey, waiting(), kJob});
+    if (apply(changes).empty()) isWaiting_ = !unwritten_.empty();
+  }
+  void synchronize() {
+    for (const std::string& domain : touchedDomains_) preferences_.synchronize(domain);
+    touchedDomains_.clear();
+  }
+
+ private:
+  static constexpr std::string_view kUnwrittenKey = "TaskingUnwritten";
+
+  std::vector<std::string> apply(const std::vector<PreferenceChange>& changes) {
+    for (const PreferenceChange& change : changes) touchedDomains_.emplace(change.domain);
+    return preferences_.applyChanges(changes);
+  }
+  // As the items of a tasking; none when nothing waits.
+  PlistValue waiting() const {
+    PlistArray items;
+    for (const auto& [setting, value] : unwritten_) {
+      PlistDictionary item{{"Domain", PlistValue::string(setting.first)},
+                           {"Key", PlistValue::string(setting.second)}};
+      if (value) item.set("Value", value);
+      items.push_back(PlistValue::dictionary(std::move(item)));
+    }
+    return items.empty() ? PlistValue() : PlistValue::array(std::move(items));
+  }
+
+  PreferencesStore& preferences_;
+  std::set<std::string, std::less<>> touchedDomains_;
+  std::map<std::pair<std::string, std::string>, PlistValue>
+      unwritten_;           // (domain, key): value, none to remove
+  bool isWaiting_ = false;  // the preferences name settings that wait
+};
+
+// Applies the scheduled tasking.
 class TaskingStep {
  public:
-  TaskingStep(Platform& platform, const PlistDictionary& tasking, std::string_view id,
-              const std::optional<std::string>& build)
-      : platform_(platform), tasking_(tasking), id_(id), build_(build) {}
+  TaskingStep(Platform& platform, SettingsWriter& settings, const PlistDictionary& tasking,
+              std::string_view id, const std::optional<std::string>& build)
+      : platform_(platform), settings_(settings), tasking_(tasking), id_(id), build_(build) {}
 
   void run() {
-    PreferencesStore& preferences = platform_.preferences;
-    const PlistValue currentID = preferences.getValue("TaskingID", kJob);
-    const PlistValue currentOS = preferences.getValue("TaskingOS", kJob);
+    const PlistValue currentID = platform_.preferences.getValue("TaskingID", kJob);
+    const PlistValue currentOS = platform_.preferences.getValue("TaskingOS", kJob);
     if (!currentID.isNone()) {
       const bool isApplied =
           currentID.asString() == id_ && build_ && currentOS.asString() == std::string_view(*build_);
@@ -54,16 +122,11 @@ class TaskingStep {
       withdraw();
     }
     apply();
-    for (const std::string& domain : touchedDomains_) preferences.synchronize(domain);
+    settings_.synchronize();
     platform_.notifications.post(kTaskingChangedNotification);
   }
 
  private:
-  void change(const std::vector<PreferenceChange>& changes) {
-    platform_.preferences.applyChanges(changes);
-    for (const PreferenceChange& change : changes) touchedDomains_.emplace(change.domain);
-  }
-
   void withdraw() {
     const PlistValue payload = platform_.preferences.getValue("TaskingPayload", kJob);
     std::vector<PreferenceChange> removals;
@@ -72,8 +135,8 @@ class TaskingStep {
         if (!isConsent(item)) removals.push_back({item.key, {}, item.domain});
       }
     }
-    change(removals);
-    change({{"TaskingID", {}, kJob}, {"TaskingDigest", {}, kJob}, {"TaskingPayload", {}, kJob}});
+    settings_.change(removals);
+    settings_.record({{"TaskingID", {}, kJob}, {"TaskingDigest", {}, kJob}, {"TaskingPayload", {}, kJob}});
   }
 
   void apply() {
@@ -88,18 +151,18 @@ class TaskingStep {
         settings.push_back({item.key, item.value, item.domain});
       }
     }
-    change(settings);
-    change({{"TaskingID", PlistValue::string(std::string(id_)), kJob},
-            {"TaskingOS", stringOrNone(build_), kJob},
-            {"TaskingDigest", tasking_.get("TaskingDigest"), kJob},
-            {"TaskingPayload", payload, kJob}});
+    settings_.change(settings);
+    settings_.record({{"TaskingID", PlistValue::string(std::string(id_)), kJob},
+                      {"TaskingOS", stringOrNone(build_), kJob},
+                      {"TaskingDigest", tasking_.get("TaskingDigest"), kJob},
+                      {"TaskingPayload", payload, kJob}});
   }
 
   Platform& platform_;
+  SettingsWriter& settings_;
   const PlistDictionary& tasking_;
   std::string_view id_;
   const std::optional<std::string>& build_;
-  std::set<std::string, std::less<>> touchedDomains_;
 };
 
 OSUpdate noteOSChange(Platform& platform, const std::optional<std::string>& build, DayNumber today) {
@@ -178,11 +241,13 @@ void HandleTaskingAndOSChange(Platform& platform) {
   const std::optional<std::string> build = platform.deviceAnswers.currentOSBuildVersion();
   const OSUpdate last = noteOSChange(platform, build, today);
 
+  SettingsWriter settings(platform.preferences);
+  settings.makeUp();
   const PlistValue scheduled =
       platform.preferences.getValue("ScheduledTasking", preference_domain::kLogSubmission);
   const PlistValue id = scheduled.get("TaskingID");
   if (!id.asString()) return;
-  TaskingStep(platform, *scheduled.asDictionary(), *id.asString(), build).run();
+  TaskingStep(platform, settings, *scheduled.asDictionary(), *id.asString(), build).run();
   submitOnAggressiveDays(platform, today, last);
 }
 

@@ -20,8 +20,8 @@ inline constexpr std::string_view kTaskingChangedNotification = "com.velmora.da.
 inline constexpr std::string_view kAggressiveDaysKey = "AggressiveSubmissionDays";
 
 // A step of the daily run. Notes an update of the operating system; applies or withdraws the scheduled
-// tasking; submits logs on the days after an update, where a tasking is scheduled. Writes are not verified;
-// main thread only.
+// tasking; submits logs on the days after an update, where a tasking is scheduled. What a domain does not
+// take waits for the next run, in "TaskingUnwritten" of the job's preferences. Main thread only.
 void HandleTaskingAndOSChange(Platform& platform);
 
 // One value of a tasking. Views are borrowed from the payload.

@@ -66,6 +66,41 @@ TEST_F(TaskingTest, AppliesWithdrawsAndAppliesAgainInOrder) {
   EXPECT_THAT(fake_.notifications.posts, ElementsAre("com.velmora.da.tasking_changed"));
 }
 
+TEST_F(TaskingTest, WhatADomainDoesNotTakeIsMadeUpByTheNextRun) {
+  const auto scheduleNumber = [&](const char* id, const char* value) {
+    schedule(std::string(R"({"TaskingID": ")") + id +
+             R"(", "TaskingPayload": [{"Domain": "a", "Key": "y", "Value": )" + value +
+             R"(}, {"Domain": "b", "Key": "x", "Value": )" + value + "}]}");
+  };
+  const auto setting = [&](const char* domain, const char* key) {
+    return fake_.preferences.getValue(key, domain).asInteger();
+  };
+  fake_.preferences.unwritable = "b";
+  scheduleNumber("t1", "1");
+  run();
+  EXPECT_EQ(job("TaskingID").asString(), "t1");
+  EXPECT_EQ(plistText(job("TaskingUnwritten")), R"([{"Domain": "b", "Key": "x", "Value": 1}])");
+  EXPECT_EQ(setting("a", "y"), 1);
+  scheduleNumber("t2", "2");  // the last word on a setting is the one that waits
+  run();
+  EXPECT_EQ(job("TaskingID").asString(), "t2");
+  EXPECT_EQ(plistText(job("TaskingUnwritten")), R"([{"Domain": "b", "Key": "x", "Value": 2}])");
+  EXPECT_EQ(setting("a", "y"), 2);
+
+  fake_.preferences.unwritable.clear();
+  run();
+  EXPECT_EQ(setting("b", "x"), 2);
+  EXPECT_TRUE(job("TaskingUnwritten").isNone());
+
+  fake_.preferences.unwritable = "b";  // a setting that could not be withdrawn
+  schedule(R"({"TaskingID": "t3"})");
+  run();
+  EXPECT_EQ(setting("b", "x"), 2);
+  fake_.preferences.unwritable.clear();
+  run();
+  EXPECT_TRUE(fake_.preferences.getValue("x", "b").isNone());
+}
+
 TEST_F(TaskingTest, NeitherGivesNorTakesConsentAndWithdrawsWhatNoTextNames) {
   fake_.preferences.setValue("DiagnosticLogSubmissionEnabled", PlistValue::boolean(false),
                              "com.velmora.Crashferry");

@@ -28,6 +28,7 @@ SECONDS = 60  # after which a run counts as hanging
 OWN = "com.velmora.sysmetrics.tbdaily"
 DAY_KEY = "LastCrashLogSerializationDateInDaysSince1970"
 TASKING_VALUES = "com.velmora.da"
+UNWRITTEN = "TaskingUnwritten"  # settings that wait for the next run
 SPOOL = "var/mobile/Library/Logs"
 META = ".meta.plist"
 BATCH = 32  # runs that are under way before the first one's outcome counts
@@ -304,7 +305,8 @@ class Day:
             for key, values in allowed.items():
                 value = state.preferences.get(domain, {}).get(key)
                 require(value in values, domain, key, "is neither old nor new:", value)
-        odd = {(d, k) for d in state.preferences for k in state.preferences[d] if k not in self.values.get(d, {})}
+        odd = {(d, k) for d in state.preferences for k in state.preferences[d]
+               if k not in self.values.get(d, {}) and k != UNWRITTEN}
         require(not odd, "nobody set", odd)
 
     def _check_logs(self, state, may_be_cut):
@@ -346,6 +348,7 @@ class Day:
         odd = [(key, report.get(key)) for key in {**report, **self.reports[0]}
                if all(report.get(key) != expected.get(key) for expected in self.reports)]
         require(not odd, "the next report says", odd)
+        require(UNWRITTEN not in final.preferences[JOB], "the next run did not make up", final.preferences[JOB].get(UNWRITTEN))
         free = {(JOB, DAY_KEY)}
         if mode.name == "unreadable":  # a tasking whose record could not be read is not withdrawn
             free.add((TASKING_VALUES, "Withdrawn"))

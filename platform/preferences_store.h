@@ -5,7 +5,9 @@
 
 #include <cstdint>
 #include <span>
+#include <string>
 #include <string_view>
+#include <vector>
 
 #include "platform/plist_value.h"
 
@@ -46,9 +48,11 @@ class PreferencesStore {
   // None removes the key. Visible at once to later reads in this and in other processes.
   virtual void setValue(std::string_view key, const PlistValue& value, std::string_view domain) = 0;
   // Comes to the same as setting one after the other in this order. A store may write each domain once; a
-  // change that cannot be written does not keep the others from being written.
-  virtual void applyChanges(std::span<const PreferenceChange> changes) {
+  // change that cannot be written does not keep the others from being written. Answers with the domains that
+  // took no change now and may take it later; what is refused for good is not among them.
+  virtual std::vector<std::string> applyChanges(std::span<const PreferenceChange> changes) {
     for (const PreferenceChange& change : changes) setValue(change.key, change.value, change.domain);
+    return {};
   }
   // Forces what was written to the domain to storage.
   virtual void synchronize(std::string_view domain) = 0;

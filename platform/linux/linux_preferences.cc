@@ -103,33 +103,37 @@ std::string LinuxPreferences::bytesOf(std::string_view name, const PlistDictiona
   return codec_.write(PlistValue::dictionary(changed(stored, writable)), PlistForm::Carried).bytes;
 }
 
-void LinuxPreferences::changeDomain(std::string_view name, std::span<const Change> changes) {
-  if (!acceptsDomain(name)) return;
+bool LinuxPreferences::changeDomain(std::string_view name, std::span<const Change> changes) {
+  if (!acceptsDomain(name)) return true;
   const bool onlyRemoves =
       std::all_of(changes.begin(), changes.end(), [](const Change& c) { return c.value.isNone(); });
-  if (onlyRemoves && current(name).state() == State::Missing) return;  // nothing to remove, nothing to make
+  if (onlyRemoves && current(name).state() == State::Missing) return true;  // nothing to remove or to make
+  const auto fail = [](const fs::path& place, int error) {
+    noteWriteFailure(place, error);
+    return false;
+  };
   DeviceFolder folder;
   if (const int error = host_.files().makeFolder(kFolder, folder); error != 0)
-    return noteWriteFailure(host_.files().place(kFolder), error);
+    return fail(host_.files().place(kFolder), error);
   const std::string file = std::string(name) + ".plist";
   FileLock lock;
   if (const int error = lock.acquire(folder, file + ".lock"); error != 0)
-    return noteWriteFailure(folder.place(file + ".lock"), error);
+    return fail(folder.place(file + ".lock"), error);
 
   CachedPlistFile& domain = current(name);
   if (domain.state() == State::Unreadable)
-    return;  // named when it was read; replacing it would lose what it holds
+    return false;  // named when it was read; replacing it would lose what it holds
   const PlistDictionary& stored = *domain.root().asDictionary();
   const bool changesNothing =
       onlyRemoves && std::none_of(changes.begin(), changes.end(),
                                   [&stored](const Change& c) { return stored.contains(c.key); });
-  if (changesNothing && domain.state() != State::Damaged) return;
-  if (domain.state() == State::Damaged && !moveAside(folder, file)) return;
+  if (changesNothing && domain.state() != State::Damaged) return true;
+  if (domain.state() == State::Damaged && !moveAside(folder, file)) return false;
   const std::string bytes = bytesOf(name, stored, changes);
   domain.forget();  // whatever becomes of the write
-  if (bytes.empty()) return;
-  if (const int error = folder.replaceFile(file, bytes); error != 0)
-    noteWriteFailure(folder.place(file), error);
+  if (bytes.empty()) return false;
+  const int error = folder.replaceFile(file, bytes);
+  return error == 0 || fail(folder.place(file), error);
 }
 
 void LinuxPreferences::setValue(std::string_view key, const PlistValue& value, std::string_view name) {
@@ -138,7 +142,7 @@ void LinuxPreferences::setValue(std::string_view key, const PlistValue& value, s
   changeDomain(name, std::span(&change, 1));
 }
 
-void LinuxPreferences::applyChanges(std::span<const PreferenceChange> changes) {
+std::vector<std::string> LinuxPreferences::applyChanges(std::span<const PreferenceChange> changes) {
   const std::lock_guard guard(mutex_);
   std::map<std::string_view, std::vector<Change>> byDomain;
   std::vector<std::string_view> inOrder;
@@ -147,7 +151,11 @@ void LinuxPreferences::applyChanges(std::span<const PreferenceChange> changes) {
     if (series.empty()) inOrder.push_back(change.domain);
     series.push_back({change.key, change.value});
   }
-  for (const std::string_view domain : inOrder) changeDomain(domain, byDomain[domain]);
+  std::vector<std::string> unwritten;
+  for (const std::string_view domain : inOrder) {
+    if (!changeDomain(domain, byDomain[domain])) unwritten.emplace_back(domain);
+  }
+  return unwritten;
 }
 
 void LinuxPreferences::synchronize(std::string_view name) {

@@ -23,7 +23,7 @@ class LinuxPreferences : public PreferencesStore {
   PlistValue getValue(std::string_view key, std::string_view domain) override;
   void setValue(std::string_view key, const PlistValue& value, std::string_view domain) override;
   // Writes each domain once. A value that no file can hold is left out and named.
-  void applyChanges(std::span<const PreferenceChange> changes) override;
+  std::vector<std::string> applyChanges(std::span<const PreferenceChange> changes) override;
   void synchronize(std::string_view domain) override;
 
   static constexpr std::string_view kFolder = "/var/mobile/Library/Preferences";
@@ -37,8 +37,8 @@ class LinuxPreferences : public PreferencesStore {
     std::string_view key;
     PlistValue value;  // none removes the key
   };
-  // A read-modify-write of the domain's file, under its lock.
-  void changeDomain(std::string_view name, std::span<const Change> changes);
+  // A read-modify-write of the domain's file, under its lock. False when another time may do better.
+  bool changeDomain(std::string_view name, std::span<const Change> changes);
   static PlistDictionary changed(PlistDictionary values, std::span<const Change> changes);
   // The file's contents after the changes; empty when they cannot be written.
   std::string bytesOf(std::string_view name, const PlistDictionary& stored, std::span<const Change> changes);
