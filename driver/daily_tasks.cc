@@ -27,7 +27,8 @@ namespace {
 constexpr std::chrono::minutes kPatience(10);
 
 void runTasks(Platform& platform, DayNumber day, const PlistValue& appInfo) {
-  platform.systemLog.message(LogLevel::Default, "daily tasks for day %d", day);
+  runStep(platform, "the first line",
+          [&] { platform.systemLog.message(LogLevel::Default, "daily tasks for day %d", day); });
   runStep(platform, "the checkpoint", [&] { platform.analyticsClient.checkpoint(); });
   runStep(platform, "the report", [&] {
     if (!platform.logSubmission.isDiagnosticLogSubmissionEnabled()) return;

@@ -8,6 +8,7 @@
 #include "platform/plist_text.h"
 #include "storage/storage_test_support.h"
 #include "storage/write_amplification.h"
+#include "testing/allocations.h"
 #include "testing/fake_platform.h"
 #include "testing/json_test_support.h"
 
@@ -184,6 +185,27 @@ TEST_F(StructuredLogsTest, EveryListIsFetchedWhateverBecameOfTheOthers) {
   fake.driverRegistry.drivers.clear();
   EXPECT_FALSE(DumpStorageStructuredLog(fake.platform, false));
   EXPECT_FALSE(gStorageLogState.gNeedValidityList);
+}
+
+TEST_F(StructuredLogsTest, MemoryThatRunsOutCostsOneList) {
+  testing::ScriptedController controller(fake.driverRegistry, kNvme);
+  controller.buffers[17] = telemetry(1);
+  controller.buffers[15] = words({0, 1, 0});
+  fake.driverRegistry.drivers[0].properties.set("Controller Characteristics", characteristics());
+  std::size_t ended = 0, n = 0;  // runs that ended before the first list
+  for (bool wasMet = true; wasMet;) {
+    fake.logSubmission.structured.clear();
+    const testing::RefusedAllocation refused(++n);
+    try {
+      DumpStorageStructuredLog(fake.platform, false);
+      EXPECT_GE(logs().size(), 3U) << n;
+    } catch (const std::bad_alloc&) {
+      EXPECT_TRUE(logs().empty()) << n;
+      ++ended;
+    }
+    wasMet = refused.wasMet();
+  }
+  EXPECT_GT(n, 20 * ended);
 }
 
 }  // namespace
