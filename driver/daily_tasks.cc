@@ -27,8 +27,7 @@ namespace {
 constexpr std::chrono::minutes kPatience(10);
 
 void runTasks(Platform& platform, DayNumber day, const PlistValue& appInfo) {
-  runStep(platform, "the first line",
-          [&] { platform.systemLog.message(LogLevel::Default, "daily tasks for day %d", day); });
+  platform.systemLog.message(LogLevel::Default, "daily tasks for day %d", day);
   runStep(platform, "the checkpoint", [&] { platform.analyticsClient.checkpoint(); });
   runStep(platform, "the report", [&] {
     if (!platform.logSubmission.isDiagnosticLogSubmissionEnabled()) return;
@@ -48,7 +47,7 @@ void RunDailyTasks(Platform& platform, DayNumber day, const PlistValue& appInfo)
   const std::unique_ptr<HeldRunLock> lock = platform.runLock.acquire(kPatience);
   if (lock == nullptr) return;
   runTasks(platform, day, appInfo);
-  platform.fileSystem.makeDurable();
+  runStep(platform, "the way to storage", [&] { platform.fileSystem.makeDurable(); });
 }
 
 void RunDailyTasksIfNewDay(Platform& platform, const PlistValue& appInfo) {
@@ -61,10 +60,12 @@ void RunDailyTasksIfNewDay(Platform& platform, const PlistValue& appInfo) {
     return;
   }
   runTasks(platform, yesterday, appInfo);
-  // A day counts as done when all that it wrote would outlive a power cut.
-  if (!platform.fileSystem.makeDurable()) return;
-  preferences.setValue(kLastProcessedDay, PlistValue::int32(yesterday), preference_domain::kJob);
-  preferences.synchronize(preference_domain::kJob);
+  runStep(platform, "the record of the day", [&] {
+    // A day counts as done when all that it wrote would outlive a power cut.
+    if (!platform.fileSystem.makeDurable()) return;
+    preferences.setValue(kLastProcessedDay, PlistValue::int32(yesterday), preference_domain::kJob);
+    preferences.synchronize(preference_domain::kJob);
+  });
 }
 
 }  // namespace tbdaily

@@ -1,4 +1,5 @@
-// What a test's program takes from the heap, thread by thread: counted, and refused where the test asks for it.
+// What a test's program takes from the heap, thread by thread: counted, and refused where the test asks for
+// it.
 #pragma once
 
 #include <cstddef>
@@ -8,7 +9,8 @@ namespace tbdaily::testing {
 // Of this thread, since it began.
 std::size_t allocations();
 
-// While it lives, the n-th allocation (from 1) of this thread from now on throws std::bad_alloc. One at a time.
+// While it lives, the n-th allocation (from 1) of this thread from now on throws std::bad_alloc. One at a
+// time.
 class RefusedAllocation {
  public:
   explicit RefusedAllocation(std::size_t n);
