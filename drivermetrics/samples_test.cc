@@ -69,6 +69,10 @@ TEST(Subscription, TellsTheHubWhatIsWantedAndSamplesItsBuffer) {
     EXPECT_EQ(device.registry.mappings, 1);
   }
   device.expectNothingHeld();
+
+  device.hub.buffer = PlistData();  // mapped as well, without an address
+  EXPECT_NE(KdReportCreateSubscription(device.registry, nullptr, channels.get(), &subscribed, 0), nullptr);
+  device.expectNothingHeld();
 }
 
 TEST(Subscription, LeavesNothingBehindWhenAStepFails) {
