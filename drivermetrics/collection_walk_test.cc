@@ -220,6 +220,9 @@ TEST(CollectionWalk, FailsOnMalformedCollections) {
          {number, PlistValue::array({number}), PlistValue::dictionary({{"G", number}})}) {
       const KdReportCollection bad = with(key, value);
       EXPECT_EQ(KdReportGetChannelCount(bad.get()), kKdReportNoIndex) << key;
+      const KdReportCollection again =
+          KdReportCreateAggregateFromPropertyList(KdReportCopyPropertyList(bad.get()));
+      EXPECT_EQ(KdReportGetChannelCount(again.get()), kKdReportNoIndex) << key;
       EXPECT_EQ(KdReportPrune(bad.get(), [](ChannelRecord&) { return 0U; }), kKdReportWalkFailed);
       EXPECT_EQ(cloneAggregate(bad.get(), [](const auto&, auto&) { return 0U; }), nullptr);
       EXPECT_EQ(KdReportCreateSamplesDelta(good.get(), bad.get()), nullptr);
