@@ -81,7 +81,7 @@ TEST_F(DataUsageTest, WhatIsNotAsItShouldBeIsSkipped) {
 }
 
 TEST_F(DataUsageTest, AReplyAfterTheWaitIsProcessedAllTheSame) {
-  fake_.usageService.delay = std::chrono::milliseconds(60);
+  fake_.usageService.isLate = true;
   fake_.usageService.records = PlistValue::array({record("bundleName", "b", kMorning, {4096})});
   CollectDataUsage(fake_.platform, std::chrono::milliseconds(20));
   EXPECT_TRUE(fake_.systemLog.has("default: Netwatch timed out, no datausage available"));

@@ -11,7 +11,7 @@
 #include "drivermetrics/report_error.h"
 #include "drivermetrics/subscription.h"
 #include "platform/byte_reader.h"
-#include "platform/identifier_hash.h"
+#include "platform/keyed_hash.h"
 
 namespace kdreport {
 
@@ -91,7 +91,7 @@ class SampleBuffer {
 
   // The slot that holds the channel's first element, or the free one where it belongs.
   std::uint32_t& slotOf(const Identifiers& wanted) {
-    std::size_t slot = hash_(wanted.first, wanted.second) & (slots_.size() - 1);
+    std::size_t slot = tbdaily::KeyedHash::of(wanted.first, wanted.second) & (slots_.size() - 1);
     for (std::size_t tried = 1; tried < slots_.size(); ++tried) {
       if (slots_[slot] == kFree || identifiersAt(slots_[slot]) == wanted) break;
       slot = (slot + 1) & (slots_.size() - 1);
@@ -100,7 +100,6 @@ class SampleBuffer {
   }
 
   std::span<const std::byte> buffer_;
-  tbdaily::IdentifierHash hash_;
   End end_;
   std::vector<bool> isFirst_;         // elements that begin the first channel with its identifiers
   std::size_t next_ = 0;              // behind the channel that was found last

@@ -1,18 +1,14 @@
-// Analytics scalar keys and the day numbering.
-//
-// Day numbers count UTC days since 1970-01-01, negative before. Absent store: writes do nothing.
+// Analytics scalar keys, by day. Absent store: writes do nothing.
 #pragma once
 
 #include <cstdint>
 #include <span>
 #include <string_view>
 
+#include "platform/calendar.h"
 #include "platform/plist_value.h"
 
 namespace tbdaily {
-
-using DayNumber = std::int32_t;
-inline constexpr std::int64_t kSecondsPerDay = 86400;
 
 // One of the figures that a step of a run writes together. The key is borrowed for the call.
 struct ScalarFigure {
@@ -45,9 +41,5 @@ class AnalyticsClient {
     return true;
   }
 };
-
-// The numbering itself, the same on every host.
-DayNumber dayNumberOf(PlistDate date);
-PlistDate dateOf(DayNumber day);
 
 }  // namespace tbdaily

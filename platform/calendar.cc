@@ -5,6 +5,7 @@
 #include <charconv>
 #include <cmath>
 #include <cstdio>
+#include <limits>
 
 namespace tbdaily {
 
@@ -62,8 +63,8 @@ CivilTime civilTime(PlistDate date) {
   const auto seconds = saturatingInt64(whole);
   CivilTime time;
   time.fraction = date.secondsSinceReference - whole;
-  const std::int64_t dayOffset = (seconds >= 0 ? seconds : seconds - 86399) / 86400;
-  const auto secondOfDay = static_cast<unsigned>(seconds - dayOffset * 86400);
+  const std::int64_t dayOffset = (seconds >= 0 ? seconds : seconds - (kSecondsPerDay - 1)) / kSecondsPerDay;
+  const auto secondOfDay = static_cast<unsigned>(seconds - dayOffset * kSecondsPerDay);
   civilOfDays(dayOffset + kDaysTo2001, time);
   time.hour = secondOfDay / 3600;
   time.minute = secondOfDay / 60 % 60;
@@ -74,7 +75,7 @@ CivilTime civilTime(PlistDate date) {
 PlistDate dateOfCivilTime(const CivilTime& time) {
   const std::int64_t days = daysOfCivil(time.year, time.month, time.day) - kDaysTo2001;
   const std::int64_t seconds =
-      days * 86400 + std::int64_t{time.hour} * 3600 + std::int64_t{time.minute} * 60 + time.second;
+      days * kSecondsPerDay + std::int64_t{time.hour} * 3600 + std::int64_t{time.minute} * 60 + time.second;
   return {static_cast<double>(seconds) + time.fraction};
 }
 
@@ -104,6 +105,21 @@ std::string stampText(PlistDate date, unsigned fractionDigits) {
   std::string text = dateText(date, DateFraction::Drop);
   text.back() = '.';
   return text.append(digits, 1, fractionDigits).append("Z");
+}
+
+DayNumber dayNumberOf(PlistDate date) {
+  // From the seconds as they are stored: the sum with the epoch's offset could round up to the next day, and
+  // so could the quotient.
+  constexpr auto kSeconds = static_cast<double>(kSecondsPerDay);
+  double fromReference = std::floor(date.secondsSinceReference / kSeconds);
+  if (fromReference * kSeconds > date.secondsSinceReference) fromReference -= 1;
+  const std::int64_t day = saturatingInt64(fromReference + static_cast<double>(kDaysTo2001));
+  return static_cast<DayNumber>(std::clamp<std::int64_t>(day, std::numeric_limits<DayNumber>::min(),
+                                                         std::numeric_limits<DayNumber>::max()));
+}
+
+PlistDate dateOf(DayNumber day) {
+  return PlistDate::fromUnixSeconds(static_cast<double>(day * kSecondsPerDay));
 }
 
 }  // namespace tbdaily

@@ -32,4 +32,13 @@ struct CivilTime {
 CivilTime civilTime(PlistDate date);
 PlistDate dateOfCivilTime(const CivilTime& time);
 
+// UTC days since 1970-01-01, negative before.
+using DayNumber = std::int32_t;
+inline constexpr std::int64_t kSecondsPerDay = 86400;
+
+// Saturates at the ends of the range.
+DayNumber dayNumberOf(PlistDate date);
+// Midnight UTC of the day.
+PlistDate dateOf(DayNumber day);
+
 }  // namespace tbdaily

@@ -2,8 +2,9 @@
 
 #include <bit>
 #include <cmath>
-#include <functional>
 #include <limits>
+
+#include "platform/keyed_hash.h"
 
 namespace tbdaily {
 
@@ -136,12 +137,6 @@ PlistDictionary::PlistDictionary(std::initializer_list<Entry> entries) {
   for (const Entry& entry : entries) set(entry.first, entry.second);
 }
 
-namespace {
-std::uint32_t hashOf(std::string_view key) {
-  return static_cast<std::uint32_t>(std::hash<std::string_view>{}(key));
-}
-}  // namespace
-
 std::size_t PlistDictionary::indexOf(std::string_view key) const {
   if (slots_.empty()) {
     for (std::size_t i = 0; i < entries_.size(); ++i) {
@@ -150,7 +145,7 @@ std::size_t PlistDictionary::indexOf(std::string_view key) const {
     return kNoEntry;
   }
   const std::size_t mask = slots_.size() - 1;
-  const std::uint32_t hash = hashOf(key);
+  const std::uint32_t hash = KeyedHash::of(key);
   for (std::size_t slot = hash & mask; slots_[slot].entry != 0; slot = (slot + 1) & mask) {
     const std::size_t entry = slots_[slot].entry - 1;
     if (slots_[slot].hash == hash && entries_[entry].first == key) return entry;
@@ -160,7 +155,7 @@ std::size_t PlistDictionary::indexOf(std::string_view key) const {
 
 void PlistDictionary::insertIntoIndex(std::size_t entry) {
   const std::size_t mask = slots_.size() - 1;
-  const std::uint32_t hash = hashOf(entries_[entry].first);
+  const std::uint32_t hash = KeyedHash::of(entries_[entry].first);
   std::size_t slot = hash & mask;
   while (slots_[slot].entry != 0) slot = (slot + 1) & mask;
   slots_[slot] = {hash, static_cast<std::uint32_t>(entry + 1)};

@@ -2,6 +2,10 @@
 
 #include <gtest/gtest.h>
 
+#include <set>
+
+#include "platform/keyed_hash.h"
+
 namespace tbdaily {
 namespace {
 
@@ -43,6 +47,25 @@ TEST(PlistDictionary, KeepsTheFirstPlaceAndTheLastValueAtEverySize) {
   EXPECT_EQ(dictionary.get("key999").asInteger(), 999);
   EXPECT_FALSE(dictionary.contains("key500"));
   EXPECT_FALSE(dictionary.contains("key501"));
+}
+
+// Keys that are alike in all but one bit, at every length and place.
+TEST(KeyedHash, TellsAlikeKeysApart) {
+  std::set<std::uint32_t> hashes;
+  std::size_t keys = 0;
+  for (std::size_t length = 0; length < 300; ++length) {
+    std::string key(length, '\0');
+    hashes.insert(KeyedHash::of(key));
+    hashes.insert(KeyedHash::of(length, 0));
+    for (char& c : key) {
+      c = 1;
+      hashes.insert(KeyedHash::of(key));
+      c = 0;
+    }
+    keys += length + 2;
+    EXPECT_EQ(KeyedHash::of(key), KeyedHash::of(std::string(length, '\0')));
+  }
+  EXPECT_GT(hashes.size(), keys - 50);
 }
 
 }  // namespace

@@ -2,7 +2,7 @@
 // answers as an absent service until it is scripted.
 #pragma once
 
-#include <chrono>
+#include <latch>
 #include <memory>
 #include <optional>
 #include <string>
@@ -53,11 +53,16 @@ class FakeStackSnapshot : public StackSnapshot {
 
 class FakeUsageService : public UsageService {
  public:
-  PlistValue records;  // none: the reply never comes
-  std::chrono::milliseconds delay{0};
+  PlistValue records;   // none: the reply never comes
+  bool isLate = false;  // replies come when they are waited for, and no earlier
 
   std::unique_ptr<UsageWorkspace> createWorkspace() override { return std::make_unique<Source>(*this); }
-  void waitForReplies() { replies_.clear(); }
+  ~FakeUsageService() override { waitForReplies(); }
+  void waitForReplies() {
+    for (const auto& release : held_) release->count_down();
+    held_.clear();
+    replies_.clear();
+  }
 
  private:
   struct Source : UsageWorkspace, UsageFeed {
@@ -65,14 +70,17 @@ class FakeUsageService : public UsageService {
     std::unique_ptr<UsageFeed> createFeed() override { return std::make_unique<Source>(fake); }
     void requestUsageToDate(std::span<const std::string>, UsageNameKind, UsageReplyHandler handler) override {
       if (fake.records.isNone()) return;
-      fake.replies_.emplace_back([handler = std::move(handler), records = fake.records, delay = fake.delay] {
-        std::this_thread::sleep_for(delay);
+      const auto release = std::make_shared<std::latch>(fake.isLate ? 1 : 0);
+      if (fake.isLate) fake.held_.push_back(release);
+      fake.replies_.emplace_back([handler = std::move(handler), records = fake.records, release] {
+        release->wait();
         handler(records);
       });
     }
     FakeUsageService& fake;
   };
 
+  std::vector<std::shared_ptr<std::latch>> held_;
   std::vector<std::jthread> replies_;  // ended before the rest goes
 };
 

@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <cerrno>
 #include <new>
-#include <unordered_map>
 #include <vector>
 
 #include "platform/linux/base/host_notes.h"
@@ -74,7 +73,7 @@ bool LinuxPreferences::isWritable(const Change& change, std::string_view name) {
 
 PlistDictionary LinuxPreferences::changed(PlistDictionary values, std::span<const Change> changes) {
   // The last change of a key decides; all removals at once, since each costs a pass over the domain.
-  std::unordered_map<std::string_view, const PlistValue*> last;
+  std::map<std::string_view, const PlistValue*> last;
   for (const Change& change : changes) last[change.key] = &change.value;
   values.removeIf([&last](std::string_view key) {
     const auto found = last.find(key);

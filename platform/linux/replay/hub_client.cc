@@ -12,7 +12,7 @@
 
 #include "platform/byte_reader.h"
 #include "platform/byte_writer.h"
-#include "platform/identifier_hash.h"
+#include "platform/keyed_hash.h"
 #include "platform/linux/base/file_io.h"
 #include "platform/linux/replay/recorded_client.h"
 
@@ -42,10 +42,7 @@ struct ChannelKey {
 };
 
 struct ChannelKeyHash {
-  std::size_t operator()(const ChannelKey& key) const { return identifierHash(key.driver, key.channel); }
-
- private:
-  IdentifierHash identifierHash;
+  std::size_t operator()(const ChannelKey& key) const { return KeyedHash::of(key.driver, key.channel); }
 };
 
 std::uint64_t integerOrZero(const PlistDictionary& dictionary, std::string_view key) {

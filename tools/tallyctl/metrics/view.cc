@@ -4,7 +4,7 @@
 #include <array>
 #include <cmath>
 #include <cstdio>
-#include <unordered_map>
+#include <map>
 
 #include "platform/calendar.h"
 
@@ -237,7 +237,7 @@ std::string wholeName(const ChannelValues& channel) {
 }
 
 std::string valuesLine(PlistDate time, const std::vector<ChannelValues>& channels) {
-  std::unordered_map<std::string, std::size_t> uses;
+  std::map<std::string, std::size_t> uses;
   for (const ChannelValues& channel : channels) ++uses[nameOf(channel)];
   std::string line = stampText(time, 3);
   for (const ChannelValues& channel : channels) {
