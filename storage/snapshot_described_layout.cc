@@ -27,6 +27,7 @@ constexpr std::size_t kFormatOffset = 12;
 constexpr std::size_t kFieldSize = 28;
 
 constexpr std::size_t kMostFieldsReadOnce = 512;
+constexpr std::uint64_t kMostFieldsReadAgain = std::uint64_t{1} << 28;  // of all records together
 constexpr std::uint32_t kFirstVersionWithTitle = 6;
 constexpr std::size_t kTripleSize = kPriorityTripleWords * sizeof(std::uint32_t);
 
@@ -131,6 +132,7 @@ class Fields {
       renderField(out, record, header_.field(i));
   }
   std::size_t count() const { return count_; }
+  std::uint64_t readAgain() const { return count_ - readOnce(); }
 
  private:
   std::size_t readOnce() const { return std::min(count_, fields_.size()); }
@@ -140,14 +142,15 @@ class Fields {
   std::array<Field, kMostFieldsReadOnce> fields_;
 };
 
-// True when the last slot was reached, false when a record did not fit. `kept` becomes the length up to the
-// last complete line.
+// True when the last slot was reached, false when a record did not fit or there is too much to read. `kept`
+// becomes the length up to the last complete line.
 bool renderRecords(SnapshotText& out, std::span<const std::byte> records, const SnapshotHeader& header,
                    std::uint32_t& cursor, std::size_t& kept) {
   const Fields fields(header);
   const std::uint32_t lastSlot = std::max(header.slots(), 1U) - 1;
   const std::size_t stride = header.recordSize();
   const std::size_t whole = stride == 0 || fields.count() == 0 ? 0 : records.size() / stride;
+  if (fields.readAgain() * std::min<std::uint64_t>(lastSlot, whole) > kMostFieldsReadAgain) return false;
   while (cursor < std::min<std::size_t>(lastSlot, whole)) {
     const auto record = records.subspan(cursor++ * stride);
     if (fields.isEmpty(record)) continue;

@@ -142,6 +142,12 @@ TEST(SnapshotDescribedLayout, RendersWhatLiesInsideOfAnUntrustedHeader) {
     EXPECT_EQ(rendering.size, text.size() + 1);
     EXPECT_EQ(rendering.cursor, cursor);
   }
+  Bytes many;
+  many.resize(1 << 20);
+  const Bytes endless = header(6, 1, huge, std::vector<Field>(1100, {7, 0, 0, ""}));
+  const Rendering refused(many, 100, &endless);
+  EXPECT_FALSE(refused.result);
+  EXPECT_EQ(refused.text + std::to_string(refused.size + refused.cursor), "1");
   const Bytes none;
   const Rendering missing(kFourSlots, 5, &none);
   EXPECT_FALSE(missing.result);
