@@ -10,9 +10,9 @@
 
 namespace tbdaily {
 
-// Multiplies the halves of words with numbers that each process draws anew: which keys meet in a table cannot be
-// known beforehand, and any two meet no more often than by chance. Of the answer, each bit is as good as the
-// others. The same for equal keys throughout a process, and from any thread.
+// Multiplies the halves of words with numbers that each process draws anew: which keys meet in a table cannot
+// be known beforehand, and any two meet no more often than by chance. Of the answer, each bit is as good as
+// the others. The same for equal keys throughout a process, and from any thread.
 class KeyedHash {
  public:
   static std::uint32_t of(std::uint64_t first, std::uint64_t second) {

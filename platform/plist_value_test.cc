@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <array>
 #include <set>
 
 #include "platform/keyed_hash.h"
@@ -66,6 +68,15 @@ TEST(KeyedHash, TellsAlikeKeysApart) {
     EXPECT_EQ(KeyedHash::of(key), KeyedHash::of(std::string(length, '\0')));
   }
   EXPECT_GT(hashes.size(), keys - 50);
+}
+
+TEST(KeyedHash, SpreadsIdentifiersWhoeverChoseThem) {
+  // Multiples that meet in one place where identifiers are spread by the usual multiplication, by 2^64 over
+  // the golden ratio: they are of its inverse.
+  constexpr std::uint64_t kInverse = 0xF1DE83E19937733D;
+  std::array<int, 4096> places{};
+  for (std::uint64_t i = 1; i <= places.size(); ++i) ++places[KeyedHash::of(0, i * kInverse) % places.size()];
+  EXPECT_LT(*std::ranges::max_element(places), 20);
 }
 
 }  // namespace
