@@ -12,6 +12,9 @@ from harness import BIN, TODAY, YESTERDAY, DeviceTest
 VALUE = {"text": "ä<&>\"", "int": -2 ** 63, "big": 2 ** 63 - 1, "real": 2.5, "inf": float("inf"), "yes": True,
          "date": datetime.datetime(2026, 2, 28, 23, 59, 59), "data": bytes(range(256)), "list": [1, [], {}]}
 
+HOSTILE = "n\x1b[31m\x9b2J\x7f\u202e\r\n<0>forged"
+CONTROLS = {chr(c) for c in (*range(32), *range(0x7f, 0xa0), 0x202e)} - {"\n", "\t"}
+
 
 class Companion(DeviceTest):
     def test_help_and_wrong_usage(self):
@@ -104,6 +107,54 @@ class Companion(DeviceTest):
         self.assertIn("std. dev.", text)
         self.assertRegex(text, r"\n    \(90, inf\) +\d+  #+\n")
         self.assertIn("no daily report", device.tally("report", "-", stdin="<plist><string/></plist>", status=1))
+
+    def test_nothing_from_outside_drives_the_terminal_or_forges_a_line(self):
+        device = self.device(sample=True)
+
+        def write(place, value):
+            return str(device.write(place, plistlib.dumps(value, fmt=plistlib.FMT_BINARY)))
+
+        report = write("r", {"TBCrashLogVersion": 1, "TBStartDate": datetime.datetime(2026, 11, 23), "TBTaskID": HOSTILE,
+                             "TBMetadata": {HOSTILE: HOSTILE}, "TBScalars": {HOSTILE: 1},
+                             "TBDistributionsHistogram": {HOSTILE: {HOSTILE: 1}}})
+        value = write("v", {HOSTILE.replace("\x1b", ""): [HOSTILE.replace("\x1b", "")]})
+        device.write("Library/Application Support/Tallybook/Whitelist_Nimbos.plist", plistlib.dumps(
+            {HOSTILE: {"ScalarKeys": {HOSTILE: {}}, HOSTILE: 1}}, fmt=plistlib.FMT_BINARY))
+        write("var/mobile/Library/Preferences/com.velmora.tallyd.tbdaily.plist", {
+            "TaskingID": HOSTILE, "TaskingOS": HOSTILE, "TaskingDigest": HOSTILE,
+            "TaskingPayload": [{"Domain": "d", "Key": HOSTILE, "Value": HOSTILE}]})
+        registry = plistlib.loads(device.path("System/Device/registry.plist").read_bytes())
+        publishing = [e for e in registry["entries"] if "KdReportLegend" in e.get("properties", {})]
+        publishing[0]["name"] = HOSTILE
+        for group in publishing[1]["properties"]["KdReportLegend"]:
+            group["KdReportGroupName"] = HOSTILE
+            for channel in group["KdReportChannels"]:
+                channel[2:] = [HOSTILE]
+        publishing[2] |= {"name": HOSTILE, "properties": {"KdReportLegendPublic": True, "KdReportLegend": 1}}
+        write("System/Device/registry.plist", registry)
+        write("var/mobile/Library/Preferences/com.velmora.sysmetrics.tbdaily.plist", {
+            "netUsageBaseline": {HOSTILE: [datetime.datetime(2026, 11, 23), 1, 2, 3, 4]}})
+        write("var/mobile/Library/Preferences/com.velmora.Crashferry.plist", {"ScheduledTasking": {"TaskingID": HOSTILE}})
+        for words, status in (
+                (("report", report), 0), (("plist", value), 0), (("whitelist", "check", HOSTILE), 0),
+                (("tasking", "show"), 0), (("usage", "show"), 0), (("metrics", "list"), 0), (("metrics", "sample"), 0),
+                (("metrics", "watch", "--interval", "1", "--count", "1"), 0), (("metrics", "list", "--describe"), 0),
+                (("metrics", "list", "--driver", HOSTILE), 0), (("stats", HOSTILE), 1), ((HOSTILE,), 2),
+                (("record", "scalar", "k", HOSTILE), 2), (("metrics", "list", "--" + HOSTILE), 2),
+                (("nand", "--explain", HOSTILE), 1), (("wait", HOSTILE), 2), (("record", "import", HOSTILE), 1)):
+            for json_flag in ((),) if "--describe" in words else ((), ("--json",)):
+                with self.subTest(words=words, json=json_flag):
+                    result = subprocess.run([BIN / "tallyctl", *json_flag, *words], env=device.env, timeout=60,
+                                            capture_output=True)
+                    self.assertEqual(result.returncode, status, result.stderr)
+                    text = (result.stdout + result.stderr).decode()
+                    self.assertEqual([c for c in text if c in CONTROLS], [])
+                    self.assertIn("forged", text)
+                    if "--describe" not in words:  # of whose lines nobody knows which are the library's
+                        self.assertNotRegex(text, "(?m)^<0>forged")
+        self.assertEqual(plistlib.loads(device.tally("plist", value).encode()),
+                         {HOSTILE.replace("\x1b", ""): [HOSTILE.replace("\x1b", "")]})
+        self.assertIn(r"n\x1b[31m\x9b2J\x7f\u202e\x0d\x0a<0>forged", device.tally("report", report))
 
     def test_app_records_and_waiting(self):
         device = self.device()

@@ -1,6 +1,5 @@
 #include "tools/tallyctl/tool.h"
 
-#include <cstdio>
 #include <cstdlib>
 
 #include "platform/linux/base/host_notes.h"
@@ -38,7 +37,7 @@ bool Tool::printedAsJson(const std::function<void(JsonWriter& json)>& write) {
   if (!options.json) return false;
   JsonWriter json(JsonLayout::Indented);
   write(json);
-  out_.line(json.take());
+  out_.line(ShownText::lines(json.take()));
   return true;
 }
 
@@ -51,7 +50,7 @@ std::optional<DayNumber> Tool::dayOf(const std::string& text) {
 }
 
 void Tool::fail(std::string_view reason, int status) {
-  std::fprintf(stderr, "tallyctl: %.*s\n", static_cast<int>(reason.size()), reason.data());
+  printError(reason);
   exitStatus = status;
 }
 

@@ -113,7 +113,7 @@ void renderFixed(Tool& tool, const std::vector<std::byte>& records) {
   std::size_t size = text.size();
   if (!STXParseSnapshotBuffer(records, text.data(), size))
     return tool.fail("the snapshots do not fit the renderer's buffer");
-  tool.out().print({text.data(), size});
+  tool.out().print(ShownText::lines({text.data(), size}));
 }
 
 void renderDescribed(Tool& tool, const std::vector<std::byte>& records,
@@ -124,7 +124,7 @@ void renderDescribed(Tool& tool, const std::vector<std::byte>& records,
     const std::uint32_t before = cursor;
     std::size_t size = text.size();
     const bool finished = STXParseSnapshotBufferWithInplaceParser(records, text.data(), size, header, cursor);
-    tool.out().print({text.data(), size > 0 ? size - 1 : 0});
+    tool.out().print(ShownText::lines({text.data(), size > 0 ? size - 1 : 0}));
     if (finished) return;
     if (cursor == before) return tool.fail("the snapshot header cannot be used");
     // The record that did not fit was passed: it comes first in the next piece.

@@ -35,7 +35,7 @@ void printGrouped(Terminal& out, const PlistDictionary& info) {
       if (groupOf(key) != group) continue;
       const NandGlossaryRow* row = findNandGlossary(key);
       const auto number = value.asNumber();
-      table.add({printable(key), printable(plistText(value)),
+      table.add({key, plistText(value),
                  row != nullptr && number ? humanNandFigure(row->unit, number->toInt64()) : ""});
     }
     table.print(out);

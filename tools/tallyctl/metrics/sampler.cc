@@ -37,7 +37,7 @@ std::string_view whatIsMissing(DriverRegistry& registry) {
 void failMetrics(Tool& tool, std::string_view what, const std::optional<ReportError>& error) {
   std::string line(what);
   if (error) {
-    if (KdReportErrorHasReason(*error)) line += ": " + printable(error->reason);
+    if (KdReportErrorHasReason(*error)) line += ": " + error->reason;
     line += " (" + statusText(error->code) + ")";
     // What the library answers where the registry or the hub itself is not there.
     if (error->code == kKdNotFound || error->code == kKdNoMemory)
