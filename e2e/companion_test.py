@@ -3,11 +3,12 @@
 import base64
 import datetime
 import json
+import os
 import plistlib
 import subprocess
 import unittest
 
-from harness import BIN, TODAY, YESTERDAY, DeviceTest
+from harness import BIN, JOB, TODAY, YESTERDAY, DeviceTest
 
 VALUE = {"text": "ä<&>\"", "int": -2 ** 63, "big": 2 ** 63 - 1, "real": 2.5, "inf": float("inf"), "yes": True,
          "date": datetime.datetime(2026, 2, 28, 23, 59, 59), "data": bytes(range(256)), "list": [1, [], {}]}
@@ -107,6 +108,53 @@ class Companion(DeviceTest):
         self.assertIn("std. dev.", text)
         self.assertRegex(text, r"\n    \(90, inf\) +\d+  #+\n")
         self.assertIn("no daily report", device.tally("report", "-", stdin="<plist><string/></plist>", status=1))
+
+    def test_what_cannot_be_read_is_no_answer(self):
+        preferences, spool = "var/mobile/Library/Preferences/", "var/mobile/Library/Logs/"
+        device = self.device(sample=True)
+        for place, reason, commands in (
+                (preferences + "com.velmora.Crashferry.plist", "not a regular file", ("tasking show",)),
+                (preferences + JOB + ".plist", "not a regular file", ("tasking show",)),
+                (preferences + "com.velmora.sysmetrics.tbdaily.plist", "not a regular file", ("usage show",)),
+                (preferences + "com.velmora.da.plist", "not a regular file", ("whitelist check", "report --preview")),
+                ("System/Device/usage.plist", "not a regular file", ("usage show",)),
+                ("System/Device/registry.plist", "not a regular file", (
+                    "metrics list", "metrics sample", "nand", "wear", "stats", "snapshots", "buffer stats -o x")),
+                ("System/Device/hub.plist", "not a regular file", ("metrics sample", "metrics watch --interval 1")),
+                ("Library/Application Support/Tallybook/Whitelist_Nimbos.plist", "not a regular file",
+                 ("whitelist check", "report --preview")),
+                (spool + "Pending", "not a directory", ("report",)),
+                (spool + "Withheld", "not a directory", ("report",))):
+            there = device.path(place)
+            aside = device.base / "aside"
+            if there.exists():
+                there.rename(aside)
+            for words in commands:
+                for json_flag in ((), ("--json",)):
+                    with self.subTest(place=place, words=words, json=json_flag):
+                        there.parent.mkdir(parents=True, exist_ok=True)
+                        os.mkfifo(there)
+                        said = device.tally(*json_flag, *words.split(), status=1)
+                        self.assertIn(str(there), said)
+                        self.assertIn(reason, said)
+                        self.assertEqual(len(said.splitlines()), 1)
+                        there.unlink()
+            if aside.exists():
+                aside.rename(there)
+        device.write("System/Device/registry.plist", b"<plist>")  # damaged is not missing either
+        self.assertIn("registry.plist is ignored", device.tally("metrics", "list", status=1))
+        missing = str(device.base / "missing")
+        for words in ("tasking show", "usage show", "report", "metrics list", "whitelist check", "nand", "stats", "snapshots"):
+            for json_flag in ((), ("--json",)):
+                self.assertIn(missing, device.tally("--root", missing, *json_flag, *words.split(), status=1))
+
+    def test_what_is_something_else_is_no_answer(self):
+        device = self.device()
+        answers = str(device.record("answers", {"InternalBuild": True}))
+        for json_flag in ((), ("--json",)):
+            self.assertIn("cannot be had", device.tally(*json_flag, "nand", status=1))
+            self.assertIn("no statistics buffer", device.tally(*json_flag, "stats", "/etc/passwd", status=1))
+            self.assertIn("no daily report", device.tally(*json_flag, "report", answers, status=1))
 
     def test_nothing_from_outside_drives_the_terminal_or_forges_a_line(self):
         device = self.device(sample=True)

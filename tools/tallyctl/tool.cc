@@ -29,6 +29,12 @@ bool Tool::hasUsableRoot() {
   return false;
 }
 
+bool Tool::hasReadAll() {
+  if (!platform().host().files().hasUnread()) return true;
+  exitStatus = kFailed;
+  return false;
+}
+
 bool Tool::printedAsJson(const PlistValue& value) {
   return printedAsJson([&value](JsonWriter& json) { json.add(value); });
 }

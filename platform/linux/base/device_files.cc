@@ -243,6 +243,11 @@ int DeviceFiles::openJudged(std::string_view path, const Judge& judge, FileDescr
   return error;
 }
 
+void DeviceFiles::noteUnread(const std::string& line) const {
+  hasUnread_ = true;
+  noteOnce(line);
+}
+
 void DeviceFiles::rememberToSync(const std::string& path, bool isFolder) const {
   const std::lock_guard lock(mutex_);
   (isFolder ? touchedFolders_ : touchedFiles_).insert(path);

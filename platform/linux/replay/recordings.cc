@@ -16,7 +16,8 @@ PlistValue Recordings::load(std::string_view file) {
   CachedPlistFile& loaded = found->second;
   loaded.refresh(host_.files(), path(file), codec_);
   if (loaded.state() == State::Damaged || loaded.state() == State::Unreadable)
-    noteOnce("recording " + host_.files().place(path(file)).native() + " is ignored: " + loaded.fault());
+    host_.files().noteUnread("recording " + host_.files().place(path(file)).native() +
+                             " is ignored: " + loaded.fault());
   return loaded.root();
 }
 
@@ -24,8 +25,8 @@ bool Recordings::readFile(std::string_view file, FileContents& contents) {
   // What a recording names comes from outside: it leads nowhere else, by its name or through a link.
   const int error = host_.files().readFileBelow(recording::kFolder, file, contents);
   if (error != 0)
-    noteOnce("recorded file " + host_.files().place(path(file)).native() +
-             " is ignored: " + errorText(error));
+    host_.files().noteUnread("recorded file " + host_.files().place(path(file)).native() +
+                             " is ignored: " + errorText(error));
   return error == 0;
 }
 

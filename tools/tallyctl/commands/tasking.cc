@@ -111,7 +111,9 @@ void print(Terminal& out, const TaskingState& state) {
 }
 
 void show(Tool& tool) {
+  if (!tool.hasUsableRoot()) return;
   const TaskingState state(tool.platform().services());
+  if (!tool.hasReadAll()) return;
   if (!tool.printedAsJson([&state](JsonWriter& json) { writeState(json, state); })) print(tool.out(), state);
 }
 

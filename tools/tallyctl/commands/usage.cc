@@ -42,6 +42,7 @@ void printAdds(Terminal& out, const PlistDictionary& adds) {
 }
 
 void show(Tool& tool) {
+  if (!tool.hasUsableRoot()) return;
   Platform& platform = tool.platform().services();
   Recordings recordings(tool.platform().host(), platform.propertyListCodec);
   const PlistValue stored = platform.preferences.ownValue(kUsageBaselineKey);
@@ -53,6 +54,7 @@ void show(Tool& tool) {
                                   static_cast<std::uint64_t>(n);
                  adds.set(key, PlistValue::int64(static_cast<std::int64_t>(sum)));
                });
+  if (!tool.hasReadAll()) return;
   const PlistDictionary baseline = stored.mutableDictionary();
   if (tool.printedAsJson(PlistValue::dictionary(
           {{"baseline", PlistValue::dictionary(baseline)}, {"adds", PlistValue::dictionary(adds)}}))) {
