@@ -156,6 +156,31 @@ class Companion(DeviceTest):
             self.assertIn("no statistics buffer", device.tally(*json_flag, "stats", "/etc/passwd", status=1))
             self.assertIn("no daily report", device.tally(*json_flag, "report", answers, status=1))
 
+    def test_files_are_regular_and_of_a_limited_size(self):
+        device = self.device()
+        fifo, sparse = str(device.base / "fifo"), str(device.base / "sparse")
+        os.mkfifo(fifo)
+        with open(sparse, "wb") as file:
+            file.truncate(2 ** 42)
+        words = ("stats", "snapshots --records", "plist", "report", "tasking schedule", "send app-info", "record import")
+        for command in words:
+            for place, reason in ((fifo, "not a regular file"), ("/dev/zero", "not a regular file"),
+                                  (str(device.base), "not a regular file"), (sparse, "larger than|longer than")):
+                with self.subTest(command=command, place=place):
+                    self.assertRegex(device.tally(*command.split(), place, status=1), reason)
+        newest = device.path("var/mobile/Library/Logs/Pending/log-tallyd-2026-11-24-090704.193")
+        newest.parent.mkdir(parents=True)
+        for place, reason in ((fifo, "not a regular file"), (sparse, "larger than 256 MiB")):
+            os.rename(place, newest)
+            self.assertIn(f"{newest}: it is {reason}", device.tally("report", status=1))
+            newest.unlink()
+        for command in words[:1] + words[2:]:
+            with open("/dev/zero", "rb") as zeros, self.subTest(command=command):
+                result = subprocess.run([BIN / "tallyctl", *command.split(), "-"], env=device.env, stdin=zeros,
+                                        capture_output=True, timeout=60)
+                self.assertEqual(result.returncode, 1)
+                self.assertRegex(result.stderr, b"larger than|longer than")
+
     def test_nothing_from_outside_drives_the_terminal_or_forges_a_line(self):
         device = self.device(sample=True)
 

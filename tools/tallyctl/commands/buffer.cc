@@ -17,7 +17,7 @@ namespace {
 // From the file when one is named, else from the controller; says why not, and answers nothing then.
 std::optional<std::vector<std::byte>> bufferOf(Tool& tool, const std::string& file, std::string_view kind) {
   if (!file.empty()) {
-    auto input = readInput(file);
+    auto input = readInput(file, kLargestBufferInput);
     if (input) return std::move(*input);
     tool.fail(input.reason());
     return std::nullopt;

@@ -119,8 +119,8 @@ void showNewest(Tool& tool) {
   }
   FileContents contents;
   const std::string shown = files.place(*path).native();
-  if (const int error = files.readFile(*path, contents); error != 0)
-    return tool.fail(shown + ": " + errorText(error));
+  if (const int error = files.readFile(*path, contents, kLargestPlistInput); error != 0)
+    return tool.fail(inputFailure(shown, error, kLargestPlistInput).reason);
   const PlistParseResult report = tool.platform().services().propertyListCodec.parse(contents.bytes);
   report.error.empty() ? show(tool, report.value) : tool.fail(shown + ": " + report.error);
 }
