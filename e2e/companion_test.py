@@ -157,7 +157,7 @@ class Companion(DeviceTest):
             self.assertIn("no daily report", device.tally(*json_flag, "report", answers, status=1))
 
     def test_files_are_regular_and_of_a_limited_size(self):
-        device = self.device()
+        device = self.device(sample=True)
         fifo, sparse = str(device.base / "fifo"), str(device.base / "sparse")
         os.mkfifo(fifo)
         with open(sparse, "wb") as file:
@@ -169,7 +169,8 @@ class Companion(DeviceTest):
                 with self.subTest(command=command, place=place):
                     self.assertRegex(device.tally(*command.split(), place, status=1), reason)
         newest = device.path("var/mobile/Library/Logs/Pending/log-tallyd-2026-11-24-090704.193")
-        newest.parent.mkdir(parents=True)
+        newest.parent.mkdir(parents=True, exist_ok=True)
+        self.assertIn("nobody reads it", device.tally("buffer", "stats", "-o", fifo, status=1))
         for place, reason in ((fifo, "not a regular file"), (sparse, "larger than 256 MiB")):
             os.rename(place, newest)
             self.assertIn(f"{newest}: it is {reason}", device.tally("report", status=1))
