@@ -5,11 +5,8 @@
 #include <malloc.h>
 
 #include <algorithm>
-#include <array>
 
-#include "drivermetrics/channel_collection.h"
-#include "drivermetrics/raw_elements.h"
-#include "testing/fake_drivers.h"
+#include "drivermetrics/kd_report_test_support.h"
 
 namespace tbdaily {
 
@@ -18,7 +15,7 @@ namespace {
 
 constexpr std::int64_t kFirst = 1'000, kLast = 64'000;
 constexpr std::int64_t kChannelsOfADriver = 100;
-constexpr ChannelType kSimpleType{std::uint64_t{1} << 32 | kKdReportSimple};
+constexpr ChannelType kSimpleType = fakes::channelType(kKdReportSimple);
 
 // Freed memory stays with the process, as it does in one that samples again and again beside other work: what
 // the kernel takes for handing out fresh pages is no cost of a channel.
@@ -31,24 +28,14 @@ std::int64_t driverOf(std::int64_t channel) {
 
 // Discovered as in a daily run: drivers with a legend of one group each.
 KdReportCollection channelsOf(std::int64_t count) {
-  testing::FakeDriverRegistry registry;
+  fakes::FakeDriverRegistry registry;
   for (std::int64_t i = 0; i < count; i += kChannelsOfADriver) {
     PlistArray entries;
-    for (std::int64_t k = i; k < std::min(i + kChannelsOfADriver, count); ++k) {
-      entries.push_back(PlistValue::array({PlistValue::int64(k),
-                                           PlistValue::int64(static_cast<std::int64_t>(kSimpleType.bits)),
-                                           PlistValue::string("Channel " + std::to_string(k))}));
-    }
-    const PlistDictionary group{{"KdReportGroupName", PlistValue::string("Group")},
-                                {"KdReportChannelInfo", KdReportCreateUnitInfo(0)},
-                                {"KdReportChannels", PlistValue::array(std::move(entries))}};
-    registry.drivers.push_back(
-        {.identifier = static_cast<std::uint64_t>(driverOf(i)),
-         .name = "Driver",
-         .serviceClass = "Driver",
-         .properties = {{"KdReportLegendPublic", PlistValue::boolean(true)},
-                        {"KdReportLegend", PlistValue::array({PlistValue::dictionary(group)})}},
-         .parent = {}});
+    for (std::int64_t k = i; k < std::min(i + kChannelsOfADriver, count); ++k)
+      entries.push_back(fakes::legendEntry(k, kSimpleType, "Channel " + std::to_string(k)));
+    registry.drivers.push_back(fakes::publishingDriver(
+        static_cast<std::uint64_t>(driverOf(i)), "Driver",
+        {fakes::legendGroup("Group", {}, KdReportCreateUnitInfo(0), std::move(entries))}));
   }
   return KdReportCopyAllChannels(registry, kKdReportFileByDriver | kKdReportFileByGroup);
 }
@@ -56,13 +43,8 @@ KdReportCollection channelsOf(std::int64_t count) {
 PlistData bufferOf(std::int64_t count) {
   PlistData bytes;
   bytes.reserve(static_cast<std::size_t>(count) * kElementSize);
-  for (std::int64_t i = 0; i < count; ++i) {
-    for (const std::uint64_t word :
-         std::array<std::uint64_t, 8>{static_cast<std::uint64_t>(driverOf(i)), static_cast<std::uint64_t>(i),
-                                      kSimpleType.bits, 1, static_cast<std::uint64_t>(i), 0, 0, 0}) {
-      for (unsigned shift = 0; shift < 64; shift += 8) bytes.push_back(static_cast<std::byte>(word >> shift));
-    }
-  }
+  for (std::int64_t i = 0; i < count; ++i)
+    fakes::appendElement(bytes, driverOf(i), i, kSimpleType, {.stamp = 1, .words = {i}});
   return bytes;
 }
 

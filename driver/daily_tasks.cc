@@ -47,7 +47,7 @@ void RunDailyTasks(Platform& platform, DayNumber day, const PlistValue& appInfo)
   const std::unique_ptr<HeldRunLock> lock = platform.runLock.acquire(kPatience);
   if (lock == nullptr) return;
   runTasks(platform, day, appInfo);
-  platform.fileSystem.makeDurable();
+  runStep(platform, "the way to storage", [&] { platform.fileSystem.makeDurable(); });
 }
 
 void RunDailyTasksIfNewDay(Platform& platform, const PlistValue& appInfo) {
@@ -60,10 +60,12 @@ void RunDailyTasksIfNewDay(Platform& platform, const PlistValue& appInfo) {
     return;
   }
   runTasks(platform, yesterday, appInfo);
-  // A day counts as done when all that it wrote would outlive a power cut.
-  if (!platform.fileSystem.makeDurable()) return;
-  preferences.setValue(kLastProcessedDay, PlistValue::int32(yesterday), preference_domain::kJob);
-  preferences.synchronize(preference_domain::kJob);
+  runStep(platform, "the record of the day", [&] {
+    // A day counts as done when all that it wrote would outlive a power cut.
+    if (!platform.fileSystem.makeDurable()) return;
+    preferences.setValue(kLastProcessedDay, PlistValue::int32(yesterday), preference_domain::kJob);
+    preferences.synchronize(preference_domain::kJob);
+  });
 }
 
 }  // namespace tbdaily

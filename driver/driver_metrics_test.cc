@@ -2,41 +2,33 @@
 
 #include <gmock/gmock.h>
 
-#include "drivermetrics/metrics_test_support.h"
+#include "drivermetrics/kd_report_test_support.h"
 #include "testing/fake_platform.h"
-#include "testing/json_test_support.h"
-#include "testing/scripted_hub.h"
 
 namespace tbdaily {
 namespace {
 
+using namespace kdreport::fakes;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-// The identifier, type and perhaps name of each channel.
-testing::ScriptedDriver driverWith(std::uint64_t identifier, const std::string& channels) {
-  return {
-      .identifier = identifier,
-      .name = "Driver",
-      .serviceClass = "Driver",
-      .properties = testing::dictionaryOf(
-          R"({"KdReportLegendPublic": true, "KdReportLegend": [{"KdReportChannels": )" + channels + "}]}"),
-      .parent = {}};
+ScriptedDriver driverWith(std::uint64_t identifier, PlistArray channels) {
+  return publishingDriver(identifier, "Driver", {legendGroup({}, {}, {}, std::move(channels))});
 }
 
 TEST(DriverMetrics, SimpleChannelsOfTheDailyCategoryBecomeScalars) {
   testing::FakePlatform fake;
-  testing::ScriptedHub hub(fake.driverRegistry);
-  // One element each: simple ones of the daily category, a state of it, and a simple one of another category.
+  ScriptedHub hub(fake.driverRegistry);
+  const kdreport::ChannelType daily = channelType(1, 1, 0x100);
   fake.driverRegistry.drivers.push_back(
-      driverWith(10, R"([[1, 4311744513, "Temp"], [2, 4311744514, "State"], [3, 4328521729, "Other category"],
-              [4, 4311744513], [4411221, 4311744513]])"));
+      driverWith(10, {legendEntry(1, daily, "Temp"), legendEntry(2, channelType(2, 1, 0x100), "State"),
+                      legendEntry(3, channelType(1, 1, 0x200), "Other category"), legendEntry(4, daily),
+                      legendEntry(0x434F55, daily)}));
   fake.driverRegistry.drivers.push_back(
-      driverWith(11, R"([[1, 4311744513, "Temp"], [2, 4311744513, "Missing"]])"));
+      driverWith(11, {legendEntry(1, daily, "Temp"), legendEntry(2, daily, "Missing")}));
   for (const auto& [driver, channel, value] :
        {std::tuple{10, 1, 42}, {10, 4, 1}, {10, 0x434F55, -7}, {11, 1, 43}})
-    kdreport::testing::appendElement(hub.buffer, driver, channel, kdreport::testing::channelType(1, 1, 0x100),
-                                     {1, {value}});
+    appendElement(hub.buffer, driver, channel, daily, {1, {value}});
 
   CollectDriverMetricScalars(fake.platform);
   EXPECT_THAT(fake.analyticsClient.calls,

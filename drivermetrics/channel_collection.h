@@ -14,6 +14,7 @@ template <typename T>
 class CollectionField {
  public:
   bool isAbsent() const { return !value_ && !isForeign_; }
+  bool isForeign() const { return isForeign_; }
   T* get() { return value_ ? &*value_ : nullptr; }  // null when absent or of another kind
   const T* get() const { return value_ ? &*value_ : nullptr; }
 

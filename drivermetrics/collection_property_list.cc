@@ -60,28 +60,41 @@ KdReportChannel channelOfPlist(const PlistValue& value) {
   return channel;
 }
 
+// In the place of what is malformed, whatever it was: it fails the walks that meet it, written and read back
+// too.
+PlistValue malformed() {
+  return PlistValue::boolean(false);
+}
+
 PlistValue plistOfCollection(const ChannelCollection& collection);
 
-PlistValue plistOfNested(const SubCollections& nested) {
+PlistValue plistOf(const SubCollections& nested) {
   PlistDictionary entries;
   for (const auto& [name, collection] : nested)
-    entries.set(name, collection != nullptr ? plistOfCollection(*collection) : PlistValue());
+    entries.set(name, collection != nullptr ? plistOfCollection(*collection) : malformed());
   return PlistValue::dictionary(std::move(entries));
+}
+
+PlistValue plistOf(const std::vector<KdReportChannel>& channels) {
+  PlistArray records;
+  records.reserve(channels.size());
+  for (const KdReportChannel& channel : channels)
+    records.push_back(channel != nullptr ? plistOfChannel(*channel) : malformed());
+  return PlistValue::array(std::move(records));
+}
+
+template <typename T>
+PlistValue plistOf(const CollectionField<T>& field) {
+  if (field.isForeign()) return malformed();
+  return field.get() != nullptr ? plistOf(*field.get()) : PlistValue();
 }
 
 PlistValue plistOfCollection(const ChannelCollection& collection) {
   PlistDictionary entries;
   entries.set(kQueryOptions, collection.queryOptions);
-  if (const auto* channels = collection.channels.get()) {
-    PlistArray records;
-    records.reserve(channels->size());
-    for (const KdReportChannel& channel : *channels)
-      records.push_back(channel != nullptr ? plistOfChannel(*channel) : PlistValue::boolean(false));
-    entries.set(kChannels, PlistValue::array(std::move(records)));
-  }
-  if (const auto* drivers = collection.drivers.get()) entries.set(kDrivers, plistOfNested(*drivers));
-  if (const auto* groups = collection.channelGroups.get())
-    entries.set(kChannelGroups, plistOfNested(*groups));
+  entries.set(kChannels, plistOf(collection.channels));
+  entries.set(kDrivers, plistOf(collection.drivers));
+  entries.set(kChannelGroups, plistOf(collection.channelGroups));
   return PlistValue::dictionary(std::move(entries));
 }
 

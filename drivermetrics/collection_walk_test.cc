@@ -1,29 +1,10 @@
 #include <gmock/gmock.h>
 
-#include <cstdlib>
-#include <new>
 #include <random>
 #include <stdexcept>
 
 #include "drivermetrics/metrics_test_support.h"
-
-namespace {
-thread_local std::size_t allocations = 0;
-}
-
-// Counts what this program takes from the heap.
-[[gnu::noinline]] void* operator new(std::size_t size) {
-  ++allocations;
-  void* memory = std::malloc(size);
-  if (memory == nullptr) throw std::bad_alloc();
-  return memory;
-}
-[[gnu::noinline]] void operator delete(void* memory) noexcept {
-  std::free(memory);
-}
-[[gnu::noinline]] void operator delete(void* memory, std::size_t) noexcept {
-  std::free(memory);
-}
+#include "testing/allocations.h"
 
 namespace kdreport {
 namespace {
@@ -125,10 +106,10 @@ TEST(CollectionWalk, TakesNothingFromTheHeapForAChannel) {
   RandomChannels random;
   const KdReportCollection filed = collectionOf(random.make(100), 3);
   const KdReportVisitor keepAll = [](ChannelRecord&) -> std::uint32_t { return kKdReportKeep; };
-  const std::size_t before = allocations;
+  const std::size_t before = tbdaily::testing::allocations();
   KdReportIterate(filed.get(), keepAll);
   KdReportPrune(filed.get(), keepAll);
-  EXPECT_EQ(allocations, before);
+  EXPECT_EQ(tbdaily::testing::allocations(), before);
 }
 
 TEST(CollectionWalk, PairsChannelsInTheirOrder) {
@@ -239,6 +220,9 @@ TEST(CollectionWalk, FailsOnMalformedCollections) {
          {number, PlistValue::array({number}), PlistValue::dictionary({{"G", number}})}) {
       const KdReportCollection bad = with(key, value);
       EXPECT_EQ(KdReportGetChannelCount(bad.get()), kKdReportNoIndex) << key;
+      const KdReportCollection again =
+          KdReportCreateAggregateFromPropertyList(KdReportCopyPropertyList(bad.get()));
+      EXPECT_EQ(KdReportGetChannelCount(again.get()), kKdReportNoIndex) << key;
       EXPECT_EQ(KdReportPrune(bad.get(), [](ChannelRecord&) { return 0U; }), kKdReportWalkFailed);
       EXPECT_EQ(cloneAggregate(bad.get(), [](const auto&, auto&) { return 0U; }), nullptr);
       EXPECT_EQ(KdReportCreateSamplesDelta(good.get(), bad.get()), nullptr);

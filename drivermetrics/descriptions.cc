@@ -24,7 +24,7 @@ std::string objectText(const std::optional<std::string_view>& text) {
 struct Line {
   const ChannelRecord& channel;
   std::string prefix, name, unitLabel;
-  // Of state channels: all states have names, or none has.
+  // Of state channels: without a kept list of names, asking for one would look at all states again.
   bool hasStateNames = false;
   std::vector<double> shares = {};  // of the states; empty when they cannot be read
 };
@@ -126,7 +126,8 @@ std::optional<std::string> KdReportSampleCopyDescription(const ChannelRecord* ch
   Line line{*channel, std::string(prefix.get().value_or("")), displayName(*channel, *elements),
             objectText(KdReportChannelGetUnitLabel(channel))};
   if (format == kKdReportState) {
-    line.hasStateNames = KdReportStateGetNameForIndex(channel, 0).has_value();
+    (void)KdReportStateGetNameForIndex(channel, 0);
+    line.hasStateNames = !channel->cached(CachedAnswer::StateNames).isNone();
     line.shares = KdReportStateCopyDutyCycles(channel);
   }
   std::string text;

@@ -187,7 +187,7 @@ std::uint32_t KdReportGetChannelCount(const ChannelCollection* collection);
 // elements.
 [[nodiscard]] PlistValue KdReportCopyPropertyList(const ChannelCollection* collection);
 // The way back. Null when the value is no dictionary or is nested deeper than a filed collection can be; what
-// is malformed inside fails the walks that meet it.
+// is malformed inside fails the walks that meet it, and does so after another way there and back.
 [[nodiscard]] KdReportCollection KdReportCreateAggregateFromPropertyList(const PlistValue& value);
 
 // ---- Discovery
@@ -288,10 +288,11 @@ std::uint32_t KdReportGetChannelCount(const ChannelCollection* collection);
 
 // ---- Values, of channels in a sample or a delta
 //
-// 64-bit answers are kKdReportInvalid for a channel of another format, an element that is not there, or
-// elements that do not fit the channel's type.
+// 64-bit answers are kKdReportInvalid without elements of the format and for an element that is not there. It
+// is the format that the elements carry: of a simple channel and an array it alone counts, whatever the
+// channel's type says; states and buckets also need a type of their format that announces as many elements.
 
-// `unit`, when wanted, receives the unit code.
+// Of a channel with exactly one element. `unit`, when wanted, receives the unit code.
 std::int64_t KdReportSimpleGetIntegerValue(const ChannelRecord* channel, std::int64_t* unit = nullptr);
 std::int64_t KdReportArrayGetValueAtIndex(const ChannelRecord* channel, std::int32_t index);
 // The values that it carries, four to an element; kKdReportNoIndex when there is no array.

@@ -11,6 +11,7 @@
 #include "drivermetrics/report_error.h"
 #include "drivermetrics/subscription.h"
 #include "platform/byte_reader.h"
+#include "platform/identifier_hash.h"
 
 namespace kdreport {
 
@@ -90,9 +91,7 @@ class SampleBuffer {
 
   // The slot that holds the channel's first element, or the free one where it belongs.
   std::uint32_t& slotOf(const Identifiers& wanted) {
-    constexpr std::uint64_t kOdd = 0x9E3779B97F4A7C15;
-    const std::uint64_t hash = (std::rotl(wanted.first * kOdd, 32) ^ wanted.second) * kOdd;
-    std::size_t slot = static_cast<std::size_t>(hash >> 32) & (slots_.size() - 1);
+    std::size_t slot = hash_(wanted.first, wanted.second) & (slots_.size() - 1);
     for (std::size_t tried = 1; tried < slots_.size(); ++tried) {
       if (slots_[slot] == kFree || identifiersAt(slots_[slot]) == wanted) break;
       slot = (slot + 1) & (slots_.size() - 1);
@@ -101,6 +100,7 @@ class SampleBuffer {
   }
 
   std::span<const std::byte> buffer_;
+  tbdaily::IdentifierHash hash_;
   End end_;
   std::vector<bool> isFirst_;         // elements that begin the first channel with its identifiers
   std::size_t next_ = 0;              // behind the channel that was found last

@@ -54,7 +54,7 @@ std::optional<std::vector<std::byte>> createInterestList(const ChannelCollection
 }
 
 KdReportSubscription::~KdReportSubscription() {
-  if (buffer_.data() != nullptr) registry_.KdConnectUnmapMemory(connection_, memoryType(), buffer_);
+  if (mapping_) registry_.KdConnectUnmapMemory(connection_, memoryType(), *mapping_);
   if (connection_ != 0) registry_.KdServiceClose(connection_);
 }
 
@@ -108,7 +108,7 @@ bool KdReportSubscription::mapBuffer(KdReportErrorOut error) {
     setError(error, status, "KdConnectMapMemory() failed");
     return false;
   }
-  buffer_ = memory;
+  mapping_ = memory;
   return true;
 }
 

@@ -22,7 +22,8 @@ class KdReportSubscription {
 
   // Has the hub write the current values into the buffer.
   KdStatus update() const;
-  std::span<const std::byte> buffer() const { return buffer_; }
+  // Empty until it is mapped.
+  std::span<const std::byte> buffer() const { return mapping_.value_or(std::span<std::byte>()); }
 
  private:
   KdStatus openHub(KdReportErrorOut error);
@@ -32,7 +33,7 @@ class KdReportSubscription {
   DriverRegistry& registry_;
   KdHandle connection_ = 0;
   std::uint64_t bufferIdentifier_ = 0;
-  std::span<std::byte> buffer_;
+  std::optional<std::span<std::byte>> mapping_;  // may be of no bytes, which is to be unmapped all the same
 };
 
 // The size in bytes of an interest list of `count` channels; none when it would reach 2^31.

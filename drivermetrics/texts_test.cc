@@ -87,6 +87,12 @@ TEST(Descriptions, OfSamples) {
             ">                  CH[     OFF] = { # 8        4.500e-06 s / 75.0% }\n");
   EXPECT_EQ(describe(sampled(channelType(2, 1), {{1, {1, 0, 0}}}, unit(kTicks))),
             ">                  CH[     0x1] = { # 0              nan s /  nan% }\n");
+  const auto named = sampled(channelType(2, 2), {{1, {1, 7, 0}}, {2, {2, 8, 0}}}, unit(kTicks));
+  named->cache(CachedAnswer::StateNames,
+               PlistValue::array({PlistValue::int64(5), PlistValue::string("OFF")}));
+  EXPECT_EQ(describe(named),
+            ">                  CH[     0x1] = { # 7              nan s /  nan% }\n"
+            ">                  CH[     OFF] = { # 8              nan s /  nan% }\n");
   PlistData bucketsOfTen(16);
   bucketsOfTen[0] = std::byte{10};
   bucketsOfTen[12] = std::byte{2};  // so many

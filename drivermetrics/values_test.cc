@@ -26,6 +26,8 @@ TEST(Values, SimpleAndArray) {
   std::int64_t unit = 0;
   EXPECT_EQ(KdReportSimpleGetIntegerValue(simple.get(), &unit), -42);
   EXPECT_EQ(unit, 7);
+  ASSERT_EQ(setChannelType(simple.get(), channelType(2, 9)), kKdSuccess);
+  EXPECT_EQ(KdReportSimpleGetIntegerValue(simple.get()), -42) << "the elements say how they are read";
   EXPECT_EQ(KdReportSimpleGetIntegerValue(nullptr, &unit), kNone);
   EXPECT_EQ(unit, kNone);
 

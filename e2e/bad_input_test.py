@@ -1,9 +1,13 @@
 """Whitelists, stores, recordings and arguments that are not as they should be: none stops a run."""
 
+import os
 import plistlib
+import sqlite3
+import stat
+import subprocess
 import unittest
 
-from harness import NO_CONTROLLER, YESTERDAY, DeviceTest
+from harness import BIN, NO_CONTROLLER, YESTERDAY, DeviceTest
 
 
 class BadInput(DeviceTest):
@@ -40,6 +44,33 @@ class BadInput(DeviceTest):
         self.assertEqual({place: place.read_bytes() for place in device.store_path.parent.iterdir()},
                          {device.store_path: damaged})
         self.assertEqual(sum("TBDataStore" in line for line in result.stderr.splitlines()), 1, result.stderr)
+
+    def test_a_store_that_somebody_keeps_locked_is_waited_for_once(self):
+        device = self.device(sample=True)
+        with sqlite3.connect(device.store_path) as holder:
+            holder.execute("BEGIN EXCLUSIVE")
+            result = device.run("-f")  # thousands of keys; more than one wait would be a timeout
+        self.assertIn("is kept locked by another program", result.stderr)
+        self.assertIn("tbdaily ended", device.log())
+
+    def test_a_pipe_at_the_store_s_journal_holds_nobody_up(self):
+        for name in ("-wal", "-shm", "-journal"):
+            device = self.device(value=True)
+            os.mkfifo(f"{device.store_path}{name}")
+            device.run("-f")
+            self.assertIn("tbdaily ended", device.log())
+
+    def test_a_process_that_was_given_nothing_and_a_umask_that_takes_everything(self):
+        device = self.device(value=True)
+        device.write("System/Device/apps.plist", b"rubbish")  # named on standard error, which is nobody's file here
+        subprocess.run(["sh", "-c", 'umask 0777; exec "$0" -d 0<&- 1>&- 2>&-', BIN / "tbdaily"], env=device.env, check=True,
+                       timeout=120)
+        self.assertEqual(device.reports()[0]["TBScalars"], {"k": 3})
+        made = [place for place in device.path("var").rglob("*") if not place.is_socket()]
+        for place in made:
+            self.assertNotIn(b"apps.plist", b"" if place.is_dir() else place.read_bytes(), place)
+        for place in [*device.path("var/mobile/Library/Logs").rglob("*"), *device.path("var/log").rglob("*")]:
+            self.assertEqual(stat.S_IMODE(place.stat().st_mode), 0o700 if place.is_dir() else 0o600, place)
 
     def test_recordings_that_cannot_be_parsed(self):
         device = self.device(value=True)

@@ -42,7 +42,6 @@ PlistValue infoOf(Input& input) {
 
 void fill(PlistData& buffer, Input& input) {
   buffer.clear();
-  buffer.reserve(kElementSize);  // memory has an address, empty or not
   for (std::size_t count = input.below(12); count > 0; --count) {
     fakes::Element element{.stamp = input.number<std::uint16_t>(), .words = {}};
     for (std::size_t i = 0; i < kElementWords; ++i) element.words.push_back(input.integer());

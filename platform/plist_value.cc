@@ -195,11 +195,16 @@ void PlistDictionary::set(std::string_view key, PlistValue value) {
     entries_[entry].second = std::move(value);
     return;
   }
+  // What may run out of memory comes first: the dictionary has the entry and its index, or neither.
+  const std::size_t count = entries_.size() + 1;
+  const bool isIndexFull = count >= kIndexFrom && count * 2 > slots_.size();
+  std::vector<Slot> larger(isIndexFull ? std::bit_ceil(count * 4) : 0);
   entries_.emplace_back(std::string(key), std::move(value));
-  if (entries_.size() * 2 > slots_.size()) {
-    rebuildIndex();
-  } else {
-    insertIntoIndex(entries_.size() - 1);
+  if (isIndexFull) {
+    slots_ = std::move(larger);
+    for (std::size_t i = 0; i < count; ++i) insertIntoIndex(i);
+  } else if (!slots_.empty()) {
+    insertIntoIndex(count - 1);
   }
 }
 

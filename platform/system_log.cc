@@ -12,6 +12,11 @@ constexpr std::array<std::string_view, 4> kConversions = {"d", "llu", "s", "@"};
 
 }  // namespace
 
+bool LogArgument::isNumber() const {
+  const auto* object = std::get_if<const PlistValue*>(&value_);
+  return object != nullptr ? (*object)->asNumber().has_value() : value_.index() <= 1;
+}
+
 std::string LogArgument::text() const {
   if (const auto* number = std::get_if<std::int64_t>(&value_)) return std::to_string(*number);
   if (const auto* number = std::get_if<std::uint64_t>(&value_)) return std::to_string(*number);

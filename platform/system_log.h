@@ -34,7 +34,8 @@ class LogArgument {
   LogArgument(const char* text) : value_(std::string_view(text)) {}
   LogArgument(const PlistValue& object) : value_(&object) {}  // borrowed for the call
 
-  bool isNumber() const { return value_.index() <= 1; }
+  // Numbers are never private, as an object neither.
+  bool isNumber() const;
   // The argument's full text, privacy aside.
   std::string text() const;
 

@@ -16,6 +16,8 @@ TEST(LogMessage, HidesTextsAndObjectsButNeverNumbers) {
   EXPECT_EQ(format("a %d b %s c %@", {-5, "text", object}, false), "a -5 b <private> c <private>");
   EXPECT_EQ(format("a %d b %s c %@", {-5, "text", object}, true), "a -5 b text c secret");
   EXPECT_EQ(format("%{public}@ -> %@", {object, object}, false), "secret -> <private>");
+  const PlistValue number = PlistValue::float64(0.5);
+  EXPECT_EQ(format("%@ of %@", {number, PlistValue::boolean(true)}, false), "0.5 of <private>");
   EXPECT_EQ(format("code %llu", {18446744073709551615U}, false), "code 18446744073709551615");
 }
 

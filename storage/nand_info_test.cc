@@ -6,6 +6,7 @@
 #include "storage/nand_key_map.h"
 #include "storage/stats_table.h"
 #include "storage/storage_test_support.h"
+#include "testing/allocations.h"
 #include "testing/fake_platform.h"
 
 namespace tbdaily {
@@ -137,6 +138,24 @@ TEST(NandInfo, HoldsAtMostSixtyKeysWhicheverByteOfItsBufferIsWrong) {
       EXPECT_LE(info ? info->size() : 0, 60U);
       byte = right;
     }
+  }
+}
+
+TEST(SetNumberValue, LeavesTheDictionaryAsItWasWithoutMemory) {
+  PlistDictionary dictionary;
+  for (int i = 0; i < 40; ++i) {
+    const std::string key = "a key that does not fit into a short text " + std::to_string(i);
+    for (std::size_t n = 1; !dictionary.contains(key); ++n) {
+      testing::FakeDiagnostics said;
+      const PlistDictionary before = dictionary;
+      const testing::RefusedAllocation refused(n);
+      SetNumberValue(dictionary, key, PlistNumber::int32(i), said);
+      if (dictionary.contains(key)) break;
+      EXPECT_THAT(said.errors, ::testing::StartsWith("Failed to create PVNumber from value: "));
+      EXPECT_EQ(dictionary, before);
+      EXPECT_EQ(std::ranges::distance(dictionary), i);
+    }
+    EXPECT_EQ(dictionary.get(key).asInteger(), i);
   }
 }
 

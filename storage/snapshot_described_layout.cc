@@ -26,7 +26,7 @@ constexpr std::size_t kArraySizeOffset = 8;
 constexpr std::size_t kFormatOffset = 12;
 constexpr std::size_t kFieldSize = 28;
 
-constexpr std::size_t kMostFields = 512;
+constexpr std::size_t kMostFieldsReadOnce = 512;
 constexpr std::uint32_t kFirstVersionWithTitle = 6;
 constexpr std::size_t kTripleSize = kPriorityTripleWords * sizeof(std::uint32_t);
 
@@ -60,7 +60,7 @@ class SnapshotHeader {
   std::size_t fieldCount() const {
     const std::size_t first = fieldTable() + kFieldsOffset;
     if (first > bytes_.size()) return 0;
-    return std::min({std::size_t{word(fieldTable())}, (bytes_.size() - first) / kFieldSize, kMostFields});
+    return std::min(std::size_t{word(fieldTable())}, (bytes_.size() - first) / kFieldSize);
   }
   // The index is below fieldCount().
   Field field(std::size_t index) const {
@@ -114,32 +114,44 @@ void renderField(SnapshotText& out, std::span<const std::byte> record, const Fie
   }
 }
 
-// The fields of a header, read once for all records.
+// The fields of a header, read once for all records as far as there is room; those behind are read again for
+// each.
 class Fields {
  public:
-  explicit Fields(const SnapshotHeader& header) : count_(header.fieldCount()) {
-    for (std::size_t i = 0; i < count_; ++i) fields_[i] = header.field(i);
+  explicit Fields(const SnapshotHeader& header) : header_(header), count_(header.fieldCount()) {
+    for (std::size_t i = 0; i < readOnce(); ++i) fields_[i] = header.field(i);
   }
-  std::span<const Field> all() const { return {fields_.data(), count_}; }
+
+  bool isEmpty(std::span<const std::byte> record) const {
+    return ByteReader(record).at<std::uint32_t>(fields_.front().offset).value_or(0) == 0;
+  }
+  void render(SnapshotText& out, std::span<const std::byte> record) const {
+    for (std::size_t i = 0; i < readOnce() && out.fits(); ++i) renderField(out, record, fields_[i]);
+    for (std::size_t i = readOnce(); i < count_ && out.fits(); ++i)
+      renderField(out, record, header_.field(i));
+  }
+  std::size_t count() const { return count_; }
 
  private:
+  std::size_t readOnce() const { return std::min(count_, fields_.size()); }
+
+  const SnapshotHeader& header_;
   std::size_t count_;
-  std::array<Field, kMostFields> fields_;
+  std::array<Field, kMostFieldsReadOnce> fields_;
 };
 
 // True when the last slot was reached, false when a record did not fit. `kept` becomes the length up to the
 // last complete line.
 bool renderRecords(SnapshotText& out, std::span<const std::byte> records, const SnapshotHeader& header,
                    std::uint32_t& cursor, std::size_t& kept) {
-  const Fields described(header);
-  const std::span<const Field> fields = described.all();
+  const Fields fields(header);
   const std::uint32_t lastSlot = std::max(header.slots(), 1U) - 1;
   const std::size_t stride = header.recordSize();
-  const std::size_t whole = stride == 0 || fields.empty() ? 0 : records.size() / stride;
+  const std::size_t whole = stride == 0 || fields.count() == 0 ? 0 : records.size() / stride;
   while (cursor < std::min<std::size_t>(lastSlot, whole)) {
     const auto record = records.subspan(cursor++ * stride);
-    if (ByteReader(record).at<std::uint32_t>(fields.front().offset).value_or(0) == 0) continue;
-    for (std::size_t i = 0; i < fields.size() && out.fits(); ++i) renderField(out, record, fields[i]);
+    if (fields.isEmpty(record)) continue;
+    fields.render(out, record);
     out.append("\n");
     if (!out.fits()) return false;
     kept = out.length();

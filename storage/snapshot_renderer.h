@@ -30,11 +30,11 @@ bool STXParseSnapshotBuffer(std::span<const std::byte> records, char* text, std:
 // `size` becomes the length of the text plus 1 for its NUL (1 for a capacity of 0, too, where no NUL is
 // written).
 //
-// A header is not trusted. Only what lies wholly inside `header` and `records` is rendered:
+// A header is not trusted. Only what lies wholly inside `header` and `records` is rendered, in a time that is
+// at most that of all fields for each record:
 // - The walk ends, with true and the cursor at the last slot, at the first record that is not wholly inside.
 //   So it does, without a line, for a header without slots, with a record size of 0 or without fields.
 // - A value outside is left out; a record whose first value is outside counts as empty.
-// - Fields after the 512th are left out, so that a hostile header cannot make each line arbitrarily slow.
 // - A field's format prints its value only if it asks for the arguments of the field's kind and no others, in
 //   plain C conversions (d, i, u, o, x, X; s for the letter of a priority group) with a width and a precision
 //   of at most 64. Any other format, and one without a NUL in its 16 bytes, is printed as it stands.

@@ -133,7 +133,7 @@ TEST(SnapshotDescribedLayout, RendersWhatLiesInsideOfAnUntrustedHeader) {
        kTitle + "T=1,O   3/   3,L      3/      3,M    3/    3\n"},
       {header(6, 36, 2, {one, {3, huge, huge, ",%s"}}), 0, 1, kTitle + "T=1,O,L,M\n"},
       {header(6, 36, 2, std::vector<Field>(1100, {0, 0, 0, "%u"})), 0, 1,
-       kTitle + std::string(512, '1') + "\n"},
+       kTitle + std::string(1100, '1') + "\n"},
   };
   for (const auto& [bytes, first, cursor, text] : cases) {
     const Rendering rendering(kFourSlots, 4000, &bytes, first);

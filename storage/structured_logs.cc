@@ -3,7 +3,6 @@
 #include <array>
 #include <memory>
 #include <new>
-#include <vector>
 
 #include "platform/preferences_store.h"
 #include "storage/storage_connection.h"
@@ -17,14 +16,8 @@ namespace {
 
 using ListHandler = bool (*)(Platform&, const FetchedList&);
 
-// A list that is fetched, and what handles it. `unsupported` is said, once, when the controller cannot serve
-// the list.
-struct SelectorFunctionEntry {
-  SelectorGetter NandExporter::*getter;
-  ListHandler handler;
-  std::uint16_t list;
-};
-
+// Lists that are fetched, and what handles them. `unsupported` is said, once, when the controller cannot
+// serve them.
 struct ListKind {
   SelectorGetter NandExporter::*getter;
   ListHandler handler;
@@ -40,13 +33,13 @@ constexpr std::array<ListKind, 3> kListKinds = {{
 
 // Zeros when the statistics cannot be had.
 WriteAmplification currentWriteAmplification(Platform& platform) {
-  const std::unique_ptr<FetchedStats> stats(new (std::nothrow)
-                                                FetchedStats(platform.driverRegistry, platform.diagnostics));
-  if (stats == nullptr) {
+  try {
+    const auto stats = std::make_unique<FetchedStats>(platform.driverRegistry, platform.diagnostics);
+    return *stats ? computeWriteAmplification(stats->context()) : WriteAmplification{};
+  } catch (const std::bad_alloc&) {
     platform.diagnostics.error("not enough memory?");
     return {};
   }
-  return *stats ? computeWriteAmplification(stats->context()) : WriteAmplification{};
 }
 
 void updateState(Platform& platform) {
@@ -58,19 +51,11 @@ void updateState(Platform& platform) {
       state.gForceCollectionSet || isAboveThreshold(amplification.user, platform.preferences);
 }
 
-std::vector<SelectorFunctionEntry> selectorFunctions(const NandExporter& descriptor,
-                                                     Diagnostics& diagnostics) {
-  std::vector<SelectorFunctionEntry> entries;
-  for (const ListKind& kind : kListKinds) {
-    if (descriptor.*kind.getter == nullptr) {
-      diagnostics.error("%s retrieval is not supported\n", kind.unsupported);
-      continue;
-    }
-    for (std::uint16_t list = 0; list < kind.lists; ++list)
-      entries.push_back({kind.getter, kind.handler, list});
-  }
+constexpr std::size_t kMostEntries = [] {
+  std::size_t entries = 0;
+  for (const ListKind& kind : kListKinds) entries += kind.lists;
   return entries;
-}
+}();
 
 // The lists of one open controller.
 class ListCollection {
@@ -84,18 +69,40 @@ class ListCollection {
         extended_(extended) {}
 
   bool run() {
-    bool result = true;
-    int index = 0;
-    for (const SelectorFunctionEntry& entry : selectorFunctions(descriptor_, platform_.diagnostics)) {
-      result = collect(entry, index++) && result;
+    std::array<SelectorFunctionEntry, kMostEntries> entries;
+    std::size_t count = 0;
+    for (const ListKind& kind : kListKinds) {
+      const SelectorGetter getter = descriptor_.*kind.getter;
+      if (getter == nullptr) {
+        platform_.diagnostics.error("%s retrieval is not supported\n", kind.unsupported);
+        continue;
+      }
+      for (std::uint16_t list = 0; list < kind.lists; ++list) entries[count++] = {getter, kind.handler, list};
     }
+    bool result = true;
+    for (std::size_t i = 0; i < count; ++i) result = collect(entries[i], static_cast<int>(i)) && result;
     return result;
   }
 
  private:
-  // False when the list makes the whole result false; a query or a fetch that fails does not.
+  struct SelectorFunctionEntry {
+    SelectorGetter getter;
+    ListHandler handler;
+    std::uint16_t list;
+  };
+
+  // False when the list makes the whole result false, memory that runs out included; a query or a fetch that
+  // fails does not. The other lists are collected all the same.
   bool collect(const SelectorFunctionEntry& entry, int index) {
-    const STXSelectorPair* selectors = (descriptor_.*entry.getter)();
+    try {
+      return fetchAndHandle(entry, index);
+    } catch (const std::bad_alloc&) {
+      return false;
+    }
+  }
+
+  bool fetchAndHandle(const SelectorFunctionEntry& entry, int index) {
+    const STXSelectorPair* selectors = entry.getter();
     if (selectors == nullptr) return false;
     const StxRequestOptions options{entry.list, extended_};
     const StxRequest query = StxRequest::sizeQuery(*selectors, options);

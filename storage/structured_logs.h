@@ -31,19 +31,19 @@ extern StorageLogState gStorageLogState;
 // diagnostics.
 bool DumpStorageStructuredLog(Platform& platform, bool extended);
 
-// One list as it was fetched. Bytes between what the driver filled and the size that it announced read as 0.
+// One list as it was fetched.
 struct FetchedList {
-  std::span<const std::byte> filled;
-  std::size_t size = 0;        // announced by the size query
-  PlistValue characteristics;  // the controller's characteristics dictionary
-  std::string_view className;  // of the controller
+  std::span<const std::byte> filled;  // may end before the size that was announced
+  std::size_t size = 0;               // announced by the size query
+  PlistValue characteristics;         // the controller's characteristics dictionary
+  std::string_view className;         // of the controller
 };
 
 // Each answers whether the list could be handled.
 // Band statistics: the NAND text log with the validity lists and the NAND info, when gNeedValidityList says
 // so.
 bool HandleValidityList(Platform& platform, const FetchedList& list);
-// One record of each NAND channel.
+// One record of each NAND channel whose counters were filled; of its summary, what was not filled is 0.
 bool HandleTelemetryList(Platform& platform, const FetchedList& list);
 // One record with the factory count, and one of each defect.
 bool HandleDefectsList(Platform& platform, const FetchedList& list);

@@ -8,6 +8,7 @@
 #include "platform/plist_text.h"
 #include "storage/storage_test_support.h"
 #include "storage/write_amplification.h"
+#include "testing/allocations.h"
 #include "testing/fake_platform.h"
 #include "testing/json_test_support.h"
 
@@ -46,9 +47,9 @@ struct StructuredLogsTest : ::testing::Test {
 
   // What the handler of a list says of it.
   std::string verdict(auto& handler, const std::vector<std::byte>& bytes, PlistValue properties,
-                      const char* className = kNvme) {
+                      const char* className = kNvme, std::optional<std::size_t> announced = {}) {
     diagnostics.errors.clear();
-    const FetchedList list{bytes, bytes.size(), std::move(properties), className};
+    const FetchedList list{bytes, announced.value_or(bytes.size()), std::move(properties), className};
     return (handler(fake.platform, list) ? "accepted. " : "refused. ") + diagnostics.errors;
   }
   const std::vector<std::pair<int, PlistDictionary>>& logs() { return fake.logSubmission.structured; }
@@ -119,6 +120,14 @@ TEST_F(StructuredLogsTest, TelemetryLogsOneRecordForEachChannel) {
   EXPECT_EQ(second.size(), 7U + 33 + 23 + 8 + 38 + 12 + 10 + 10 + 10 + 12 + 12);
   EXPECT_EQ(verdict(HandleTelemetryList, bytes, buses(0)), "accepted. ");
   bytes.pop_back();
+  // A channel that is announced and not filled has no record, and a summary that is not filled is 0.
+  for (const auto& [filled, records] : {std::pair{4095U, 0U}, {4096U, 1U}, {8191U, 1U}}) {
+    fake.logSubmission.structured.clear();
+    const std::vector<std::byte> first(bytes.begin(), bytes.begin() + filled);
+    EXPECT_EQ(verdict(HandleTelemetryList, first, buses(18000), kNvme, 18000 * 4128), "accepted. ");
+    ASSERT_EQ(logs().size(), records) << filled;
+  }
+  EXPECT_EQ(logs()[0].second.get("RD"), PlistValue::int32(0));
   for (const std::int64_t odd : {2LL, -1LL, 0x7FFFFFFFLL})
     EXPECT_EQ(verdict(HandleTelemetryList, bytes, buses(odd)),
               "refused. ERROR: Attempting to parse beyond the bounds of the buffer\n");
@@ -140,6 +149,11 @@ TEST_F(StructuredLogsTest, TelemetrySaysWhatTheCharacteristicsLack) {
               "refused. ERROR: " + error + "\n");
   EXPECT_EQ(verdict(HandleTelemetryList, bytes, PlistValue::string("?")),
             "refused. ERROR: Could not parse the Device Characteristics dictionary\n");
+  PlistDictionary odd = characteristics("num-bus").mutableDictionary();
+  odd.set("manufacturer-id", PlistValue::string("4X82"));
+  EXPECT_EQ(verdict(HandleTelemetryList, bytes, PlistValue::dictionary(odd)),
+            "refused. ERROR: could not determine the number of channels\n");
+  EXPECT_EQ(diagnostics.outputs, "unrecognized hex character: x");
 }
 
 TEST_F(StructuredLogsTest, DefectsAreLoggedWithTheirModeInTheReason) {
@@ -184,6 +198,27 @@ TEST_F(StructuredLogsTest, EveryListIsFetchedWhateverBecameOfTheOthers) {
   fake.driverRegistry.drivers.clear();
   EXPECT_FALSE(DumpStorageStructuredLog(fake.platform, false));
   EXPECT_FALSE(gStorageLogState.gNeedValidityList);
+}
+
+TEST_F(StructuredLogsTest, MemoryThatRunsOutCostsOneList) {
+  testing::ScriptedController controller(fake.driverRegistry, kNvme);
+  controller.buffers[17] = telemetry(1);
+  controller.buffers[15] = words({0, 1, 0});
+  fake.driverRegistry.drivers[0].properties.set("Controller Characteristics", characteristics());
+  std::size_t ended = 0, n = 0;  // runs that ended before the first list
+  for (bool wasMet = true; wasMet;) {
+    fake.logSubmission.structured.clear();
+    const testing::RefusedAllocation refused(++n);
+    try {
+      DumpStorageStructuredLog(fake.platform, false);
+      EXPECT_GE(logs().size(), 3U) << n;
+    } catch (const std::bad_alloc&) {
+      EXPECT_TRUE(logs().empty()) << n;
+      ++ended;
+    }
+    wasMet = refused.wasMet();
+  }
+  EXPECT_GT(n, 20 * ended);
 }
 
 }  // namespace

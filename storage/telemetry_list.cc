@@ -73,6 +73,7 @@ std::optional<TelemetryLayout> layoutOf(const PlistValue& characteristics, Diagn
   if (!chipId) return std::nullopt;
   const auto manufacturerId = manufacturerIdOf(*dictionary, diagnostics);
   if (!manufacturerId) return std::nullopt;
+  const std::uint64_t vendorKey = nandVendorKey(*manufacturerId, diagnostics);
   const PlistValue buses = dictionary->get("num-bus");
   if (!buses.asNumber()) {
     diagnostics.error("ERROR: could not determine the number of channels\n");
@@ -80,13 +81,14 @@ std::optional<TelemetryLayout> layoutOf(const PlistValue& characteristics, Diagn
   }
   // A signed 32-bit number that is used as an unsigned one: a negative count runs into the bounds.
   const auto channels = static_cast<std::uint32_t>(buses.asNumber()->toInt64());
-  return TelemetryLayout{controllerKind(*chipId), nandVendorKey(*manufacturerId, diagnostics), channels};
+  return TelemetryLayout{controllerKind(*chipId), vendorKey, channels};
 }
 
 PlistNumber number32(std::uint32_t value) {
   return PlistNumber::int32(static_cast<std::int32_t>(value));
 }
 
+// Words that are not there are 0.
 void addSummary(std::span<const std::byte> summary, PlistDictionary& log, Diagnostics& diagnostics) {
   const ByteReader reader(summary);
   for (std::size_t i = 0; i < kSummaryFields.size(); ++i) {
@@ -107,13 +109,11 @@ void addCounters(const NandCounterRecord& record, ControllerKind kind, PlistDict
   }
 }
 
-// Bytes that the driver did not fill read as 0.
-template <std::size_t Size>
-void copyFilled(std::span<const std::byte> filled, std::size_t offset, std::array<std::byte, Size>& out) {
-  out.fill(std::byte{0});
-  if (offset >= filled.size()) return;
-  const auto available = filled.subspan(offset, std::min(Size, filled.size() - offset));
-  std::copy(available.begin(), available.end(), out.begin());
+// At most `size` bytes; those that are filled.
+std::span<const std::byte> filledPart(std::span<const std::byte> filled, std::size_t offset,
+                                      std::size_t size) {
+  const auto rest = filled.subspan(std::min(offset, filled.size()));
+  return rest.first(std::min(size, rest.size()));
 }
 
 }  // namespace
@@ -134,15 +134,14 @@ bool HandleTelemetryList(Platform& platform, const FetchedList& list) {
   }
   const NandCounterParser parse = nandCounterParser(layout->kind, layout->vendorKey);
   const std::size_t summaries = std::size_t{layout->channels} * kNandCounterBlockSize;
-  std::array<std::byte, kNandCounterBlockSize> block;
-  std::array<std::byte, kSummarySize> summary;
-  for (std::size_t channel = 0; channel < layout->channels; ++channel) {
+  // More channels than there are counters for are announced, not measured.
+  const std::size_t channels =
+      std::min<std::size_t>(layout->channels, list.filled.size() / kNandCounterBlockSize);
+  for (std::size_t channel = 0; channel < channels; ++channel) {
     *record = {};
-    copyFilled(list.filled, channel * kNandCounterBlockSize, block);
-    copyFilled(list.filled, summaries + channel * kSummarySize, summary);
-    parse(block, *record);
+    parse(list.filled.subspan(channel * kNandCounterBlockSize).first<kNandCounterBlockSize>(), *record);
     PlistDictionary log;
-    addSummary(summary, log, diagnostics);
+    addSummary(filledPart(list.filled, summaries + channel * kSummarySize, kSummarySize), log, diagnostics);
     addCounters(*record, layout->kind, log, diagnostics);
     platform.logSubmission.logStructuredData(kStorageLogType, log);
   }

@@ -8,6 +8,7 @@
 #include <cmath>
 #include <ctime>
 #include <limits>
+#include <stdexcept>
 
 #include "platform/byte_writer.h"
 #include "platform/linux/base/host_notes.h"
@@ -109,8 +110,21 @@ std::optional<Timebase> LinuxKernel::timebase() {
   return Timebase{1, 1};
 }
 
+std::optional<PlistDate> LinuxKernel::recordedNow() {
+  const std::optional<PlistValue> now = recordings_.readableEntry(recording::kClock, "now");
+  const std::lock_guard guard(mutex_);
+  if (now) {
+    recordedNow_ = now->asDate();
+  } else if (!recordedNow_) {
+    throw std::runtime_error("what time it is stands in " +
+                             host_.files().place(Recordings::path(recording::kClock)).native() +
+                             ", which cannot be read");
+  }
+  return recordedNow_;
+}
+
 PlistDate LinuxKernel::currentTime() {
-  if (const auto now = recordings_.entry(recording::kClock, "now").asDate()) return *now;
+  if (const auto now = recordedNow()) return *now;
   if (!host_.live()) {
     noteOnce("live sources are off and " + host_.files().place(Recordings::path(recording::kClock)).native() +
              " records no \"now\": the time is 1970-01-01");

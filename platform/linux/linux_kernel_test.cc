@@ -45,6 +45,18 @@ TEST(LinuxKernelTest, FillsSysctlsFromIntegersErrorsAndEvents) {
   setErrors("1099511627776");  // no error number
   EXPECT_EQ(read("kern.next_ecc_event", 8), "errno 2");
 
+  // A day is not guessed: a clock that cannot be read stands still where it was, or there is no time.
+  TestPlatform unreadable(true);
+  const auto clock = unreadable.host.files().place("/System/Device/clock.plist");
+  std::filesystem::create_directories(clock);
+  EXPECT_THROW(unreadable.services.kernel.currentTime(), std::runtime_error);
+  std::filesystem::remove(clock);
+  unreadable.record("clock.plist", "now", PlistValue(PlistDate{5}));
+  EXPECT_EQ(unreadable.services.kernel.currentTime().secondsSinceReference, 5);
+  std::filesystem::remove(clock);
+  std::filesystem::create_directories(clock);
+  EXPECT_EQ(unreadable.services.kernel.currentTime().secondsSinceReference, 5);
+
   TestPlatform live(true);
   live.record("clock.plist", "numerator", testing::plistOf("4294967296"));
   EXPECT_EQ(live.services.kernel.timebase()->numerator, 1U);

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <new>
 #include <unordered_map>
 #include <vector>
 
@@ -33,6 +34,7 @@ CachedPlistFile& LinuxPreferences::current(std::string_view name) {
   if (found == domains_.end()) found = domains_.try_emplace(std::string(name)).first;
   CachedPlistFile& domain = found->second;
   domain.refresh(host_.files(), path(name), codec_);
+  if (domain.ranOutOfMemory()) throw std::bad_alloc();  // no absent answer: what it holds is not known yet
   const fs::path place = host_.files().place(path(name));
   if (domain.state() == State::Unreadable)
     host_.files().noteUnread("cannot read preferences " + place.native() + ": " + domain.fault());

@@ -58,12 +58,27 @@ bool LinuxSystemLog::showsPrivate() {
   return *showsPrivate_;
 }
 
+namespace {
+
+// A line that cannot be made is no reason to end what it tells of.
+template <typename Line>
+void writeOrNote(Line&& line) {
+  try {
+    line();
+  } catch (const std::exception& failure) {
+    noteOnce(std::string("a line of the log is lost: ") + failure.what());
+  }
+}
+
+}  // namespace
+
 void LinuxSystemLog::write(LogLevel level, std::string_view format, std::span<const LogArgument> arguments) {
-  if (isEnabled(level)) writeLine(level, formatLogMessage(format, arguments, showsPrivate()));
+  if (!isEnabled(level)) return;
+  writeOrNote([&] { writeLine(level, formatLogMessage(format, arguments, showsPrivate())); });
 }
 
 void LinuxSystemLog::writePlain(std::string_view message) {
-  writeLine(LogLevel::Default, message);
+  writeOrNote([&] { writeLine(LogLevel::Default, message); });
 }
 
 void LinuxSystemLog::writeLine(LogLevel level, std::string_view message) {

@@ -21,7 +21,7 @@ TEST(LinuxSystemLogTest, WritesLinesThatStayLines) {
     LinuxPlatform platform(device.host);
     SystemLog& log = platform.services().systemLog;
     log.message(LogLevel::Default, "day %d of %s", 20780, "text");
-    log.message(LogLevel::Info, "%{public}@ and %@", PlistValue::string("a\nb"), PlistValue::int64(1));
+    log.message(LogLevel::Info, "%{public}@ and %@", PlistValue::string("a\nb"), PlistValue::boolean(true));
     log.message(LogLevel::Debug, "debug");
     log.message(LogLevel::Error, "100%%%{public}@", PlistValue::string("\x1b[2J\r\u009b\t\u00e4"));
     log.writePlain("plain %d\n");

@@ -21,6 +21,7 @@ void CachedPlistFile::read(const DeviceFiles& files, const std::string& path, Pr
   PlistParseResult parsed = codec.parse(contents.bytes);
   if (parsed.ranOutOfMemory) {  // not damaged, and worth another look
     state_ = State::Unreadable;
+    ranOutOfMemory_ = true;
     fault_ = std::move(parsed.error);
     return;
   }

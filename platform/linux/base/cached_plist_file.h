@@ -23,6 +23,8 @@ class CachedPlistFile {
   const PlistValue& root() const { return root_; }
   // One line, of a file that is damaged or cannot be read.
   const std::string& fault() const { return fault_; }
+  // Unreadable for want of memory, which says nothing about the file.
+  bool ranOutOfMemory() const { return ranOutOfMemory_; }
 
  private:
   void read(const DeviceFiles& files, const std::string& path, PropertyListCodec& codec);
@@ -31,6 +33,7 @@ class CachedPlistFile {
   State state_ = State::Missing;
   PlistValue root_ = PlistValue::dictionary({});
   std::string fault_;
+  bool ranOutOfMemory_ = false;
 };
 
 }  // namespace tbdaily

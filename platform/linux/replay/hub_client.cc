@@ -12,6 +12,7 @@
 
 #include "platform/byte_reader.h"
 #include "platform/byte_writer.h"
+#include "platform/identifier_hash.h"
 #include "platform/linux/base/file_io.h"
 #include "platform/linux/replay/recorded_client.h"
 
@@ -41,15 +42,10 @@ struct ChannelKey {
 };
 
 struct ChannelKeyHash {
-  std::size_t operator()(const ChannelKey& key) const { return mixed(mixed(key.driver) ^ key.channel); }
+  std::size_t operator()(const ChannelKey& key) const { return identifierHash(key.driver, key.channel); }
 
  private:
-  // Identifiers tend to differ in a few bits only.
-  static std::uint64_t mixed(std::uint64_t n) {
-    n = (n ^ n >> 30) * 0xBF58476D1CE4E5B9;
-    n = (n ^ n >> 27) * 0x94D049BB133111EB;
-    return n ^ n >> 31;
-  }
+  IdentifierHash identifierHash;
 };
 
 std::uint64_t integerOrZero(const PlistDictionary& dictionary, std::string_view key) {

@@ -43,6 +43,16 @@ bool matches(const PlistDictionary& entry, const PlistDictionary& matching) {
   return wanted.asString() && entry.get("class").asString() == wanted.asString();
 }
 
+// The characters of a UTF-8 text that lie wholly within its first `most` bytes.
+std::string_view wholeCharacters(std::string_view text, std::size_t most) {
+  if (text.size() <= most) return text;
+  const auto continuesCharacter = [text](std::size_t at) {
+    return (static_cast<unsigned char>(text[at]) & 0xC0) == 0x80;
+  };
+  while (most > 0 && continuesCharacter(most)) --most;
+  return text.substr(0, most);
+}
+
 }  // namespace
 
 PlistValue RecordedDriverRegistry::recordedEntries() {
@@ -146,7 +156,7 @@ KdStatus RecordedDriverRegistry::KdRegistryEntryGetName(KdHandle handle, std::st
   if (entry == nullptr) return kKdBadArgument;
   const PlistValue recorded = entry->get("name");
   if (!recorded.asString()) return kKdNotFound;
-  name = recorded.asString()->substr(0, kLongestName);
+  name = wholeCharacters(*recorded.asString(), kLongestName);
   return kKdSuccess;
 }
 

@@ -8,6 +8,7 @@
 
 #include "platform/byte_reader.h"
 #include "platform/byte_writer.h"
+#include "platform/driver_handle.h"
 #include "platform/linux/host_test_support.h"
 
 namespace tbdaily {
@@ -68,6 +69,18 @@ TEST_F(DriversTest, AWalkIsNoLongerValidWhenTheRegistryChanged) {
   EXPECT_EQ(registry.openHandles(), 0U);
 }
 
+TEST_F(DriversTest, ALongNameIsCutBetweenCharacters) {
+  const std::string kept(127, 'x');
+  for (const auto& [recorded, answered] : {std::pair{kept + "\u00FC", kept}, {kept + "yz", kept + "y"}}) {
+    put({PlistValue::dictionary(
+        {{"class", PlistValue::string("C")}, {"name", PlistValue::string(recorded)}})});
+    const DriverHandle entry(registry, registry.KdServiceGetMatchingService(registry.KdServiceMatching("C")));
+    std::string name;
+    EXPECT_EQ(registry.KdRegistryEntryGetName(entry.get(), name), 0);
+    EXPECT_EQ(name, answered);
+  }
+}
+
 TEST_F(DriversTest, AStorageClientTellsRequestsApartAndIsStrict) {
   device.put("/System/Device/six", "abcdef");
   device.put("/System/Device/seven", "ABCDEFG");
@@ -77,7 +90,7 @@ TEST_F(DriversTest, AStorageClientTellsRequestsApartAndIsStrict) {
       {"method": 9, "code": 13, "file": "seven", "list": 1},
       {"method": 9, "code": 15, "file": "six", "size": 4294967295},
       {"method": 9, "code": 16, "sizeStatus": -536870206, "dataStatus": 3758097090},
-      {"method": 9, "code": 17, "file": "../../outside"},
+      {"method": 9, "code": 17, "file": "../../outside"}, {"method": 5, "code": 13, "file": "six"},
       {"method": 8, "file": "seven"}]})");
   client.set("recommendation", PlistValue::dictionary({{"method", PlistValue::int64(5)},
                                                        {"data", PlistValue::data(PlistData(2))}}));
@@ -91,6 +104,7 @@ TEST_F(DriversTest, AStorageClientTellsRequestsApartAndIsStrict) {
   EXPECT_EQ(call(8, {}, 4), (Bytes{7, 0, 0, 0}));
   EXPECT_EQ(call(8, {}, 7).size(), 7U);
   EXPECT_EQ(call(5, {}, 8), (Bytes{0, 0}));
+  EXPECT_EQ(call(5, request(13, 1), 4), (Bytes{6, 0, 0, 0}));
   EXPECT_EQ(call(9, request(16, 1), 4), Bytes{-536870206});
   EXPECT_EQ(call(9, request(16, 0), 9), Bytes{-536870206});
   auto reserved = request(13, 1);

@@ -8,17 +8,24 @@ std::string Recordings::path(std::string_view file) {
   return std::string(recording::kFolder).append("/").append(file);
 }
 
-PlistValue Recordings::load(std::string_view file) {
-  using State = CachedPlistFile::State;
-  const std::lock_guard guard(mutex_);
+namespace {
+using State = CachedPlistFile::State;
+}
+
+const CachedPlistFile& Recordings::loaded(std::string_view file) {
   auto found = loaded_.find(file);
   if (found == loaded_.end()) found = loaded_.try_emplace(std::string(file)).first;
-  CachedPlistFile& loaded = found->second;
-  loaded.refresh(host_.files(), path(file), codec_);
-  if (loaded.state() == State::Damaged || loaded.state() == State::Unreadable)
+  CachedPlistFile& recording = found->second;
+  recording.refresh(host_.files(), path(file), codec_);
+  if (recording.state() == State::Damaged || recording.state() == State::Unreadable)
     host_.files().noteUnread("recording " + host_.files().place(path(file)).native() +
-                             " is ignored: " + loaded.fault());
-  return loaded.root();
+                             " is ignored: " + recording.fault());
+  return recording;
+}
+
+PlistValue Recordings::load(std::string_view file) {
+  const std::lock_guard guard(mutex_);
+  return loaded(file).root();
 }
 
 bool Recordings::readFile(std::string_view file, FileContents& contents) {
@@ -37,6 +44,13 @@ bool Recordings::has(std::string_view file) const {
 
 PlistValue Recordings::entry(std::string_view file, std::string_view key) {
   return load(file).get(key);
+}
+
+std::optional<PlistValue> Recordings::readableEntry(std::string_view file, std::string_view key) {
+  const std::lock_guard guard(mutex_);
+  const CachedPlistFile& recording = loaded(file);
+  if (recording.state() == State::Unreadable) return std::nullopt;
+  return recording.root().get(key);
 }
 
 }  // namespace tbdaily

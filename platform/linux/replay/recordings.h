@@ -3,6 +3,7 @@
 
 #include <map>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <string_view>
 
@@ -24,6 +25,9 @@ class Recordings {
   // An entry of the recording's root, or none.
   PlistValue entry(std::string_view file, std::string_view key);
 
+  // The same; nullopt when the recording is there and cannot be read for now.
+  std::optional<PlistValue> readableEntry(std::string_view file, std::string_view key);
+
   // The bytes of a file below System/Device/; false when it cannot be read (named once) or does not lie
   // there.
   bool readFile(std::string_view file, FileContents& contents);
@@ -33,6 +37,9 @@ class Recordings {
   static std::string path(std::string_view file);
 
  private:
+  // Under the mutex.
+  const CachedPlistFile& loaded(std::string_view file);
+
   const Host& host_;
   PropertyListCodec& codec_;
   std::mutex mutex_;  // a usage reply is processed on a thread of its own

@@ -60,9 +60,9 @@ class StorageClient : public RecordedClient {
                       std::size_t& outputSize) override {
     output = output.first(std::min(outputSize, output.size()));
     const PlistDictionary* recommendation = recommendation_.asDictionary();
-    if (recommendation != nullptr && integerOf(*recommendation, "method") == method) {
+    // The method may also be that of requests, which bring a structure.
+    if (input.empty() && recommendation != nullptr && integerOf(*recommendation, "method") == method)
       return answerRecommendation(*recommendation, output, outputSize);
-    }
     const auto request = parseRequest(input);
     const PlistDictionary* buffer = request ? findBuffer(method, *request) : nullptr;
     return buffer != nullptr ? answer(*buffer, *request, output, outputSize) : kKdBadArgument;
