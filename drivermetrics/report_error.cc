@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "drivermetrics/text_format.h"
+#include "platform/utf8.h"
 
 namespace kdreport {
 
@@ -43,7 +44,7 @@ void writeLine(const std::string& line) {
   Log& log = processLog();
   const std::lock_guard lock(log.mutex);
   if (log.sink) return log.sink(line);
-  std::cerr << line + '\n';
+  std::cerr << tbdaily::withoutControls(line, tbdaily::TextPlace::Line) + '\n';
 }
 }  // namespace
 

@@ -3,14 +3,18 @@
 import base64
 import datetime
 import json
+import os
 import plistlib
 import subprocess
 import unittest
 
-from harness import BIN, TODAY, YESTERDAY, DeviceTest
+from harness import BIN, JOB, TODAY, YESTERDAY, DeviceTest
 
 VALUE = {"text": "ä<&>\"", "int": -2 ** 63, "big": 2 ** 63 - 1, "real": 2.5, "inf": float("inf"), "yes": True,
          "date": datetime.datetime(2026, 2, 28, 23, 59, 59), "data": bytes(range(256)), "list": [1, [], {}]}
+
+HOSTILE = "n\x1b[31m\x9b2J\x7f\u202e\r\n<0>forged"
+CONTROLS = {chr(c) for c in (*range(32), *range(0x7f, 0xa0), 0x202e)} - {"\n", "\t"}
 
 
 class Companion(DeviceTest):
@@ -104,6 +108,127 @@ class Companion(DeviceTest):
         self.assertIn("std. dev.", text)
         self.assertRegex(text, r"\n    \(90, inf\) +\d+  #+\n")
         self.assertIn("no daily report", device.tally("report", "-", stdin="<plist><string/></plist>", status=1))
+
+    def test_what_cannot_be_read_is_no_answer(self):
+        preferences, spool = "var/mobile/Library/Preferences/", "var/mobile/Library/Logs/"
+        device = self.device(sample=True)
+        for place, reason, commands in (
+                (preferences + "com.velmora.Crashferry.plist", "not a regular file", ("tasking show",)),
+                (preferences + JOB + ".plist", "not a regular file", ("tasking show",)),
+                (preferences + "com.velmora.sysmetrics.tbdaily.plist", "not a regular file", ("usage show",)),
+                (preferences + "com.velmora.da.plist", "not a regular file", ("whitelist check", "report --preview")),
+                ("System/Device/usage.plist", "not a regular file", ("usage show",)),
+                ("System/Device/registry.plist", "not a regular file", (
+                    "metrics list", "metrics sample", "nand", "wear", "stats", "snapshots", "buffer stats -o x")),
+                ("System/Device/hub.plist", "not a regular file", ("metrics sample", "metrics watch --interval 1")),
+                ("Library/Application Support/Tallybook/Whitelist_Nimbos.plist", "not a regular file",
+                 ("whitelist check", "report --preview")),
+                (spool + "Pending", "not a directory", ("report",)),
+                (spool + "Withheld", "not a directory", ("report",))):
+            there = device.path(place)
+            aside = device.base / "aside"
+            if there.exists():
+                there.rename(aside)
+            for words in commands:
+                for json_flag in ((), ("--json",)):
+                    with self.subTest(place=place, words=words, json=json_flag):
+                        there.parent.mkdir(parents=True, exist_ok=True)
+                        os.mkfifo(there)
+                        said = device.tally(*json_flag, *words.split(), status=1)
+                        self.assertIn(str(there), said)
+                        self.assertIn(reason, said)
+                        self.assertEqual(len(said.splitlines()), 1)
+                        there.unlink()
+            if aside.exists():
+                aside.rename(there)
+        device.write("System/Device/registry.plist", b"<plist>")  # damaged is not missing either
+        self.assertIn("registry.plist is ignored", device.tally("metrics", "list", status=1))
+        missing = str(device.base / "missing")
+        for words in ("tasking show", "usage show", "report", "metrics list", "whitelist check", "nand", "stats", "snapshots"):
+            for json_flag in ((), ("--json",)):
+                self.assertIn(missing, device.tally("--root", missing, *json_flag, *words.split(), status=1))
+
+    def test_what_is_something_else_is_no_answer(self):
+        device = self.device()
+        answers = str(device.record("answers", {"InternalBuild": True}))
+        for json_flag in ((), ("--json",)):
+            self.assertIn("cannot be had", device.tally(*json_flag, "nand", status=1))
+            self.assertIn("no statistics buffer", device.tally(*json_flag, "stats", "/etc/passwd", status=1))
+            self.assertIn("no daily report", device.tally(*json_flag, "report", answers, status=1))
+
+    def test_files_are_regular_and_of_a_limited_size(self):
+        device = self.device(sample=True)
+        fifo, sparse = str(device.base / "fifo"), str(device.base / "sparse")
+        os.mkfifo(fifo)
+        with open(sparse, "wb") as file:
+            file.truncate(2 ** 42)
+        words = ("stats", "snapshots --records", "plist", "report", "tasking schedule", "send app-info", "record import")
+        for command in words:
+            for place, reason in ((fifo, "not a regular file"), ("/dev/zero", "not a regular file"),
+                                  (str(device.base), "not a regular file"), (sparse, "larger than|longer than")):
+                with self.subTest(command=command, place=place):
+                    self.assertRegex(device.tally(*command.split(), place, status=1), reason)
+        newest = device.path("var/mobile/Library/Logs/Pending/log-tallyd-2026-11-24-090704.193")
+        newest.parent.mkdir(parents=True, exist_ok=True)
+        self.assertIn("nobody reads it", device.tally("buffer", "stats", "-o", fifo, status=1))
+        for place, reason in ((fifo, "not a regular file"), (sparse, "larger than 256 MiB")):
+            os.rename(place, newest)
+            self.assertIn(f"{newest}: it is {reason}", device.tally("report", status=1))
+            newest.unlink()
+        for command in words[:1] + words[2:]:
+            with open("/dev/zero", "rb") as zeros, self.subTest(command=command):
+                result = subprocess.run([BIN / "tallyctl", *command.split(), "-"], env=device.env, stdin=zeros,
+                                        capture_output=True, timeout=60)
+                self.assertEqual(result.returncode, 1)
+                self.assertRegex(result.stderr, b"larger than|longer than")
+
+    def test_nothing_from_outside_drives_the_terminal_or_forges_a_line(self):
+        device = self.device(sample=True)
+
+        def write(place, value):
+            return str(device.write(place, plistlib.dumps(value, fmt=plistlib.FMT_BINARY)))
+
+        report = write("r", {"TBCrashLogVersion": 1, "TBStartDate": datetime.datetime(2026, 11, 23), "TBTaskID": HOSTILE,
+                             "TBMetadata": {HOSTILE: HOSTILE}, "TBScalars": {HOSTILE: 1},
+                             "TBDistributionsHistogram": {HOSTILE: {HOSTILE: 1}}})
+        value = write("v", {HOSTILE.replace("\x1b", ""): [HOSTILE.replace("\x1b", "")]})
+        device.write("Library/Application Support/Tallybook/Whitelist_Nimbos.plist", plistlib.dumps(
+            {HOSTILE: {"ScalarKeys": {HOSTILE: {}}, HOSTILE: 1}}, fmt=plistlib.FMT_BINARY))
+        write("var/mobile/Library/Preferences/com.velmora.tallyd.tbdaily.plist", {
+            "TaskingID": HOSTILE, "TaskingOS": HOSTILE, "TaskingDigest": HOSTILE,
+            "TaskingPayload": [{"Domain": "d", "Key": HOSTILE, "Value": HOSTILE}]})
+        registry = plistlib.loads(device.path("System/Device/registry.plist").read_bytes())
+        publishing = [e for e in registry["entries"] if "KdReportLegend" in e.get("properties", {})]
+        publishing[0]["name"] = HOSTILE
+        for group in publishing[1]["properties"]["KdReportLegend"]:
+            group["KdReportGroupName"] = HOSTILE
+            for channel in group["KdReportChannels"]:
+                channel[2:] = [HOSTILE]
+        publishing[2] |= {"name": HOSTILE, "properties": {"KdReportLegendPublic": True, "KdReportLegend": 1}}
+        write("System/Device/registry.plist", registry)
+        write("var/mobile/Library/Preferences/com.velmora.sysmetrics.tbdaily.plist", {
+            "netUsageBaseline": {HOSTILE: [datetime.datetime(2026, 11, 23), 1, 2, 3, 4]}})
+        write("var/mobile/Library/Preferences/com.velmora.Crashferry.plist", {"ScheduledTasking": {"TaskingID": HOSTILE}})
+        for words, status in (
+                (("report", report), 0), (("plist", value), 0), (("whitelist", "check", HOSTILE), 0),
+                (("tasking", "show"), 0), (("usage", "show"), 0), (("metrics", "list"), 0), (("metrics", "sample"), 0),
+                (("metrics", "watch", "--interval", "1", "--count", "1"), 0), (("metrics", "list", "--describe"), 0),
+                (("metrics", "list", "--driver", HOSTILE), 0), (("stats", HOSTILE), 1), ((HOSTILE,), 2),
+                (("record", "scalar", "k", HOSTILE), 2), (("metrics", "list", "--" + HOSTILE), 2),
+                (("nand", "--explain", HOSTILE), 1), (("wait", HOSTILE), 2), (("record", "import", HOSTILE), 1)):
+            for json_flag in ((),) if "--describe" in words else ((), ("--json",)):
+                with self.subTest(words=words, json=json_flag):
+                    result = subprocess.run([BIN / "tallyctl", *json_flag, *words], env=device.env, timeout=60,
+                                            capture_output=True)
+                    self.assertEqual(result.returncode, status, result.stderr)
+                    text = (result.stdout + result.stderr).decode()
+                    self.assertEqual([c for c in text if c in CONTROLS], [])
+                    self.assertIn("forged", text)
+                    if "--describe" not in words:  # of whose lines nobody knows which are the library's
+                        self.assertNotRegex(text, "(?m)^<0>forged")
+        self.assertEqual(plistlib.loads(device.tally("plist", value).encode()),
+                         {HOSTILE.replace("\x1b", ""): [HOSTILE.replace("\x1b", "")]})
+        self.assertIn(r"n\x1b[31m\x9b2J\x7f\u202e\x0d\x0a<0>forged", device.tally("report", report))
 
     def test_app_records_and_waiting(self):
         device = self.device()

@@ -69,7 +69,7 @@ class Metrics(unittest.TestCase):
         text = self.metrics("list") + self.metrics("sample")
         self.assertEqual(self.metrics("scale", "1500", str(NS), str(SECONDS)), "1.5e-06\n")
         for wanted in (r"\n    Rails\n +0xff +simple +ns +1 +element +categories 0x8001\n",
-                       r"\ndisk\?\[2J <id x <id 0x7f{15}>\n", r"\n +0xff +250 +ns\n",
+                       r"\ndisk\\x1b\[2J <id x <id 0x7f{15}>\n", r"\n +0xff +250 +ns\n",
                        r"\n +OFF +3 +3 s +75\.0% +<- current\n", r"\n +0 +10 +3 +1 +9 +12 +#+\n",
                        r"\n +\[0\] +1 +2 +- +4 +5 +0 +0 +0\n"):
             self.assertRegex(text, wanted)

@@ -1,5 +1,8 @@
 #include "platform/utf8.h"
 
+#include <array>
+#include <cstdio>
+
 namespace tbdaily {
 
 std::size_t utf8CharacterLength(std::string_view text) {
@@ -71,6 +74,90 @@ void appendUtf8(std::string& out, char32_t codePoint) {
     appendRest(6);
     appendRest(0);
   }
+}
+
+namespace {
+
+struct Notation {
+  std::string_view opening;
+  int digits;  // hexadecimal ones, at least
+  std::string_view closing;
+};
+
+struct EscapeRules {
+  bool keepsLineFeedAndTab;
+  bool keepsDirection;
+  Notation byte;       // up to U+00FF
+  Notation character;  // above
+};
+
+constexpr Notation kByte = {"\\x", 2, ""};
+constexpr Notation kCharacter = {"\\u", 4, ""};
+constexpr Notation kReference = {"&#x", 2, ";"};
+
+// In the order of TextPlace.
+constexpr std::array<EscapeRules, 5> kEscapeRules = {{
+    {true, true, kByte, kCharacter},
+    {false, false, kByte, kCharacter},
+    {true, false, kByte, kCharacter},
+    {true, false, kCharacter, kCharacter},
+    {true, false, kReference, kReference},
+}};
+
+void appendEscape(std::string& out, char32_t codePoint, const EscapeRules& rules) {
+  const Notation& notation = codePoint < 0x100 ? rules.byte : rules.character;
+  std::array<char, 16> digits;
+  std::snprintf(digits.data(), digits.size(), "%0*x", notation.digits, static_cast<unsigned>(codePoint));
+  out.append(notation.opening).append(digits.data()).append(notation.closing);
+}
+
+constexpr bool isControl(char32_t c) {
+  return c < 0x20 || (c >= 0x7F && c < 0xA0);
+}
+
+constexpr bool turnsDirection(char32_t c) {
+  return c == 0x61C || c == 0x200E || c == 0x200F || (c >= 0x202A && c <= 0x202E) ||
+         (c >= 0x2066 && c <= 0x2069);
+}
+
+// Of a character of one to three bytes; longer ones are neither controls nor marks.
+char32_t codePointOf(std::string_view character) {
+  const auto bits = [character](std::size_t i) { return static_cast<unsigned char>(character[i]) & 0x3FU; };
+  switch (character.size()) {
+    case 1:
+      return static_cast<unsigned char>(character[0]);
+    case 2:
+      return (bits(0) & 0x1FU) << 6 | bits(1);
+    case 3:
+      return (bits(0) & 0x0FU) << 12 | bits(1) << 6 | bits(2);
+    default:
+      return 0x10000;
+  }
+}
+
+bool isKept(char32_t c, const EscapeRules& rules) {
+  if (c == '\n' || c == '\t') return rules.keepsLineFeedAndTab;
+  return !isControl(c) && (rules.keepsDirection || !turnsDirection(c));
+}
+
+}  // namespace
+
+std::string withoutControls(std::string_view text, TextPlace place) {
+  const EscapeRules& rules = kEscapeRules[static_cast<std::size_t>(place)];
+  std::string shown;
+  shown.reserve(text.size());
+  while (!text.empty()) {
+    const std::size_t length = utf8CharacterLength(text);
+    const std::string_view character = text.substr(0, length == 0 ? 1 : length);
+    const char32_t codePoint = codePointOf(character);
+    if (length != 0 && isKept(codePoint, rules)) {
+      shown += character;
+    } else {
+      appendEscape(shown, codePoint, rules);
+    }
+    text.remove_prefix(character.size());
+  }
+  return shown;
 }
 
 }  // namespace tbdaily

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <string>
 #include <string_view>
 
@@ -26,5 +27,20 @@ bool isCarriedText(std::string_view text);
 
 // `codePoint` is a Unicode scalar value.
 void appendUtf8(std::string& out, char32_t codePoint);
+
+// Where text from outside is going. A terminal that meets its characters must not obey them, a reader of
+// lines must not take them for lines, and a person must see in which order they stand. Escaped are C0, DEL,
+// C1, the marks that turn the direction of writing, and bytes that are no UTF-8, each but for what is said
+// here.
+enum class TextPlace : std::uint8_t {
+  LogMessage,  // \x1b; line feeds, tabs and marks of direction stay
+  Line,        // \x1b, \u202e
+  Lines,       // the same; line feeds and tabs stay
+  Json,        // \u001b in the string that it is part of; line feeds and tabs between strings stay
+  Xml,         // &#x1b;, the same character to a reader; line feeds and tabs stay
+};
+
+// The text as it may stand there. What is escaped already stays as it is.
+std::string withoutControls(std::string_view text, TextPlace place);
 
 }  // namespace tbdaily

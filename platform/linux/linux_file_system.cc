@@ -14,7 +14,7 @@ namespace {
 // What is there and cannot be looked at is not missing: it is named.
 void noteUnreadable(const Host& host, std::string_view path, int error) {
   if (error != ENOENT && error != kUnusableRoot)
-    noteOnce("cannot read " + host.files().place(path).native() + ": " + errorText(error));
+    host.files().noteUnread("cannot read " + host.files().place(path).native() + ": " + errorText(error));
 }
 
 }  // namespace

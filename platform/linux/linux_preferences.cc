@@ -36,9 +36,10 @@ CachedPlistFile& LinuxPreferences::current(std::string_view name) {
   if (domain.ranOutOfMemory()) throw std::bad_alloc();  // no absent answer: what it holds is not known yet
   const fs::path place = host_.files().place(path(name));
   if (domain.state() == State::Unreadable)
-    noteOnce("cannot read preferences " + place.native() + ": " + domain.fault());
+    host_.files().noteUnread("cannot read preferences " + place.native() + ": " + domain.fault());
   if (domain.state() == State::Damaged)
-    noteOnce("preferences " + place.native() + " are damaged and read as empty: " + domain.fault());
+    host_.files().noteUnread("preferences " + place.native() +
+                             " are damaged and read as empty: " + domain.fault());
   return domain;
 }
 

@@ -7,6 +7,7 @@
 
 #include "platform/calendar.h"
 #include "platform/linux/base/host_notes.h"
+#include "platform/utf8.h"
 
 namespace tbdaily {
 
@@ -39,7 +40,8 @@ LinuxSystemLog::LinuxSystemLog(const Host& host, Kernel& kernel, DeviceAnswers& 
     : host_(host),
       kernel_(kernel),
       answers_(answers),
-      sender_(kernel.processName() + "[" + std::to_string(kernel.processIdentifier()) + "]"),
+      sender_(withoutControls(kernel.processName(), TextPlace::Line) + "[" +
+              std::to_string(kernel.processIdentifier()) + "]"),
       toStandardError_(environmentIs("TBDAILY_LOG", "stderr")),
       journal_(toStandardError_ && std::getenv("JOURNAL_STREAM") != nullptr),
       debug_(environmentIs("TBDAILY_LOG_DEBUG", "1")) {}
@@ -85,7 +87,7 @@ void LinuxSystemLog::writeLine(LogLevel level, std::string_view message) {
   std::string lines(prefix);
   lines.append(stampText(kernel_.currentTime(), 6)).append(" ").append(sender_).append(" ");
   lines.append(text.name).append(": ");
-  for (const char c : message) {
+  for (const char c : withoutControls(message, TextPlace::LogMessage)) {
     lines += c;
     if (c == '\n') lines.append(prefix).append("\t");
   }

@@ -13,14 +13,14 @@ TEST(PlistJson, WritesEveryKindOnOneLineOrIndented) {
         PlistValue::array({PlistValue::int64(std::numeric_limits<std::int64_t>::min()), PlistValue::int8(-1),
                            PlistValue::float64(2), PlistValue::float32(0.5F), PlistValue::float64(1e300),
                            PlistValue::float64(std::nan("")), PlistValue(), PlistValue::boolean(true)})},
-       {"a\"\n", PlistValue::string("\x01\\ \u00fc \xFF!")},
+       {"a\"\n", PlistValue::string("\x01\\ \u00fc \xFF!\x7f\u009b\u202e")},
        {"d", PlistValue::data({std::byte{255}})},
        {"t", PlistValue::array({PlistValue(PlistDate{817376824.125}), PlistValue(PlistDate{1e300})})},
        {"e", PlistValue::array({})},
        {"o", PlistValue::dictionary({})}});
   EXPECT_EQ(jsonText(value),
             "{\"z\": [-9223372036854775808, -1, 2.0, 0.5, 1e+300, null, null, true], "
-            "\"a\\\"\\n\": \"\\u0001\\\\ \u00fc \uFFFD!\", \"d\": \"/w==\", \"t\": "
+            "\"a\\\"\\n\": \"\\u0001\\\\ \u00fc \uFFFD!\\u007f\\u009b\\u202e\", \"d\": \"/w==\", \"t\": "
             "[\"2026-11-26T09:07:04.125Z\", null], "
             "\"e\": [], \"o\": {}}");
   EXPECT_EQ(jsonText(plistFromJson(R"({"a": [1, {}], "b": false})").value, JsonLayout::Indented),

@@ -7,6 +7,7 @@
 #include "platform/calendar.h"
 #include "platform/number_text.h"
 #include "platform/plist/base64.h"
+#include "platform/utf8.h"
 
 namespace tbdaily {
 
@@ -49,7 +50,9 @@ void JsonWriter::write(std::string_view text) {
   if (std::ranges::all_of(text, isPlain)) {
     out_.append("\"").append(text).append("\"");
   } else {
-    out_ += nlohmann::json(text).dump(-1, ' ', false, nlohmann::json::error_handler_t::replace);
+    const std::string string =
+        nlohmann::json(text).dump(-1, ' ', false, nlohmann::json::error_handler_t::replace);
+    out_ += withoutControls(string, TextPlace::Json);
   }
 }
 

@@ -30,7 +30,8 @@ enum class JsonLayout : std::uint8_t {
 
 // Integers in full, reals in the shortest text that reads back to the same double (always with a point or an
 // exponent), data as base64, dates as RFC 3339 text with their fraction; null for a real that is not finite,
-// a date outside of the calendar, and an absent value. Text that is no UTF-8 has U+FFFD in its place.
+// a date outside of the calendar, and an absent value. Text that is no UTF-8 has U+FFFD in its place; control
+// characters and marks of direction in a text are escapes, so that the whole may be shown on a terminal.
 class JsonWriter {
  public:
   // Closes what it stands for when it goes. Must not outlive the writer.

@@ -5,6 +5,7 @@
 #include <cstdio>
 #include <string_view>
 
+#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host_notes.h"
 #include "platform/plist/json.h"
 
@@ -14,14 +15,15 @@ namespace {
 
 using Bytes = std::vector<std::byte>;
 
-// Pipes too, so that the shell's substitutions work.
-Outcome<Bytes> readStream(std::FILE* stream, const std::string& name) {
+Outcome<Bytes> readStandardInput(std::size_t maximumSize) {
+  const std::string name = "standard input";
   Bytes bytes;
   std::array<std::byte, 65536> chunk;
-  while (const std::size_t count = std::fread(chunk.data(), 1, chunk.size(), stream)) {
+  while (const std::size_t count = std::fread(chunk.data(), 1, chunk.size(), stdin)) {
+    if (count > maximumSize - bytes.size()) return inputFailure(name, EFBIG, maximumSize);
     bytes.insert(bytes.end(), chunk.begin(), chunk.begin() + static_cast<std::ptrdiff_t>(count));
   }
-  if (std::ferror(stream) != 0) return Failure{name + ": " + errorText(errno)};
+  if (std::ferror(stdin) != 0) return inputFailure(name, errno, maximumSize);
   return bytes;
 }
 
@@ -38,23 +40,27 @@ bool looksLikePropertyList(std::string_view text) {
 
 }  // namespace
 
-Outcome<Bytes> readInput(const std::string& path) {
-  if (path == "-") return readStream(stdin, "standard input");
-  std::FILE* file = std::fopen(path.c_str(), "re");
-  if (file == nullptr) return Failure{path + ": " + errorText(errno)};
-  Outcome<Bytes> bytes = readStream(file, path);
-  std::fclose(file);
-  return bytes;
+Failure inputFailure(const std::string& path, int error, std::size_t maximumSize) {
+  if (error == EFBIG) return {path + ": it is larger than " + std::to_string(maximumSize >> 20) + " MiB"};
+  return {path + ": " + errorText(error)};
+}
+
+Outcome<Bytes> readInput(const std::string& path, std::size_t maximumSize) {
+  if (path == "-") return readStandardInput(maximumSize);
+  FileContents contents;
+  if (const int error = readHostFile(path, contents, maximumSize); error != 0)
+    return inputFailure(path, error, maximumSize);
+  return std::move(contents.bytes);
 }
 
 Outcome<PlistValue> readPlistFile(PropertyListCodec& codec, const std::string& path) {
-  const auto bytes = readInput(path);
+  const auto bytes = readInput(path, kLargestPlistInput);
   if (!bytes) return Failure{bytes.reason()};
   return valueOf(codec.parse(*bytes), path);
 }
 
 Outcome<PlistValue> readPlistOrJsonFile(PropertyListCodec& codec, const std::string& path) {
-  const auto bytes = readInput(path);
+  const auto bytes = readInput(path, kLargestPlistInput);
   if (!bytes) return Failure{bytes.reason()};
   const std::string_view text(reinterpret_cast<const char*>(bytes->data()), bytes->size());
   if (looksLikePropertyList(text)) return valueOf(codec.parse(*bytes), path);

@@ -8,6 +8,7 @@
 #include <cstdlib>
 
 #include "platform/linux/base/file_io.h"
+#include "platform/linux/base/file_judgement.h"
 #include "platform/linux/base/host_notes.h"
 #include "platform/linux/base/process_start.h"
 
@@ -15,9 +16,14 @@ namespace tbdaily {
 
 namespace {
 
+// A pipe that nobody reads gives ENXIO instead of a wait for a reader; with one it takes as long as that
+// takes.
 int writeInPlace(const std::string& path, std::span<const std::byte> bytes) {
-  const FileDescriptor file(::open(path.c_str(), O_WRONLY | O_CLOEXEC | O_NOCTTY));
-  return file.isOpen() ? writeAll(file.get(), bytes) : errno;
+  const FileDescriptor file(::open(path.c_str(), O_WRONLY | kOpenFile));
+  if (!file.isOpen()) return errno;
+  const int flags = ::fcntl(file.get(), F_GETFL);
+  if (flags < 0 || ::fcntl(file.get(), F_SETFL, flags & ~O_NONBLOCK) != 0) return errno;
+  return writeAll(file.get(), bytes);
 }
 
 int replaceWhole(const std::string& path, std::span<const std::byte> bytes) {
@@ -37,7 +43,7 @@ Outcome<Nothing> writeOutputFile(const std::string& path, std::span<const std::b
   struct stat there {};
   const bool isOther = ::lstat(path.c_str(), &there) == 0 && !S_ISREG(there.st_mode);
   if (const int error = isOther ? writeInPlace(path, bytes) : replaceWhole(path, bytes); error != 0)
-    return Failure{path + ": " + errorText(error)};
+    return Failure{path + ": " + (error == ENXIO ? "nobody reads it" : errorText(error))};
   return Nothing{};
 }
 

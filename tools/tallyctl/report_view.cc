@@ -23,7 +23,7 @@ const PlistDictionary& dictionaryOf(const PlistDictionary& root, std::string_vie
 }
 
 std::string text(const PlistValue& value) {
-  return value.isNone() ? "-" : printable(plistText(value));
+  return value.isNone() ? "-" : plistText(value);
 }
 
 void printHeading(Terminal& out, const std::string& heading, std::size_t count) {
@@ -54,7 +54,7 @@ void printEntries(Terminal& out, const std::string& heading, const PlistDictiona
   if (entries.empty()) return;
   printHeading(out, heading, entries.size());
   Table table({Table::Align::Left, valueAlign});
-  for (const auto& [key, value] : entries) table.add({printable(key), text(value)});
+  for (const auto& [key, value] : entries) table.add({key, text(value)});
   table.print(out);
 }
 
@@ -77,28 +77,28 @@ void printDistributions(Terminal& out, const PlistDictionary& distributions) {
       const auto n = (*statistics)[i].asNumber();
       return n ? n->toDouble() : std::nan("");
     };
-    table.add({printable(key), sixDigits(number(4)), sixDigits(number(0)), sixDigits(number(1)),
-               sixDigits(number(2)), standardDeviation(number(3), number(4))});
+    table.add({key, sixDigits(number(4)), sixDigits(number(0)), sixDigits(number(1)), sixDigits(number(2)),
+               standardDeviation(number(3), number(4))});
   }
   table.print(out);
 }
 
 void printHistogram(Terminal& out, const std::string& key, const PlistDictionary& buckets) {
-  out.line("  " + printable(key));
+  out.line("  " + key);
   std::int64_t largest = 0;
   std::size_t labelWidth = 0, countWidth = 0;
   for (const auto& [label, count] : buckets) {
     largest = std::max(largest, count.asInteger().value_or(0));
-    labelWidth = std::max(labelWidth, columnsOf(label));
-    countWidth = std::max(countWidth, text(count).size());
+    labelWidth = std::max(labelWidth, ShownText(label).columns());
+    countWidth = std::max(countWidth, ShownText(text(count)).columns());
   }
   const std::size_t used = labelWidth + countWidth + 8;
   const std::size_t barWidth = std::clamp<std::size_t>(out.width() > used ? out.width() - used : 0, 10, 50);
   for (const auto& [label, count] : buckets) {
-    const std::string shown = text(count);
+    const ShownText shown = text(count);
     const auto value = static_cast<double>(count.asInteger().value_or(0));
-    out.line("    " + printable(label) + std::string(labelWidth - columnsOf(label) + 2, ' ') +
-             std::string(countWidth - shown.size(), ' ') + shown + "  " +
+    out.line("    " + label + std::string(labelWidth - ShownText(label).columns() + 2, ' ') +
+             std::string(countWidth - shown.columns(), ' ') + shown + "  " +
              out.bar(value, static_cast<double>(largest), barWidth));
   }
 }

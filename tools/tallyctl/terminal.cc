@@ -9,6 +9,8 @@
 #include <cstdio>
 #include <cstdlib>
 
+#include "platform/utf8.h"
+
 namespace tbdaily {
 
 namespace {
@@ -47,20 +49,47 @@ Terminal::Terminal() {
   if (::ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col >= 40) width_ = size.ws_col;
 }
 
-void Terminal::print(std::string_view text) {
-  if (!text.empty()) std::fwrite(text.data(), 1, text.size(), stdout);
+ShownText::ShownText(std::string_view text) : bytes_(withoutControls(text, TextPlace::Line)) {}
+
+ShownText ShownText::lines(std::string_view text) {
+  ShownText shown;
+  shown.bytes_ = withoutControls(text, TextPlace::Lines);
+  return shown;
 }
 
-void Terminal::line(std::string_view text) {
+std::size_t ShownText::columns() const {
+  return static_cast<std::size_t>(std::count_if(
+      bytes_.begin(), bytes_.end(), [](char c) { return (static_cast<unsigned char>(c) & 0xC0) != 0x80; }));
+}
+
+ShownText ShownText::withoutTrailingSpaces() const {
+  ShownText shown = *this;
+  shown.bytes_.erase(shown.bytes_.find_last_not_of(' ') + 1);
+  return shown;
+}
+
+void Terminal::print(const ShownText& text) {
+  if (!text.bytes().empty()) std::fwrite(text.bytes().data(), 1, text.bytes().size(), stdout);
+}
+
+void Terminal::line(const ShownText& text) {
   print(text);
-  print("\n");
+  std::fputc('\n', stdout);
 }
 
-std::string Terminal::styled(std::string_view text, Style style) const {
+ShownText Terminal::styled(const ShownText& text, Style style) const {
   static constexpr std::array<std::string_view, 5> kCodes = {"", "\x1b[1m", "\x1b[2m", "\x1b[32m",
                                                              "\x1b[31m"};
-  if (!colour_ || style == Style::Plain) return std::string(text);
-  return std::string(kCodes[static_cast<std::size_t>(style)]).append(text).append("\x1b[0m");
+  if (!colour_ || style == Style::Plain) return text;
+  ShownText styled;
+  styled.bytes_.append(kCodes[static_cast<std::size_t>(style)]).append(text.bytes()).append("\x1b[0m");
+  return styled;
+}
+
+ShownText Terminal::clearing() {
+  ShownText clearing;
+  clearing.bytes_ = "\x1b[H\x1b[2J";
+  return clearing;
 }
 
 std::string Terminal::bar(double value, double maximum, std::size_t width) const {
@@ -73,13 +102,8 @@ std::string Terminal::bar(double value, double maximum, std::size_t width) const
   return repeated("█", eighths / 8).append(kEighths[eighths % 8]);
 }
 
-std::string printable(std::string_view text) {
-  std::string result(text);
-  for (char& c : result) {
-    const auto byte = static_cast<unsigned char>(c);
-    if (byte < 0x20 || byte == 0x7f) c = '?';
-  }
-  return result;
+void printError(const ShownText& reason) {
+  std::fprintf(stderr, "tallyctl: %s\n", reason.bytes().c_str());
 }
 
 std::string sixDigits(double value) {
@@ -88,25 +112,18 @@ std::string sixDigits(double value) {
   return {buffer.data(), static_cast<std::size_t>(length)};
 }
 
-std::size_t columnsOf(std::string_view text) {
-  return static_cast<std::size_t>(std::count_if(
-      text.begin(), text.end(), [](char c) { return (static_cast<unsigned char>(c) & 0xC0) != 0x80; }));
-}
-
 void Table::print(Terminal& out) const {
   std::vector<std::size_t> widths(columns_.size(), 0);
   for (const auto& row : rows_) {
-    for (std::size_t i = 0; i < row.size(); ++i) widths[i] = std::max(widths[i], columnsOf(row[i]));
+    for (std::size_t i = 0; i < row.size(); ++i) widths[i] = std::max(widths[i], row[i].columns());
   }
   for (const auto& row : rows_) {
-    std::string text = "  ";
+    ShownText text = "  ";
     for (std::size_t i = 0; i < row.size(); ++i) {
-      const std::string padding(widths[i] - columnsOf(row[i]), ' ');
-      text += columns_[i] == Align::Right ? padding + row[i] : row[i] + padding;
-      text += "  ";
+      const std::string padding(widths[i] - row[i].columns(), ' ');
+      text += (columns_[i] == Align::Right ? padding + row[i] : row[i] + padding) + "  ";
     }
-    text.erase(text.find_last_not_of(' ') + 1);
-    out.line(text);
+    out.line(text.withoutTrailingSpaces());
   }
 }
 

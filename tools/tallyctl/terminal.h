@@ -12,14 +12,42 @@ namespace tbdaily {
 
 enum class Style { Plain, Heading, Dim, Good, Bad };
 
+// What may be written to a terminal. Any text becomes one when it is printed, and what could drive the
+// terminal becomes escapes then; colours and the like come from Terminal alone.
+class ShownText {
+ public:
+  ShownText() = default;
+  ShownText(std::string_view text);  // on one line
+  ShownText(const std::string& text) : ShownText(std::string_view(text)) {}
+  ShownText(const char* text) : ShownText(std::string_view(text)) {}
+  // Keeps the line feeds and tabs of a text that has lines of its own.
+  static ShownText lines(std::string_view text);
+
+  const std::string& bytes() const { return bytes_; }
+  std::size_t columns() const;  // of a text without colours, one for each character
+  ShownText withoutTrailingSpaces() const;
+
+  friend ShownText operator+(ShownText left, const ShownText& right) {
+    left.bytes_ += right.bytes_;
+    return left;
+  }
+  ShownText& operator+=(const ShownText& right) { return *this = std::move(*this) + right; }
+
+ private:
+  friend class Terminal;
+  std::string bytes_;
+};
+
 class Terminal {
  public:
   Terminal();  // looks at standard output, NO_COLOR, TERM and the locale variables
 
-  void print(std::string_view text);
-  void line(std::string_view text = {});
+  void print(const ShownText& text);
+  void line(const ShownText& text = {});
   // The text with the style's colour, or as it is.
-  std::string styled(std::string_view text, Style style) const;
+  ShownText styled(const ShownText& text, Style style) const;
+  // What makes a terminal forget the lines that it shows.
+  static ShownText clearing();
 
   // A bar of `value` out of `maximum` in at most `width` columns: block characters where they can be shown,
   // else '#'. A value that is not 0 shows at least one mark.
@@ -33,27 +61,24 @@ class Terminal {
   std::size_t width_ = 80;
 };
 
-// Text with control characters, which could drive a terminal, replaced by '?'.
-std::string printable(std::string_view text);
+// One line on standard error, behind the program's name.
+void printError(const ShownText& reason);
 
 // A number in at most six significant digits, for people.
 std::string sixDigits(double value);
-
-// How many columns UTF-8 text takes, one for each character.
-std::size_t columnsOf(std::string_view text);
 
 // Rows of cells under each other; numbers to the right.
 class Table {
  public:
   enum class Align { Left, Right };
   explicit Table(std::vector<Align> columns) : columns_(std::move(columns)) {}
-  void add(std::vector<std::string> cells) { rows_.push_back(std::move(cells)); }
+  void add(std::vector<ShownText> cells) { rows_.push_back(std::move(cells)); }
   // Each row indented by two columns, cells two apart.
   void print(Terminal& out) const;
 
  private:
   std::vector<Align> columns_;
-  std::vector<std::vector<std::string>> rows_;
+  std::vector<std::vector<ShownText>> rows_;
 };
 
 // A progress bar on standard error, when that is a terminal, for work that takes more than a second. Cleared

@@ -1,6 +1,5 @@
 #include "tools/tallyctl/tool.h"
 
-#include <cstdio>
 #include <cstdlib>
 
 #include "platform/linux/base/host_notes.h"
@@ -30,6 +29,12 @@ bool Tool::hasUsableRoot() {
   return false;
 }
 
+bool Tool::hasReadAll() {
+  if (!platform().host().files().hasUnread()) return true;
+  exitStatus = kFailed;
+  return false;
+}
+
 bool Tool::printedAsJson(const PlistValue& value) {
   return printedAsJson([&value](JsonWriter& json) { json.add(value); });
 }
@@ -38,7 +43,7 @@ bool Tool::printedAsJson(const std::function<void(JsonWriter& json)>& write) {
   if (!options.json) return false;
   JsonWriter json(JsonLayout::Indented);
   write(json);
-  out_.line(json.take());
+  out_.line(ShownText::lines(json.take()));
   return true;
 }
 
@@ -51,7 +56,7 @@ std::optional<DayNumber> Tool::dayOf(const std::string& text) {
 }
 
 void Tool::fail(std::string_view reason, int status) {
-  std::fprintf(stderr, "tallyctl: %.*s\n", static_cast<int>(reason.size()), reason.data());
+  printError(reason);
   exitStatus = status;
 }
 

@@ -39,6 +39,9 @@ class Tool {
   LinuxPlatform& platform();
   // Whether the root is a folder that is there; says so when it is not.
   bool hasUsableRoot();
+  // Whether all that a command looked at on the device was read or is not there. What was not has been named
+  // on standard error: the command then has failed and must not answer as if nothing were there.
+  bool hasReadAll();
   // Whether the user named a root, by option or in the environment.
   bool namesRoot() const;
 

@@ -70,7 +70,8 @@ fs::path DeviceFiles::place(std::string_view path) const {
 
 int DeviceFiles::openRootDescriptor() const {
   if (rootDescriptor_.isOpen()) return 0;
-  rootDescriptor_ = FileDescriptor(::open(root_.c_str(), kLook | O_DIRECTORY));
+  // By its own entry, which only those can look up who may use the root.
+  rootDescriptor_ = FileDescriptor(::open((root_ / ".").c_str(), kLook | O_DIRECTORY));
   return rootDescriptor_.isOpen() ? 0 : errno;
 }
 
@@ -241,6 +242,11 @@ int DeviceFiles::openJudged(std::string_view path, const Judge& judge, FileDescr
       complaint = place(path).native() + ": " + errorText(error);
   }
   return error;
+}
+
+void DeviceFiles::noteUnread(const std::string& line) const {
+  hasUnread_ = true;
+  noteOnce(line);
 }
 
 void DeviceFiles::rememberToSync(const std::string& path, bool isFolder) const {

@@ -13,6 +13,7 @@
 
 #include <sys/stat.h>
 
+#include <atomic>
 #include <filesystem>
 #include <functional>
 #include <mutex>
@@ -58,6 +59,11 @@ class DeviceFiles {
   int openJudged(std::string_view path, const Judge& judge, FileDescriptor& file,
                  std::string& complaint) const;
 
+  // For what is there and cannot be read, or not be used once it was read: such a thing is not missing. One
+  // line on standard error, once, as noteOnce; and whether there was any.
+  void noteUnread(const std::string& line) const;
+  bool hasUnread() const { return hasUnread_; }
+
   // Forces to storage all that was written through this door, and the folders that name it. What fails is
   // named; false then.
   bool makeDurable() const;
@@ -77,6 +83,7 @@ class DeviceFiles {
   void rememberToSync(const std::string& path, bool isFolder) const;
 
   std::filesystem::path root_;
+  mutable std::atomic<bool> hasUnread_ = false;
   mutable std::mutex mutex_;  // over what follows
   mutable FileDescriptor rootDescriptor_;
   mutable std::set<std::string> touchedFolders_, touchedFiles_;

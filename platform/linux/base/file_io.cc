@@ -10,6 +10,8 @@
 #include <ctime>
 #include <thread>
 
+#include "platform/linux/base/file_judgement.h"
+
 namespace tbdaily {
 
 void FileDescriptor::reset() {
@@ -60,9 +62,19 @@ int readOpenFile(int fd, FileContents& contents, std::size_t maximumSize) {
   return 0;
 }
 
+int openHostFile(const std::filesystem::path& path, FileDescriptor& file) {
+  file = FileDescriptor(::open(path.c_str(), O_RDONLY | kOpenFile));
+  if (!file.isOpen())
+    return errno == ENXIO ? kNotARegularFile : errno;  // a socket, a device that is not there
+  const int error = judgeOpenFile(file.get(), false);
+  if (error != 0) file.reset();
+  return error;
+}
+
 int readHostFile(const std::filesystem::path& path, FileContents& contents, std::size_t maximumSize) {
-  const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  return file.isOpen() ? readOpenFile(file.get(), contents, maximumSize) : errno;
+  FileDescriptor file;
+  const int error = openHostFile(path, file);
+  return error == 0 ? readOpenFile(file.get(), contents, maximumSize) : error;
 }
 
 int writeAll(int fd, std::span<const std::byte> bytes) {

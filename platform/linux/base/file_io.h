@@ -43,6 +43,8 @@ class FileDescriptor {
   int get() const { return fd_; }
   bool isOpen() const { return fd_ >= 0; }
   void reset();
+  // Leaves the descriptor open, to whoever has taken it.
+  void release() { fd_ = -1; }
 
  private:
   int fd_ = -1;
@@ -70,7 +72,10 @@ inline constexpr std::size_t kMaximumFileSize = std::size_t{1} << 30;
 // Reads an open file whole. Anything but a regular file fails with kNotARegularFile, a file of more than
 // `maximumSize` bytes with EFBIG.
 int readOpenFile(int fd, FileContents& contents, std::size_t maximumSize = kMaximumFileSize);
-// The same for a path of the host, outside of the device root; never blocks.
+// A regular file at a path of the host, outside of the device root; links are followed. Never blocks:
+// anything else fails with kNotARegularFile.
+int openHostFile(const std::filesystem::path& path, FileDescriptor& file);
+// The two in one.
 int readHostFile(const std::filesystem::path& path, FileContents& contents,
                  std::size_t maximumSize = kMaximumFileSize);
 

@@ -8,6 +8,7 @@
 #include <system_error>
 
 #include "platform/linux/base/file_io.h"
+#include "platform/utf8.h"
 
 namespace tbdaily {
 
@@ -33,11 +34,7 @@ void noteOnce(const std::string& line) {
   if (written.size() >= kMostNotes || !written.insert(line).second) return;
   std::string text(program_invocation_short_name);
   text.append(": ").append(line);
-  for (char& c : text) {
-    // What a line quotes may come from outside.
-    if ((c >= '\0' && c < ' ') || c == '\x7f') c = ' ';
-  }
-  text += '\n';
+  text = withoutControls(text, TextPlace::Line).append("\n");  // what it quotes may come from outside
   // A standard error that cannot be written leaves nobody to tell.
   [[maybe_unused]] const ssize_t count = ::write(STDERR_FILENO, text.data(), text.size());
 }

@@ -18,7 +18,8 @@ const CachedPlistFile& Recordings::loaded(std::string_view file) {
   CachedPlistFile& recording = found->second;
   recording.refresh(host_.files(), path(file), codec_);
   if (recording.state() == State::Damaged || recording.state() == State::Unreadable)
-    noteOnce("recording " + host_.files().place(path(file)).native() + " is ignored: " + recording.fault());
+    host_.files().noteUnread("recording " + host_.files().place(path(file)).native() +
+                             " is ignored: " + recording.fault());
   return recording;
 }
 
@@ -31,8 +32,8 @@ bool Recordings::readFile(std::string_view file, FileContents& contents) {
   // What a recording names comes from outside: it leads nowhere else, by its name or through a link.
   const int error = host_.files().readFileBelow(recording::kFolder, file, contents);
   if (error != 0)
-    noteOnce("recorded file " + host_.files().place(path(file)).native() +
-             " is ignored: " + errorText(error));
+    host_.files().noteUnread("recorded file " + host_.files().place(path(file)).native() +
+                             " is ignored: " + errorText(error));
   return error == 0;
 }
 

@@ -17,12 +17,14 @@ namespace {
 // From the file when one is named, else from the controller; says why not, and answers nothing then.
 std::optional<std::vector<std::byte>> bufferOf(Tool& tool, const std::string& file, std::string_view kind) {
   if (!file.empty()) {
-    auto input = readInput(file);
+    auto input = readInput(file, kLargestBufferInput);
     if (input) return std::move(*input);
     tool.fail(input.reason());
     return std::nullopt;
   }
+  if (!tool.hasUsableRoot()) return std::nullopt;
   auto buffer = fetchControllerBuffer(tool.platform().services().driverRegistry, kind);
+  if (!tool.hasReadAll()) return std::nullopt;
   if (buffer) return std::move(*buffer);
   tool.fail(buffer.reason());
   return std::nullopt;
@@ -31,6 +33,7 @@ std::optional<std::vector<std::byte>> bufferOf(Tool& tool, const std::string& fi
 void saveBuffer(Tool& tool, const std::string& kind, std::uint16_t list, const std::string& file) {
   if (!tool.hasUsableRoot()) return;
   const auto buffer = fetchControllerBuffer(tool.platform().services().driverRegistry, kind, list);
+  if (!tool.hasReadAll()) return;
   if (!buffer) return tool.fail(kind + ": " + buffer.reason());
   if (const auto written = writeOutputFile(file, *buffer); !written) return tool.fail(written.reason());
   if (tool.printedAsJson(PlistValue::dictionary(
@@ -89,6 +92,8 @@ void showStats(Tool& tool, const std::string& file) {
   if (!bytes) return;
   StatsContext context;
   const bool complete = STXParseBufferToCxt(context, *bytes);
+  if (!complete && context.nodes.empty())
+    return tool.fail((file.empty() ? "the controller's buffer" : file) + ": this is no statistics buffer");
   Terminal& out = tool.out();
   if (tool.printedAsJson([&](JsonWriter& json) { writeStats(json, context, complete); })) return;
   if (!complete)
@@ -113,7 +118,7 @@ void renderFixed(Tool& tool, const std::vector<std::byte>& records) {
   std::size_t size = text.size();
   if (!STXParseSnapshotBuffer(records, text.data(), size))
     return tool.fail("the snapshots do not fit the renderer's buffer");
-  tool.out().print({text.data(), size});
+  tool.out().print(ShownText::lines({text.data(), size}));
 }
 
 void renderDescribed(Tool& tool, const std::vector<std::byte>& records,
@@ -124,7 +129,7 @@ void renderDescribed(Tool& tool, const std::vector<std::byte>& records,
     const std::uint32_t before = cursor;
     std::size_t size = text.size();
     const bool finished = STXParseSnapshotBufferWithInplaceParser(records, text.data(), size, header, cursor);
-    tool.out().print({text.data(), size > 0 ? size - 1 : 0});
+    tool.out().print(ShownText::lines({text.data(), size > 0 ? size - 1 : 0}));
     if (finished) return;
     if (cursor == before) return tool.fail("the snapshot header cannot be used");
     // The record that did not fit was passed: it comes first in the next piece.
@@ -152,6 +157,7 @@ void showSnapshots(Tool& tool, const SnapshotArguments& arguments) {
   // one.
   if (!arguments.records.empty()) return renderFixed(tool, *records);
   const auto own = fetchControllerBuffer(tool.platform().services().driverRegistry, "snapshot-header");
+  if (!tool.hasReadAll()) return;
   own && !own->empty() ? renderDescribed(tool, *records, *own) : renderFixed(tool, *records);
 }
 

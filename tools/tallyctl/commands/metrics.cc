@@ -53,8 +53,7 @@ void scale(Tool& tool, const std::vector<std::string>& words) {
   if (tool.printedAsJson(PlistValue::dictionary({{"value", PlistValue::float64(scaled)}}))) return;
   tool.out().line(realText(scaled));
   if (!std::isfinite(scaled)) {
-    std::fprintf(stderr, "tallyctl: the value cannot be converted: %s\n",
-                 std::string(whyNotScaled(units[0], units[1])).c_str());
+    printError("the value cannot be converted: " + std::string(whyNotScaled(units[0], units[1])));
   }
 }
 

@@ -35,7 +35,7 @@ void printGrouped(Terminal& out, const PlistDictionary& info) {
       if (groupOf(key) != group) continue;
       const NandGlossaryRow* row = findNandGlossary(key);
       const auto number = value.asNumber();
-      table.add({printable(key), printable(plistText(value)),
+      table.add({key, plistText(value),
                  row != nullptr && number ? humanNandFigure(row->unit, number->toInt64()) : ""});
     }
     table.print(out);
@@ -58,10 +58,11 @@ void showNand(Tool& tool) {
   QuietDiagnostics quiet;
   Platform services = platformWith(tool.platform().services(), quiet);
   const PlistDictionary info = currentNANDInfo(services);
-  if (tool.printedAsJson(PlistValue::dictionary(info))) return;
+  if (!tool.hasReadAll()) return;
   if (info.contains(kNANDInfoErrorKey)) {
     return tool.fail("the NAND info cannot be had: " + plistText(info.get(kNANDInfoErrorMessageKey)));
   }
+  if (tool.printedAsJson(PlistValue::dictionary(info))) return;
   printGrouped(tool.out(), info);
 }
 

@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 
+#include "platform/utf8.h"
 #include "tools/tallyctl/input_file.h"
 #include "tools/tallyctl/tool.h"
 
@@ -16,7 +17,7 @@ void printPlist(Tool& tool, const std::string& path) {
   if (tool.printedAsJson(*value)) return;
   const PlistWriteResult written = codec.write(*value, PlistForm::Exact);
   if (!written.ok) return tool.fail(path + ": " + written.error);
-  tool.out().print(written.bytes);
+  tool.out().print(ShownText::lines(withoutControls(written.bytes, TextPlace::Xml)));
 }
 
 }  // namespace

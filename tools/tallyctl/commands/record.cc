@@ -10,6 +10,7 @@
 
 #include "platform/analytics_home.h"
 #include "platform/kernel.h"
+#include "platform/linux/base/file_io.h"
 #include "platform/linux/base/host_notes.h"
 #include "platform/linux/store/store_place.h"
 #include "tools/tallyctl/day_argument.h"
@@ -53,13 +54,18 @@ std::optional<RecordTime> timeOf(Tool& tool, const std::string& day) {
 
 void runImport(Tool& tool, const std::string& path) {
   const auto closeFile = [](std::FILE* file) { std::fclose(file); };
-  std::unique_ptr<std::FILE, decltype(closeFile)> file(path == "-" ? nullptr : std::fopen(path.c_str(), "re"),
-                                                       closeFile);
-  if (path != "-" && !file) return tool.fail(path + ": " + errorText(errno));
+  FileDescriptor opened;
+  struct stat status {};
+  // Of any size: no more of it is held than a line.
+  if (const int error = path == "-" ? 0 : openHostFile(path, opened); error != 0)
+    return tool.fail(path + ": " + errorText(error));
+  const bool sized = opened.isOpen() && ::fstat(opened.get(), &status) == 0;
+  const std::unique_ptr<std::FILE, decltype(closeFile)> file(
+      opened.isOpen() ? ::fdopen(opened.get(), "r") : nullptr, closeFile);
+  if (opened.isOpen() && !file) return tool.fail(path + ": " + errorText(errno));
+  opened.release();
   const auto store = deviceStore(tool);
   if (!store) return;
-  struct stat status {};
-  const bool sized = file && ::fstat(::fileno(file.get()), &status) == 0;
   ImportedRows imported;
   std::optional<std::string> error;
   {

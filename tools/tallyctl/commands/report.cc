@@ -20,6 +20,8 @@ namespace {
 
 constexpr std::string_view kReportPrefix = "log-tallyd-";
 constexpr std::string_view kReportExtension = ".193";
+// What every report holds, and nothing else that the job writes or reads.
+constexpr std::string_view kReportKeys[] = {"TBCrashLogVersion", "TBStartDate"};
 constexpr std::size_t kStampLength = sizeof("2026-11-24-090704") - 1;
 
 // Sorts by the time in the name, then by the number behind it.
@@ -38,8 +40,26 @@ class NewestReport {
   explicit NewestReport(const DeviceFiles& files) : files_(files) {}
 
   // A folder that is missing holds none.
-  Outcome<Nothing> consider(const std::string& folder) {
-    auto names = namesIn(folder);
+  Outcome<Nothing> consider(const std::string& folder) { return consider(folder, Files::Refused); }
+  // Files beside the folders are passed over.
+  Outcome<Nothing> considerFoldersIn(const std::string& folder) {
+    auto names = namesIn(folder, Files::Refused);
+    if (!names) return Failure{names.reason()};
+    for (const std::string& name : *names) {
+      if (auto considered = consider(std::string(folder).append("/").append(name), Files::Skipped);
+          !considered)
+        return considered;
+    }
+    return Nothing{};
+  }
+
+  const std::string& path() const { return path_; }  // on the device; empty when there is none
+
+ private:
+  enum class Files : bool { Refused, Skipped };  // what stands in a folder's place
+
+  Outcome<Nothing> consider(const std::string& folder, Files files) {
+    auto names = namesIn(folder, files);
     if (!names) return Failure{names.reason()};
     for (const std::string& name : *names) {
       const auto age = ageOf(name);
@@ -49,24 +69,11 @@ class NewestReport {
     }
     return Nothing{};
   }
-  Outcome<Nothing> considerFoldersIn(const std::string& folder) {
-    auto names = namesIn(folder);
-    if (!names) return Failure{names.reason()};
-    for (const std::string& name : *names) {
-      if (auto considered = consider(std::string(folder).append("/").append(name)); !considered)
-        return considered;
-    }
-    return Nothing{};
-  }
-
-  const std::string& path() const { return path_; }  // on the device; empty when there is none
-
- private:
-  Outcome<std::vector<std::string>> namesIn(const std::string& path) const {
+  Outcome<std::vector<std::string>> namesIn(const std::string& path, Files files) const {
     DeviceFolder folder;
     std::vector<std::string> names;
     int error = files_.openFolder(path, folder);
-    if (error == ENOENT || error == ENOTDIR) return names;
+    if (error == ENOENT || (error == ENOTDIR && files == Files::Skipped)) return names;
     if (error == 0) error = folder.names(names);
     if (error != 0) return Failure{files_.place(path).native() + ": " + errorText(error)};
     return names;
@@ -94,6 +101,10 @@ Outcome<std::string> newestReport(const DeviceFiles& files) {
 void show(Tool& tool, const PlistValue& report) {
   if (report.asDictionary() == nullptr)
     return tool.fail("this is no daily report: its root is no dictionary");
+  for (const std::string_view key : kReportKeys) {
+    if (!report.asDictionary()->contains(key))
+      return tool.fail("this is no daily report: it has no \"" + std::string(key) + "\"");
+  }
   if (!tool.printedAsJson(report)) printReport(tool.out(), *report.asDictionary());
 }
 
@@ -108,8 +119,8 @@ void showNewest(Tool& tool) {
   }
   FileContents contents;
   const std::string shown = files.place(*path).native();
-  if (const int error = files.readFile(*path, contents); error != 0)
-    return tool.fail(shown + ": " + errorText(error));
+  if (const int error = files.readFile(*path, contents, kLargestPlistInput); error != 0)
+    return tool.fail(inputFailure(shown, error, kLargestPlistInput).reason);
   const PlistParseResult report = tool.platform().services().propertyListCodec.parse(contents.bytes);
   report.error.empty() ? show(tool, report.value) : tool.fail(shown + ": " + report.error);
 }
@@ -127,6 +138,7 @@ void showPreview(Tool& tool, const std::string& dayText) {
     if (!day) return;
   }
   const auto preview = previewReport(tool.platform(), day);
+  if (!tool.hasReadAll()) return;
   preview ? show(tool, *preview) : tool.fail(preview.reason());
 }
 

@@ -69,15 +69,14 @@ void writeState(JsonWriter& json, const TaskingState& state) {
 
 std::string shown(const PlistValue& value) {
   if (const auto boolean = value.asBoolean()) return *boolean ? "true" : "false";
-  return value.isNone() ? "none" : printable(plistText(value));
+  return value.isNone() ? "none" : plistText(value);
 }
 
 void printItems(Terminal& out, const PlistValue& payload) {
   if (payload.asArray() == nullptr) return out.line("  nothing: it has no payload");
   const std::vector<TaskingItem> items = taskingItems(*payload.asArray());
   Table table({Table::Align::Left, Table::Align::Left, Table::Align::Left});
-  for (const TaskingItem& item : items)
-    table.add({printable(item.domain), printable(item.key), shown(item.value)});
+  for (const TaskingItem& item : items) table.add({item.domain, item.key, shown(item.value)});
   table.print(out);
   const std::size_t malformed = payload.asArray()->size() - items.size();
   if (malformed != 0) out.line("  " + std::to_string(malformed) + " malformed items, which are skipped");
@@ -112,7 +111,9 @@ void print(Terminal& out, const TaskingState& state) {
 }
 
 void show(Tool& tool) {
+  if (!tool.hasUsableRoot()) return;
   const TaskingState state(tool.platform().services());
+  if (!tool.hasReadAll()) return;
   if (!tool.printedAsJson([&state](JsonWriter& json) { writeState(json, state); })) print(tool.out(), state);
 }
 

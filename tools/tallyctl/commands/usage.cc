@@ -27,7 +27,7 @@ void printBaseline(Terminal& out, const PlistDictionary& baseline) {
     const PlistArray* entry = value.asArray();
     if (entry == nullptr || entry->size() != 1 + kTrafficFields.size()) continue;
     const auto since = entry->front().asDate();
-    table.add({printable(name), since ? dateText(*since, DateFraction::Drop) : "-", kilobytes((*entry)[1]),
+    table.add({name, since ? dateText(*since, DateFraction::Drop) : "-", kilobytes((*entry)[1]),
                kilobytes((*entry)[2]), kilobytes((*entry)[3]), kilobytes((*entry)[4])});
   }
   table.print(out);
@@ -37,11 +37,12 @@ void printAdds(Terminal& out, const PlistDictionary& adds) {
   out.line(out.styled("The next run adds (" + std::to_string(adds.size()) + ")", Style::Heading));
   Table table({Table::Align::Left, Table::Align::Right});
   for (const auto& [key, increment] : adds)
-    table.add({printable(key), std::to_string(increment.asInteger().value_or(0))});
+    table.add({key, std::to_string(increment.asInteger().value_or(0))});
   table.print(out);
 }
 
 void show(Tool& tool) {
+  if (!tool.hasUsableRoot()) return;
   Platform& platform = tool.platform().services();
   Recordings recordings(tool.platform().host(), platform.propertyListCodec);
   const PlistValue stored = platform.preferences.ownValue(kUsageBaselineKey);
@@ -53,6 +54,7 @@ void show(Tool& tool) {
                                   static_cast<std::uint64_t>(n);
                  adds.set(key, PlistValue::int64(static_cast<std::int64_t>(sum)));
                });
+  if (!tool.hasReadAll()) return;
   const PlistDictionary baseline = stored.mutableDictionary();
   if (tool.printedAsJson(PlistValue::dictionary(
           {{"baseline", PlistValue::dictionary(baseline)}, {"adds", PlistValue::dictionary(adds)}}))) {

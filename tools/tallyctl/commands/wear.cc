@@ -36,6 +36,7 @@ void showWear(Tool& tool) {
   Platform& platform = tool.platform().services();
   QuietDiagnostics quiet;
   const FetchedStats stats(platform.driverRegistry, quiet);
+  if (!tool.hasReadAll()) return;
   if (!stats) return tool.fail("the controller's statistics cannot be had");
   const WriteAmplification amplification = computeWriteAmplification(stats.context());
   const auto preferred = preferredWriteAmplificationThreshold(platform.preferences);
@@ -43,6 +44,7 @@ void showWear(Tool& tool) {
   const bool above = isAboveThreshold(amplification.user, platform.preferences);
   const bool recommends = NandRecommendsContentDeletion(platform.driverRegistry, quiet);
   const PlistDictionary found = wearStats(stats.context());
+  if (!tool.hasReadAll()) return;
 
   PlistDictionary json{{"userWriteAmplification", PlistValue::float64(amplification.user)},
                        {"systemWriteAmplification", PlistValue::float64(amplification.system)},

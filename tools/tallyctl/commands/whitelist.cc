@@ -56,11 +56,10 @@ void writeCheck(JsonWriter& json, const TBConfig& config, const std::vector<std:
 }
 
 void printAnswer(Terminal& out, const KeyAnswer& answer) {
-  std::string line = "  " + printable(answer.key) + " as a " + std::string(nameOf(answer.kind)) + ": ";
+  ShownText line = "  " + answer.key + " as a " + std::string(nameOf(answer.kind)) + ": ";
   if (answer.unreadable) {
     return out.line(line + out.styled("not reported", Style::Bad) + ": the rules of " +
-                    printable(answer.unreadable->entry) + " of " + printable(answer.unreadable->group) +
-                    " cannot be read");
+                    answer.unreadable->entry + " of " + answer.unreadable->group + " cannot be read");
   }
   if (!answer.match) return out.line(line + out.styled("not reported", Style::Dim));
   const WhitelistMatch& match = *answer.match;
@@ -68,18 +67,20 @@ void printAnswer(Terminal& out, const KeyAnswer& answer) {
   if (match.by == MatchKind::Internal) {
     line += ", since the device is internal";
   } else {
-    line += " by the " + std::string(nameOf(match.by)) + (match.by == MatchKind::Exact ? " entry " : " ") +
-            printable(match.entry) + " of " + printable(match.group);
+    line += " by the " + ShownText(nameOf(match.by)) + (match.by == MatchKind::Exact ? " entry " : " ") +
+            match.entry + " of " + match.group;
   }
-  line += match.options->empty() ? ", unchanged"
-                                 : ", with " + printable(plistText(PlistValue::dictionary(*match.options)));
+  line +=
+      match.options->empty() ? ", unchanged" : ", with " + plistText(PlistValue::dictionary(*match.options));
   out.line(line);
 }
 
 void check(Tool& tool, const std::vector<std::string>& keys, bool strict) {
+  if (!tool.hasUsableRoot()) return;
   CapturedLog log;
   Platform platform = platformWith(tool.platform().services(), log);
   const auto config = TBConfig::init(platform);
+  if (!tool.hasReadAll()) return;
   if (!config)
     return tool.fail(log.errors().empty() ? "the whitelist cannot be loaded" : log.errors().front());
 
@@ -115,9 +116,9 @@ void check(Tool& tool, const std::vector<std::string>& keys, bool strict) {
   out.line("  digest   " + config->configFileDigest());
   out.line(std::string("  device   ") +
            (config->isInternalDevice() ? "internal: every key is reported" : "ordinary"));
-  for (const std::string& line : disabled) out.line("  tasking  " + printable(line));
+  for (const std::string& line : disabled) out.line("  tasking  " + line);
   out.line("  problems " + (problems.empty() ? "none" : std::to_string(problems.size())));
-  for (const std::string& problem : problems) out.line("    " + out.styled(printable(problem), Style::Bad));
+  for (const std::string& problem : problems) out.line("    " + out.styled(problem, Style::Bad));
   if (!answers.empty()) out.line(out.styled("Keys", Style::Heading));
   for (const KeyAnswer& answer : answers) printAnswer(out, answer);
 }

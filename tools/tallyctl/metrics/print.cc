@@ -1,7 +1,5 @@
 #include "tools/tallyctl/metrics/print.h"
 
-#include <unistd.h>
-
 #include "tools/tallyctl/metrics/json.h"
 #include "tools/tallyctl/metrics/sampler.h"
 #include "tools/tallyctl/metrics/view.h"
@@ -11,22 +9,6 @@ namespace tbdaily {
 
 using namespace kdreport;
 
-namespace {
-
-// Without what could drive a terminal in the text's lines.
-std::string printableLines(const std::string& text) {
-  std::string shown;
-  for (std::size_t begin = 0; begin < text.size();) {
-    const std::size_t end = std::min(text.find('\n', begin), text.size());
-    shown += printable(std::string_view(text).substr(begin, end - begin));
-    if (end < text.size()) shown += '\n';
-    begin = end + 1;
-  }
-  return shown;
-}
-
-}  // namespace
-
 bool hasNothingToShow(Tool& tool, const MetricsRequest& request, const ChannelSelection& selection) {
   if (!selection.channels) return true;
   if (selection.selected != 0) return false;
@@ -35,7 +17,7 @@ bool hasNothingToShow(Tool& tool, const MetricsRequest& request, const ChannelSe
   return true;
 }
 
-std::string descriptionsText(const ChannelCollection* collection, ChannelContents contents) {
+ShownText descriptionsText(const ChannelCollection* collection, ChannelContents contents) {
   std::string text;
   KdReportIterate(collection, [&text, contents](ChannelRecord& channel) {
     text += (contents == ChannelContents::Values ? KdReportSampleCopyDescription(&channel, 0, "")
@@ -43,7 +25,7 @@ std::string descriptionsText(const ChannelCollection* collection, ChannelContent
                 .value_or("");
     return kKdReportKeep;
   });
-  return ::isatty(STDOUT_FILENO) != 0 ? printableLines(text) : text;
+  return ShownText::lines(text);
 }
 
 void printChannels(Tool& tool, const MetricsRequest& request, const ChannelCollection* collection,

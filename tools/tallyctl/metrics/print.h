@@ -5,6 +5,7 @@
 
 #include "tools/tallyctl/metrics/selection.h"
 #include "tools/tallyctl/metrics/values.h"
+#include "tools/tallyctl/terminal.h"
 
 namespace tbdaily {
 
@@ -19,8 +20,8 @@ struct MetricsRequest {
 // Whether there is nothing to print, which has then been said: no channel, or a selection that failed.
 bool hasNothingToShow(Tool& tool, const MetricsRequest& request, const ChannelSelection& selection);
 
-// The library's own descriptions one after another, on a terminal without what could drive it.
-std::string descriptionsText(const kdreport::ChannelCollection* collection, ChannelContents contents);
+// The library's own descriptions one after another.
+ShownText descriptionsText(const kdreport::ChannelCollection* collection, ChannelContents contents);
 
 // As descriptions, JSON or a tree. A collection that cannot be walked is said to have failed.
 void printChannels(Tool& tool, const MetricsRequest& request, const kdreport::ChannelCollection* collection,

@@ -35,9 +35,10 @@ std::string_view whatIsMissing(DriverRegistry& registry) {
 }  // namespace
 
 void failMetrics(Tool& tool, std::string_view what, const std::optional<ReportError>& error) {
+  if (!tool.hasReadAll()) return;  // which is why
   std::string line(what);
   if (error) {
-    if (KdReportErrorHasReason(*error)) line += ": " + printable(error->reason);
+    if (KdReportErrorHasReason(*error)) line += ": " + error->reason;
     line += " (" + statusText(error->code) + ")";
     // What the library answers where the registry or the hub itself is not there.
     if (error->code == kKdNotFound || error->code == kKdNoMemory)
@@ -57,7 +58,7 @@ KdReportCollection ChannelSampler::sample() {
   std::optional<ReportError> error;
   KdReportCollection samples = KdReportCreateSamples(subscription_.get(), subscribed_.get(), &error);
   if (!samples) failMetrics(tool_, "the channels cannot be sampled", error);
-  return samples;
+  return tool_.hasReadAll() ? std::move(samples) : nullptr;
 }
 
 }  // namespace tbdaily

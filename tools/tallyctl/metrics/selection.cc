@@ -105,9 +105,11 @@ void setUnit(ChannelFilter& filter, const std::string& text) {
 
 ChannelSelection selectChannels(Tool& tool, const ChannelFilter& filter) {
   ChannelSelection selection;
+  if (!tool.hasUsableRoot()) return selection;
   std::optional<ReportError> error;
   KdReportCollection channels = KdReportCopyAllChannels(tool.platform().services().driverRegistry,
                                                         kKdReportFileByDriver | kKdReportFileByGroup, &error);
+  if (!tool.hasReadAll()) return selection;
   if (channels) {
     selection.published = KdReportGetChannelCount(channels.get());
     if (narrow(channels.get(), filter, &error)) {

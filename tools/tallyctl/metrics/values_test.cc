@@ -88,8 +88,8 @@ TEST(MetricsValuesTest, NamesThatAreNotAloneAreWrittenWhole) {
   channels[0].group = "g";
   channels[0].unitLabel = "ns";
   channels[2].name = "other";
-  EXPECT_EQ(valuesLine(PlistDate{0}, channels),
-            "2001-01-01T00:00:00.000Z  d? <id 0x1>/g/n=-1 ns  d? <id 0x1>/n=-1  other=-1");
+  EXPECT_EQ(ShownText(valuesLine(PlistDate{0}, channels)).bytes(),
+            "2001-01-01T00:00:00.000Z  d\\x0a <id 0x1>/g/n=-1 ns  d\\x0a <id 0x1>/n=-1  other=-1");
 }
 
 }  // namespace

@@ -34,11 +34,11 @@ std::string hexadecimal(std::int64_t value) {
 }
 
 std::string nameOf(const ChannelValues& channel) {
-  return channel.name ? printable(*channel.name) : hexadecimal(channel.channelID);
+  return channel.name ? *channel.name : hexadecimal(channel.channelID);
 }
 
 std::string unitOf(const ChannelValues& channel) {
-  return channel.unitLabel ? printable(*channel.unitLabel) : "";
+  return channel.unitLabel ? *channel.unitLabel : "";
 }
 
 std::string withUnit(const std::string& value, const ChannelValues& channel) {
@@ -46,13 +46,13 @@ std::string withUnit(const std::string& value, const ChannelValues& channel) {
 }
 
 std::string stateName(const StateValues& state) {
-  return state.name ? printable(*state.name) : hexadecimal(state.id);
+  return state.name ? *state.name : hexadecimal(state.id);
 }
 
 std::vector<std::string> pathOf(const ChannelValues& channel) {
-  std::vector<std::string> path{channel.driver ? printable(*channel.driver) : "(no driver)"};
-  if (channel.group) path.push_back(printable(*channel.group));
-  if (channel.group && channel.subGroup) path.push_back(printable(*channel.subGroup));
+  std::vector<std::string> path{channel.driver ? *channel.driver : "(no driver)"};
+  if (channel.group) path.push_back(*channel.group);
+  if (channel.group && channel.subGroup) path.push_back(*channel.subGroup);
   return path;
 }
 
@@ -89,7 +89,7 @@ std::string unitWords(const ChannelValues& channel) {
   return channel.unitLabel->empty() ? "count" : unitOf(channel);
 }
 
-std::vector<std::string> descriptionRow(const ChannelValues& channel) {
+std::vector<ShownText> descriptionRow(const ChannelValues& channel) {
   std::array<char, 32> categories;
   std::snprintf(categories.data(), categories.size(), "categories 0x%04x", unsigned{channel.categories});
   return {nameOf(channel),
@@ -137,9 +137,9 @@ void printArray(Terminal& out, const ChannelValues& channel, const std::string& 
   columns[0] = Left;
   Table table(std::move(columns));
   for (std::size_t i = 0; i < channel.array.size(); i += kValuesPerRow) {
-    std::vector<std::string> row{indentation + "[" + std::to_string(i) + "]"};
+    std::vector<ShownText> row{indentation + "[" + std::to_string(i) + "]"};
     for (std::size_t k = i; k < std::min(i + kValuesPerRow, channel.array.size()); ++k)
-      row.push_back(number(channel.array[k]));
+      row.emplace_back(number(channel.array[k]));
     table.add(std::move(row));
   }
   table.print(out);
@@ -166,7 +166,7 @@ bool isLarge(const ChannelValues& channel) {
   return channel.format >= kKdReportState && channel.format <= kKdReportArray;
 }
 
-std::vector<std::string> valueRow(const ChannelValues& channel) {
+std::vector<ShownText> valueRow(const ChannelValues& channel) {
   if (channel.format != kKdReportSimple) return {nameOf(channel), "-", formatName(channel.format)};
   return {nameOf(channel), number(channel.value), unitOf(channel)};
 }
@@ -180,8 +180,8 @@ void printTree(Terminal& out, const std::vector<ChannelValues>& channels,
     headings.enter(channels[i]);
     Table table(columns);
     for (; i < channels.size() && !headings.isNew(channels[i]) && !takesMoreRoom(channels[i]); ++i) {
-      std::vector<std::string> cells = row(channels[i]);
-      cells[0].insert(0, headings.belowInTable());
+      std::vector<ShownText> cells = row(channels[i]);
+      cells[0] = headings.belowInTable() + cells[0];
       table.add(std::move(cells));
     }
     table.print(out);

@@ -16,7 +16,7 @@ void printChannelTree(Terminal& out, const std::vector<ChannelValues>& channels)
 // The same tree with the values.
 void printValueTree(Terminal& out, const std::vector<ChannelValues>& channels);
 
-// "driver/group/subgroup/name", printable; the identifier in place of a missing name.
+// "driver/group/subgroup/name"; the identifier in place of a missing name.
 std::string wholeName(const ChannelValues& channel);
 
 // One line: the time, then "name=value unit" of each channel, two spaces apart. Of a state channel the value

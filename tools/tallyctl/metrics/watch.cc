@@ -96,8 +96,6 @@ bool canRedraw() {
          std::string_view(terminal) != "dumb";
 }
 
-constexpr std::string_view kClearScreen = "\x1b[H\x1b[2J";
-
 // The samples of a watch, one after another.
 class SampleStream {
  public:
@@ -114,19 +112,19 @@ class SampleStream {
     if (tool_.options.json) {
       JsonWriter json(JsonLayout::OneLine);
       writeChannels(json, *channels, ChannelContents::Values);
-      return print(json.take() + "\n");
+      return print(ShownText::lines(json.take() + "\n"));
     }
     const PlistDate now = tool_.platform().services().kernel.currentTime();
-    if (!redraws_) return print(valuesLine(now, *channels) + "\n");
-    tool_.out().print(kClearScreen);
+    if (!redraws_) return print(valuesLine(now, *channels) + ShownText::lines("\n"));
+    tool_.out().print(Terminal::clearing());
     tool_.out().line(stampText(now, 3));
     printValueTree(tool_.out(), *channels);
     return std::fflush(stdout) == 0 ? WaitEnd::Done : WaitEnd::Failed;
   }
 
  private:
-  WaitEnd print(const std::string& text) const {
-    return signals_.write(redraws_ ? std::string(kClearScreen) + text : text);
+  WaitEnd print(const ShownText& text) const {
+    return signals_.write((redraws_ ? Terminal::clearing() + text : text).bytes());
   }
 
   Tool& tool_;

@@ -214,7 +214,7 @@ class SampleDevice {
     if (built.empty())
       return Failure{
           "the support library FaultdeskSupport is missing beside tallyctl; build or install it again"};
-    const auto library = readInput(built);
+    const auto library = readInput(built, kLargestBufferInput);
     if (!library) return Failure{library.reason()};
     return writeBytes(kSupportLibraryPath, {reinterpret_cast<const char*>(library->data()), library->size()});
   }
