@@ -141,8 +141,6 @@ class Companion(DeviceTest):
                         there.unlink()
             if aside.exists():
                 aside.rename(there)
-        device.write("System/Device/registry.plist", b"<plist>")  # damaged is not missing either
-        self.assertIn("registry.plist is ignored", device.tally("metrics", "list", status=1))
         missing = str(device.base / "missing")
         for words in ("tasking show", "usage show", "report", "metrics list", "whitelist check", "nand", "stats", "snapshots"):
             for json_flag in ((), ("--json",)):

@@ -17,9 +17,11 @@ const CachedPlistFile& Recordings::loaded(std::string_view file) {
   if (found == loaded_.end()) found = loaded_.try_emplace(std::string(file)).first;
   CachedPlistFile& recording = found->second;
   recording.refresh(host_.files(), path(file), codec_);
-  if (recording.state() == State::Damaged || recording.state() == State::Unreadable)
-    host_.files().noteUnread("recording " + host_.files().place(path(file)).native() +
-                             " is ignored: " + recording.fault());
+  const auto line = [&] {
+    return "recording " + host_.files().place(path(file)).native() + " is ignored: " + recording.fault();
+  };
+  if (recording.state() == State::Damaged) noteOnce(line());  // which counts as a missing one
+  if (recording.state() == State::Unreadable) host_.files().noteUnread(line());
   return recording;
 }
 
