@@ -13,12 +13,20 @@
 
 namespace tbdaily {
 
+using DistributionVisitor = std::function<void(double value, std::int32_t secondsInDay)>;
+
 // The values of one distribution row, one by one. Borrowed: valid during the row's callback.
 class DistributionEnumerator {
  public:
   virtual ~DistributionEnumerator() = default;
   // False when no value is left; then the out-parameters are untouched.
   virtual bool nextValue(double& value, std::int32_t& secondsInDay) = 0;
+  // All that are left, in order; none is left then. A store may have a shorter way.
+  virtual void visitValues(const DistributionVisitor& visit) {
+    double value = 0;
+    std::int32_t secondsInDay = 0;
+    while (nextValue(value, secondsInDay)) visit(value, secondsInDay);
+  }
 };
 
 using ScalarRowCallback =

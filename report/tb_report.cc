@@ -101,12 +101,10 @@ void TBReport::computeAndAddDistributionForKeyWithOptions(DistributionEnumerator
   const PlistValue intervals = options.get(whitelist_option::kIntervals);
   Histogram histogram(intervals.asArray(), key, platform_.systemLog);
   DistributionSummary summary;
-  double value = 0;
-  std::int32_t secondsInDay = 0;
-  while (values.nextValue(value, secondsInDay)) {
+  values.visitValues([&](double value, std::int32_t) {
     summary.add(value);
     histogram.add(value);
-  }
+  });
   if (histogram.counts()) _histogramsOutput.set(key, histogram.dictionary());
   _distributionsOutput.set(key, summary.statistics());
 }

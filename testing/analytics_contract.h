@@ -53,7 +53,8 @@ TYPED_TEST_P(AnalyticsContract, ARowYieldsItsValuesInOrderAndThenNothingMore) {
   this->subject.addDistribution("k", 1, {3, std::nan(""), 1});
   this->subject.addDistribution("k", 1, {2});
   const auto opened = this->history.open();
-  EXPECT_EQ(distributionLines(*opened), Lines{"k 1: 3 nan 1 2"});
+  for (const std::size_t beforeVisit : {0U, 1U, 3U, 4U, 5U})
+    EXPECT_EQ(distributionLines(*opened, "", 1, 1, beforeVisit), Lines{"k 1: 3 nan 1 2"});
   opened->enumerateDistributions("", 1, 1,
                                  [](std::string_view, DayNumber, DistributionEnumerator& values, bool&) {
                                    double value = 0;

@@ -28,21 +28,31 @@ inline Lines scalarLines(OpenAnalyticsHistory& history, std::string_view prefix 
   return lines;
 }
 
-// "KEY DAY: VALUE VALUE ..." of each distribution row, values as whole numbers or "nan".
+// "KEY DAY: VALUE VALUE ..." of each distribution row, values as whole numbers or "nan". Reads all twice, one
+// by one and by a visit behind the first so many.
 inline Lines distributionLines(OpenAnalyticsHistory& history, std::string_view prefix = {},
-                               DayNumber minimumDay = kFirstDay, DayNumber maximumDay = kLastDay) {
-  Lines lines;
-  history.enumerateDistributions(
-      prefix, minimumDay, maximumDay,
-      [&](std::string_view key, DayNumber day, DistributionEnumerator& values, bool&) {
-        std::string line = std::string(key) + " " + std::to_string(day) + ":";
-        double value = 0;
-        std::int32_t seconds = 0;
-        while (values.nextValue(value, seconds)) {
-          line += std::isnan(value) ? " nan" : " " + std::to_string(static_cast<std::int64_t>(value));
-        }
-        lines.push_back(line);
-      });
+                               DayNumber minimumDay = kFirstDay, DayNumber maximumDay = kLastDay,
+                               std::size_t beforeVisit = 0) {
+  const auto read = [&](std::size_t oneByOne) {
+    Lines lines;
+    history.enumerateDistributions(
+        prefix, minimumDay, maximumDay,
+        [&](std::string_view key, DayNumber day, DistributionEnumerator& values, bool&) {
+          std::string line = std::string(key) + " " + std::to_string(day) + ":";
+          const auto add = [&line](double value, std::int32_t) {
+            line += std::isnan(value) ? " nan" : " " + std::to_string(static_cast<std::int64_t>(value));
+          };
+          double value = 0;
+          std::int32_t seconds = 0;
+          for (std::size_t i = 0; i < oneByOne && values.nextValue(value, seconds); ++i) add(value, seconds);
+          values.visitValues(add);
+          EXPECT_FALSE(values.nextValue(value, seconds));
+          lines.push_back(line);
+        });
+    return lines;
+  };
+  const Lines lines = read(std::numeric_limits<std::size_t>::max());
+  EXPECT_EQ(read(beforeVisit), lines);
   return lines;
 }
 

@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include <fstream>
+#include <random>
 #include <thread>
 
 #include "platform/linux/host_test_support.h"
@@ -242,6 +243,49 @@ TEST_F(AnalyticsStoreTest, PassesOverWhatAForeignProgramLeft) {
   const auto opened = history();
   EXPECT_EQ(testing::scalarLines(*opened), (Lines{"days 4 44", "good 1 1"}));
   EXPECT_EQ(testing::distributionLines(*opened), (Lines{"days 2:", "days 3: nan 33", "good 1: 2 4"}));
+}
+
+TEST_F(AnalyticsStoreTest, FindsTheRowsOfSomeDaysAmongThoseOfAnyOthers) {
+  addScalar("k", 0, 0);
+  addDistribution("k", 0, {0});
+  std::mt19937 random(1);
+  std::string rows;
+  const auto oneOf = [&random](std::vector<std::string> choices) {
+    return choices[random() % choices.size()];
+  };
+  for (int i = 0; i < 60; ++i) {
+    const std::string id = oneOf({"2", "3", "4", "5", "-7", "9223372036854775807", "-9223372036854775808"});
+    rows += "INSERT OR IGNORE INTO keys VALUES (" + id + ", 'name' || abs(" + id + " % 100));";
+  }
+  for (int i = 0; i < 600; ++i) {
+    const std::string id = oneOf({"2", "3", "4", "5", "6", "-7", "9223372036854775807",
+                                  "-9223372036854775808", "2.5", "-1e30", "1e30", "'k'", "x'00'"});
+    const std::string day = random() % 4 != 0 ? std::to_string(static_cast<int>(random() % 40) - 20)
+                                              : oneOf({"2.5", "-3e9", "3e9", "99999999999", "'d'", "x'00'"});
+    rows += "INSERT OR IGNORE INTO scalars VALUES (" + id + ", " + day + ", " + std::to_string(i) + ");";
+    rows += "INSERT OR IGNORE INTO distribution_values VALUES (" + id + ", " + day + ", " +
+            std::to_string(i % 3) + ", 0, " + std::to_string(i) + ");";
+  }
+  sql("BEGIN;" + rows + "COMMIT");
+  SqliteDatabase plain;
+  ASSERT_EQ(openFile(plain), 0);
+  for (int from = -22; from < 22; ++from) {
+    for (const int to : {from - 1, from, from + 1, from + 9}) {
+      Lines expected;
+      SqliteStatement all = plain.prepare(
+          "SELECT name || ' ' || day || ' ' || value FROM keys JOIN scalars ON id = key_id "
+          "WHERE typeof(day) = 'integer' AND day BETWEEN ?1 AND ?2 ORDER BY name, day");
+      all.bind(1, std::int64_t{from});
+      all.bind(2, std::int64_t{to});
+      while (all.step() == 100) expected.emplace_back(all.text(0));
+      EXPECT_EQ(testing::scalarLines(*history(), "", from, to), expected) << from << " " << to;
+      Lines rowNames;
+      for (const std::string& line : testing::distributionLines(*history(), "", from, to))
+        rowNames.push_back(line.substr(0, line.find(':')));
+      for (std::string& line : expected) line.resize(line.rfind(' '));
+      EXPECT_EQ(rowNames, expected) << from << " " << to;
+    }
+  }
 }
 
 TEST_F(AnalyticsStoreTest, EndsAtADamagedPageOfALargeStore) {

@@ -2,6 +2,10 @@
 
 #include <sqlite3.h>
 
+#include <algorithm>
+#include <cmath>
+#include <compare>
+#include <deque>
 #include <limits>
 #include <optional>
 #include <string>
@@ -13,19 +17,20 @@ namespace tbdaily {
 
 namespace {
 
-// Keys in the outer loop and days in the inner one: both indexes deliver in the order that is asked for,
-// nothing is sorted.
-constexpr std::string_view kScalars =
-    "SELECT k.name, s.day, s.value FROM keys AS k CROSS JOIN scalars AS s "
-    "WHERE k.name >= ?1 AND k.name < ?2 AND s.key_id = k.id AND s.day BETWEEN ?3 AND ?4 ORDER BY k.name, "
-    "s.day";
+// In the order of the tables: nothing is sorted.
+constexpr std::string_view kScalarRows =
+    "SELECT key_id, day, value FROM scalars WHERE (key_id, day) >= (?1, ?2) ORDER BY key_id, day";
+constexpr std::string_view kDistributionRows =
+    "SELECT key_id, day, 0 FROM distribution_values WHERE (key_id, day) >= (?1, ?2) ORDER BY key_id, day";
 constexpr std::string_view kKeys = "SELECT name, id FROM keys WHERE name >= ?1 AND name < ?2 ORDER BY name";
-constexpr std::string_view kFirstDay =
-    "SELECT day FROM distribution_values WHERE key_id = ?1 AND day >= ?2 AND day <= ?3 ORDER BY day LIMIT 1";
-constexpr std::string_view kNextDay =
-    "SELECT day FROM distribution_values WHERE key_id = ?1 AND day > ?2 AND day <= ?3 ORDER BY day LIMIT 1";
 constexpr std::string_view kValues =
     "SELECT seq, seconds, value FROM distribution_values WHERE key_id = ?1 AND day = ?2 ORDER BY seq";
+constexpr std::string_view kVisitedValues =
+    "SELECT visit(seq, seconds, value) FROM distribution_values WHERE key_id = ?1 AND day = ?2";
+
+// Rows of other days that are stepped over before they are jumped over. A distribution has many of each day.
+constexpr unsigned kScalarPatience = 4;
+constexpr unsigned kDistributionPatience = 0;
 
 // The end of the range of the texts that begin with the prefix, in byte order.
 void bindPrefix(SqliteStatement& statement, std::string_view prefix, std::string& end) {
@@ -91,43 +96,188 @@ class Reader {
   bool hasFailed_ = false;
 };
 
+// The rows of a table that are of the asked days, in order of key and day. Held for all keys, since their
+// names come in another order: 24 bytes a row.
+class DayRows {
+ public:
+  struct Row {
+    std::int64_t keyId;
+    std::int64_t value;
+    DayNumber day;
+  };
+
+  DayRows(Reader& reader, std::string_view sql, unsigned patience, DayNumber minimumDay, DayNumber maximumDay)
+      : reader_(reader),
+        rowsFrom_(reader.database().prepare(sql)),
+        patience_(patience),
+        minimumDay_(minimumDay),
+        maximumDay_(maximumDay) {}
+
+  // False when the table could not be read to its end, which has been noted.
+  bool read() {
+    std::optional<Place> from = Place{std::numeric_limits<std::int64_t>::min(), double(minimumDay_)};
+    while (from) {
+      std::optional<Place> next;
+      if (!readFrom(*from, next)) return false;
+      from = next;
+    }
+    return true;
+  }
+
+  // Those of one key, by day.
+  auto of(std::int64_t keyId) const { return std::ranges::equal_range(rows_, keyId, {}, &Row::keyId); }
+
+ private:
+  // In the order of the table. A foreign program may have left days with a fraction.
+  struct Place {
+    std::int64_t keyId;
+    double day;
+    auto operator<=>(const Place&) const = default;
+  };
+
+  // Reads on from a place until rows of other days had better be jumped over, to `next`, or to the end.
+  bool readFrom(const Place& from, std::optional<Place>& next) {
+    const StatementRun run(rowsFrom_);
+    rowsFrom_.bind(1, from.keyId);
+    rowsFrom_.bind(2, from.day);
+    Place last = from;
+    unsigned stepped = 0;
+    int code = SQLITE_DONE;
+    for (bool isFirst = true; (code = rowsFrom_.step()) == SQLITE_ROW; isFirst = false) {
+      if (!rowsFrom_.isInteger(0)) {
+        next = behindForeignKey();
+        return true;
+      }
+      // Texts come behind all numbers.
+      const double day = rowsFrom_.isNumber(1) ? rowsFrom_.real(1) : HUGE_VAL;
+      const Place place{rowsFrom_.integer(0), day};
+      const bool isAsked = day >= minimumDay_ && day <= maximumDay_;
+      if (place < last || (isAsked && !isFirst && !(last < place))) {
+        reader_.noteDisorder();
+        return false;
+      }
+      last = place;
+      if (isAsked) add();
+      if (isAsked && patience_ != 0) {
+        stepped = 0;
+      } else if (stepped++ == patience_) {
+        next = behind(place);
+        return true;
+      }
+    }
+    reader_.noteEnd(code);
+    return code == SQLITE_DONE;
+  }
+
+  void add() {
+    if (!rowsFrom_.isInteger(1) || !rowsFrom_.isInteger(2)) return reader_.noteForeignRow();
+    rows_.push_back(
+        {rowsFrom_.integer(0), rowsFrom_.integer(2), static_cast<DayNumber>(rowsFrom_.integer(1))});
+  }
+
+  // The key's next day of those that are asked for, or the next key's first one.
+  std::optional<Place> behind(const Place& place) const {
+    if (place.day < minimumDay_) return Place{place.keyId, double(minimumDay_)};
+    if (place.day < maximumDay_) return Place{place.keyId, std::floor(place.day) + 1};
+    if (place.keyId == std::numeric_limits<std::int64_t>::max()) return std::nullopt;
+    return Place{place.keyId + 1, double(minimumDay_)};
+  }
+  // No name has such a key: a number with a fraction or out of range, or a text, behind all of them.
+  std::optional<Place> behindForeignKey() const {
+    const double key = rowsFrom_.isNumber(0) ? std::floor(rowsFrom_.real(0)) : HUGE_VAL;
+    if (key >= 0x1p63) return std::nullopt;
+    return behind({static_cast<std::int64_t>(key), HUGE_VAL});
+  }
+
+  Reader& reader_;
+  SqliteStatement rowsFrom_;
+  const unsigned patience_;
+  const DayNumber minimumDay_, maximumDay_;
+  std::deque<Row> rows_;
+};
+
+// What reads the values of a key and day: where they are asked for one by one, and where all are wanted.
+struct ValueStatements {
+  SqliteStatement oneByOne, all;
+};
+
 // The values of one key and day. Asks the store for none of them before the first is wanted.
 class StoredValues : public DistributionEnumerator {
  public:
-  StoredValues(Reader& reader, SqliteStatement& statement, std::int64_t keyId, DayNumber day)
-      : reader_(reader), statement_(statement), run_(statement), keyId_(keyId), day_(day) {}
+  StoredValues(Reader& reader, ValueStatements& statements, std::int64_t keyId, DayNumber day)
+      : reader_(reader), statements_(statements), keyId_(keyId), day_(day) {}
 
   bool nextValue(double& value, std::int32_t& secondsInDay) override {
     if (ended_) return false;
-    if (!started_) {
-      statement_.bind(1, keyId_);
-      statement_.bind(2, std::int64_t{day_});
-    }
-    while (true) {
-      const int code = statement_.step();
-      if (code != SQLITE_ROW) {
-        reader_.noteEnd(code);
-        return end(code != SQLITE_DONE);
+    SqliteStatement& one = statements_.oneByOne;
+    if (!run_) start(one);
+    int code = SQLITE_DONE;
+    while ((code = one.step()) == SQLITE_ROW) {
+      switch (judge(one)) {
+        case Verdict::Value:
+          secondsInDay = static_cast<std::int32_t>(one.integer(1));
+          value = valueOf(one);
+          return true;
+        case Verdict::Foreign:
+          continue;
+        case Verdict::End:
+          return end(false);
+        case Verdict::Disorder:
+          return end(true);
       }
-      const std::int64_t sequence = statement_.integer(0);
-      if (started_ && sequence <= sequence_) {
-        reader_.noteDisorder();
-        return end(true);
-      }
-      started_ = true;
-      sequence_ = sequence;
-      if (statement_.isInteger(0) && statement_.isInteger(1) && isInt32(statement_.integer(1))) break;
-      reader_.noteForeignRow();
-      if (!statement_.isInteger(0)) return end(false);
     }
-    secondsInDay = static_cast<std::int32_t>(statement_.integer(1));
-    value = statement_.isNumber(2) ? statement_.real(2) : std::numeric_limits<double>::quiet_NaN();
-    return true;
+    reader_.noteEnd(code);
+    return end(code != SQLITE_DONE);
+  }
+
+  // The rest of them.
+  void visitValues(const DistributionVisitor& visit) override {
+    if (run_ || ended_) return DistributionEnumerator::visitValues(visit);
+    SqliteStatement& all = statements_.all;
+    start(all);
+    Verdict last = Verdict::Value;
+    const int code = reader_.database().visitRows(all, [&](const SqliteRow& row) {
+      last = judge(row);
+      if (last == Verdict::Value) visit(valueOf(row), static_cast<std::int32_t>(row.integer(1)));
+      return last == Verdict::Value || last == Verdict::Foreign;
+    });
+    const bool isAtEnd = last == Verdict::End || last == Verdict::Disorder;
+    if (!isAtEnd) reader_.noteEnd(code);
+    end(isAtEnd ? last == Verdict::Disorder : code != SQLITE_DONE);
   }
 
   bool failed() const { return failed_; }
 
  private:
+  enum class Verdict : std::uint8_t { Value, Foreign, End, Disorder };
+
+  void start(SqliteStatement& statement) {
+    run_.emplace(statement);
+    statement.bind(1, keyId_);
+    statement.bind(2, std::int64_t{day_});
+  }
+  // Of a row of sequence, seconds and value; notes what is not as it should be.
+  template <typename Row>
+  Verdict judge(const Row& row) {
+    if (!row.isInteger(0)) {  // behind all that are integers
+      reader_.noteForeignRow();
+      return Verdict::End;
+    }
+    const std::int64_t sequence = row.integer(0);
+    if (hasSequence_ && sequence <= sequence_) {
+      reader_.noteDisorder();
+      return Verdict::Disorder;
+    }
+    hasSequence_ = true;
+    sequence_ = sequence;
+    if (row.isInteger(1) && isInt32(row.integer(1))) return Verdict::Value;
+    reader_.noteForeignRow();
+    return Verdict::Foreign;
+  }
+  template <typename Row>
+  static double valueOf(const Row& row) {
+    return row.isNumber(2) ? row.real(2) : std::numeric_limits<double>::quiet_NaN();
+  }
   bool end(bool failed) {
     ended_ = true;
     failed_ = failed;
@@ -135,71 +285,14 @@ class StoredValues : public DistributionEnumerator {
   }
 
   Reader& reader_;
-  SqliteStatement& statement_;
-  StatementRun run_;
+  ValueStatements& statements_;
+  std::optional<StatementRun> run_;
   std::int64_t keyId_;
   DayNumber day_;
   std::int64_t sequence_ = 0;
-  bool started_ = false;
+  bool hasSequence_ = false;
   bool ended_ = false;
   bool failed_ = false;
-};
-
-// The days of one key that have values, ascending, each found by one seek.
-class DayWalk {
- public:
-  DayWalk(Reader& reader, DayNumber minimumDay, DayNumber maximumDay)
-      : reader_(reader),
-        first_(reader.database().prepare(kFirstDay)),
-        next_(reader.database().prepare(kNextDay)),
-        minimumDay_(minimumDay),
-        maximumDay_(maximumDay) {}
-
-  void start(std::int64_t keyId) {
-    keyId_ = keyId;
-    hasDay_ = false;
-  }
-
-  // SQLITE_ROW with a day, SQLITE_DONE, or what went wrong, already named.
-  int advance(DayNumber& day) {
-    while (true) {
-      SqliteStatement& seek = hasDay_ ? next_ : first_;
-      const StatementRun run(seek);
-      seek.bind(1, keyId_);
-      if (hasDay_) {
-        seek.bind(2, lastDay_);
-      } else {
-        seek.bind(2, std::int64_t{minimumDay_});
-      }
-      seek.bind(3, std::int64_t{maximumDay_});
-      const int code = seek.step();
-      if (code != SQLITE_ROW) {
-        reader_.noteEnd(code);
-        return code;
-      }
-      const double found = seek.real(0);
-      if (hasDay_ && !(found > lastDay_)) {
-        reader_.noteDisorder();
-        return SQLITE_CORRUPT;
-      }
-      hasDay_ = true;
-      lastDay_ = found;
-      const bool isDay = seek.isInteger(0) && isInt32(seek.integer(0));
-      if (isDay) {
-        day = static_cast<DayNumber>(seek.integer(0));
-        return SQLITE_ROW;
-      }
-      reader_.noteForeignRow();
-    }
-  }
-
- private:
-  Reader& reader_;
-  SqliteStatement first_, next_;
-  DayNumber minimumDay_, maximumDay_;
-  std::int64_t keyId_ = 0;
-  bool hasDay_ = false;
-  double lastDay_ = 0;  // a foreign program may have left days with a fraction
 };
 
 class LinuxOpenHistory : public OpenAnalyticsHistory {
@@ -214,57 +307,18 @@ class LinuxOpenHistory : public OpenAnalyticsHistory {
   bool isWhole() const override { return !reader_.hasFailed(); }
 
  private:
-  bool enumerateDays(std::string_view key, std::int64_t keyId, DayWalk& days, SqliteStatement& values,
-                     const DistributionRowCallback& row);
+  // Calls `row` with each of the rows and its key's name, in order of name and day, until it answers false.
+  template <typename RowCallback>
+  void enumerate(std::string_view keyPrefix, const DayRows& rows, RowCallback&& row);
 
   Reader reader_;
 };
 
-void LinuxOpenHistory::enumerateScalars(std::string_view keyPrefix, DayNumber minimumDay,
-                                        DayNumber maximumDay, const ScalarRowCallback& row) {
-  if (!reader_.isOpen()) return;
-  SqliteStatement scalars = reader_.database().prepare(kScalars);
-  std::string end;
-  bindPrefix(scalars, keyPrefix, end);
-  scalars.bind(3, std::int64_t{minimumDay});
-  scalars.bind(4, std::int64_t{maximumDay});
-
-  std::string key;
-  bool hasKey = false;
-  bool usable = false;
-  double previousDay = 0;
-  int code = SQLITE_DONE;
-  for (bool stop = false; !stop && (code = scalars.step()) == SQLITE_ROW;) {
-    const std::string_view name = scalars.text(0);
-    const double day = scalars.real(1);
-    const int order = hasKey ? name.compare(key) : 1;
-    if (order < 0 || (order == 0 && !(day > previousDay))) return reader_.noteDisorder();
-    if (order > 0) {
-      key = name;
-      hasKey = true;
-      usable = reader_.isUsableKey(key);
-    }
-    previousDay = day;
-    if (!usable) continue;
-    if (!scalars.isInteger(1) || !scalars.isInteger(2)) {
-      reader_.noteForeignRow();
-      continue;
-    }
-    row(key, static_cast<DayNumber>(scalars.integer(1)), scalars.integer(2), stop);
-    if (stop) return;
-  }
-  reader_.noteEnd(code);
-}
-
-void LinuxOpenHistory::enumerateDistributions(std::string_view keyPrefix, DayNumber minimumDay,
-                                              DayNumber maximumDay, const DistributionRowCallback& row) {
-  if (!reader_.isOpen()) return;
+template <typename RowCallback>
+void LinuxOpenHistory::enumerate(std::string_view keyPrefix, const DayRows& rows, RowCallback&& row) {
   SqliteStatement keys = reader_.database().prepare(kKeys);
-  SqliteStatement values = reader_.database().prepare(kValues);
-  DayWalk days(reader_, minimumDay, maximumDay);
   std::string end;
   bindPrefix(keys, keyPrefix, end);
-
   std::string key;
   bool hasKey = false;
   int code = SQLITE_DONE;
@@ -273,25 +327,39 @@ void LinuxOpenHistory::enumerateDistributions(std::string_view keyPrefix, DayNum
     if (hasKey && name <= key) return reader_.noteDisorder();
     key = name;
     hasKey = true;
-    days.start(keys.integer(1));
-    if (!enumerateDays(key, keys.integer(1), days, values, row)) return;
+    const auto ofKey = rows.of(keys.integer(1));
+    if (ofKey.empty() || !reader_.isUsableKey(key)) continue;
+    for (const DayRows::Row& each : ofKey) {
+      if (!row(std::string_view(key), each)) return;
+    }
   }
   reader_.noteEnd(code);
 }
 
-// False when the enumeration is at its end, wanted or not.
-bool LinuxOpenHistory::enumerateDays(std::string_view key, std::int64_t keyId, DayWalk& days,
-                                     SqliteStatement& values, const DistributionRowCallback& row) {
-  DayNumber day = 0;
-  int code = SQLITE_DONE;
-  while ((code = days.advance(day)) == SQLITE_ROW) {
-    if (!reader_.isUsableKey(key)) return true;
-    StoredValues enumerator(reader_, values, keyId, day);
+void LinuxOpenHistory::enumerateScalars(std::string_view keyPrefix, DayNumber minimumDay,
+                                        DayNumber maximumDay, const ScalarRowCallback& row) {
+  if (!reader_.isOpen()) return;
+  DayRows rows(reader_, kScalarRows, kScalarPatience, minimumDay, maximumDay);
+  if (!rows.read()) return;
+  enumerate(keyPrefix, rows, [&row](std::string_view key, const DayRows::Row& scalar) {
     bool stop = false;
-    row(key, day, enumerator, stop);
-    if (stop || enumerator.failed()) return false;
-  }
-  return code == SQLITE_DONE;
+    row(key, scalar.day, scalar.value, stop);
+    return !stop;
+  });
+}
+
+void LinuxOpenHistory::enumerateDistributions(std::string_view keyPrefix, DayNumber minimumDay,
+                                              DayNumber maximumDay, const DistributionRowCallback& row) {
+  if (!reader_.isOpen()) return;
+  DayRows rows(reader_, kDistributionRows, kDistributionPatience, minimumDay, maximumDay);
+  if (!rows.read()) return;
+  ValueStatements statements{reader_.database().prepare(kValues), reader_.database().prepare(kVisitedValues)};
+  enumerate(keyPrefix, rows, [&](std::string_view key, const DayRows::Row& distribution) {
+    StoredValues values(reader_, statements, distribution.keyId, distribution.day);
+    bool stop = false;
+    row(key, distribution.day, values, stop);
+    return !stop && !values.failed();
+  });
 }
 
 class EmptyHistory : public OpenAnalyticsHistory {

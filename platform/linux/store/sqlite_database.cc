@@ -7,9 +7,11 @@
 
 #include <cerrno>
 #include <cstring>
+#include <exception>
 #include <map>
 #include <mutex>
 #include <optional>
+#include <utility>
 
 #include "platform/hexadecimal.h"
 #include "platform/linux/base/host_notes.h"
@@ -186,6 +188,50 @@ std::string_view SqliteStatement::text(int column) const {
   return {static_cast<const char*>(bytes), static_cast<std::size_t>(length)};
 }
 
+bool SqliteRow::isInteger(int column) const {
+  return sqlite3_value_type(values_[column]) == SQLITE_INTEGER;
+}
+
+bool SqliteRow::isNumber(int column) const {
+  const int type = sqlite3_value_type(values_[column]);
+  return type == SQLITE_INTEGER || type == SQLITE_FLOAT;
+}
+
+std::int64_t SqliteRow::integer(int column) const {
+  return sqlite3_value_int64(values_[column]);
+}
+
+double SqliteRow::real(int column) const {
+  return sqlite3_value_double(values_[column]);
+}
+
+struct SqliteDatabase::Visit {
+  const SqliteRowVisitor* visitor = nullptr;
+  std::exception_ptr thrown;
+
+  // The step of an aggregate function. No exception may pass through SQLite.
+  static void row(sqlite3_context* context, int, sqlite3_value** values) {
+    auto& visit = *static_cast<Visit*>(sqlite3_user_data(context));
+    try {
+      if ((*visit.visitor)(SqliteRow(values))) return;
+    } catch (...) {
+      visit.thrown = std::current_exception();
+    }
+    sqlite3_result_error_code(context, SQLITE_ABORT);
+  }
+  static void end(sqlite3_context*) {}
+};
+
+int SqliteDatabase::visitRows(SqliteStatement& statement, const SqliteRowVisitor& visitor) {
+  visit_->visitor = &visitor;
+  visit_->thrown = nullptr;
+  int code = SQLITE_ROW;
+  while (code == SQLITE_ROW) code = statement.step();
+  visit_->visitor = nullptr;
+  if (visit_->thrown) std::rethrow_exception(std::exchange(visit_->thrown, nullptr));
+  return code;
+}
+
 SqliteDatabase::SqliteDatabase() = default;
 SqliteDatabase::SqliteDatabase(SqliteDatabase&& other) noexcept = default;
 SqliteDatabase::~SqliteDatabase() = default;
@@ -197,6 +243,7 @@ SqliteDatabase& SqliteDatabase::operator=(SqliteDatabase&& other) noexcept {
   unnamedLog_ = std::move(other.unnamedLog_);
   folder_ = std::move(other.folder_);
   image_ = std::move(other.image_);
+  visit_ = std::move(other.visit_);
   connection_ = std::move(other.connection_);
   return *this;
 }
@@ -290,7 +337,10 @@ int SqliteDatabase::configure(std::chrono::milliseconds busyTimeout) {
   sqlite3_db_config(connection, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
   sqlite3_db_config(connection, SQLITE_DBCONFIG_ENABLE_TRIGGER, 0, nullptr);
   sqlite3_db_config(connection, SQLITE_DBCONFIG_ENABLE_VIEW, 0, nullptr);
-  return execute("PRAGMA cell_size_check = ON");
+  visit_ = std::make_unique<Visit>();
+  const int code = sqlite3_create_function_v2(connection, "visit", -1, SQLITE_UTF8 | SQLITE_DIRECTONLY,
+                                              visit_.get(), nullptr, Visit::row, Visit::end, nullptr);
+  return code == SQLITE_OK ? execute("PRAGMA cell_size_check = ON") : code & kPrimaryCode;
 }
 
 void SqliteDatabase::setBusyTimeout(std::chrono::milliseconds busyTimeout) {

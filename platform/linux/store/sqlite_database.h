@@ -7,6 +7,7 @@
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -16,6 +17,7 @@
 
 struct sqlite3;
 struct sqlite3_stmt;
+struct sqlite3_value;
 
 namespace tbdaily {
 
@@ -51,6 +53,23 @@ class SqliteStatement {
   };
   std::unique_ptr<sqlite3_stmt, Finalizer> statement_;
 };
+
+// The arguments of `visit` in a statement, for the time of one call.
+class SqliteRow {
+ public:
+  explicit SqliteRow(sqlite3_value** values) : values_(values) {}
+
+  bool isInteger(int column) const;
+  bool isNumber(int column) const;  // an integer or a real
+  std::int64_t integer(int column) const;
+  double real(int column) const;
+
+ private:
+  sqlite3_value** values_;
+};
+
+// Answers whether it wants the next row.
+using SqliteRowVisitor = std::function<bool(const SqliteRow& row)>;
 
 // Resets a statement at the end of a block, so that it holds no lock and no borrowed text afterwards.
 class StatementRun {
@@ -102,6 +121,11 @@ class SqliteDatabase {
   bool hasMoved() const;
   std::int64_t changedRows() const;  // by the last statement
 
+  // Runs a statement "SELECT visit(A, B, ...) FROM ..." and calls `visitor` with each of its rows: quicker
+  // than one step for each, where all are wanted. SQLITE_DONE at the end, SQLITE_ABORT where the visitor
+  // ended it, or what went wrong. Passes on what the visitor throws.
+  int visitRows(SqliteStatement& statement, const SqliteRowVisitor& visitor);
+
   int execute(const char* sql);
   SqliteStatement prepare(std::string_view sql);
   // The first column of the first row.
@@ -118,6 +142,8 @@ class SqliteDatabase {
  private:
   int configure(std::chrono::milliseconds busyTimeout);
 
+  struct Visit;
+  std::unique_ptr<Visit> visit_;  // that is under way; the connection knows its place
   struct Closer {
     void operator()(sqlite3* connection) const;
   };
