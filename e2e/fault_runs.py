@@ -175,7 +175,7 @@ class Day:
     def _starts_with(self, shim):
         """Not under a sanitizer, which wants to be first."""
         try:
-            probe = subprocess.run([BIN / "tbdaily", "-x"], env=self._environment(self.sample, shim), capture_output=True,
+            probe = subprocess.run([BIN / "tbdaily", "-x"], env=self.environment(self.sample, shim), capture_output=True,
                                    timeout=SECONDS)
         except subprocess.TimeoutExpired:
             return False
@@ -184,7 +184,7 @@ class Day:
         return probe.returncode == 0
 
     @staticmethod
-    def _environment(device, shim, **more):
+    def environment(device, shim, **more):
         return dict(device.env, LD_PRELOAD=shim, ASAN_OPTIONS=device.env["ASAN_OPTIONS"] + ":verify_asan_link_order=0",
                     **more)
 
@@ -239,7 +239,7 @@ class Day:
         device = self.copy()
         try:
             sites = device.base / "sites"
-            environment = self._environment(device, self.shims["memory"], FAULT_SITES=str(sites))
+            environment = self.environment(device, self.shims["memory"], FAULT_SITES=str(sites))
             subprocess.run([BIN / "tbdaily", "-d"], env=environment, capture_output=True, timeout=SECONDS, check=True)
             return [int(line) for line in sites.read_text().split()]
         finally:
@@ -254,7 +254,7 @@ class Day:
 
     def _case(self, device, mode, at):
         mark, journal = device.base / "mark", device.base / "journal"
-        environment = self._environment(device, self.shims[mode.shim], FAULT_AT=str(at), FAULT_MARK=str(mark))
+        environment = self.environment(device, self.shims[mode.shim], FAULT_AT=str(at), FAULT_MARK=str(mark))
         if mode.fault:
             environment["FAULT_MODE"] = mode.fault
         if mode.name in ("power", "torn"):

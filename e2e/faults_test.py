@@ -33,8 +33,8 @@ class Faults(unittest.TestCase):
         self.addCleanup(device.close)
         mark, temporary = device.base / "mark", device.base / "temporary"
         temporary.mkdir()
-        environment = dict(device.env, LD_PRELOAD=self.day.shims["calls"], FAULT_MODE="kill", FAULT_AT="1",
-                           FAULT_MARK=str(mark), TMPDIR=str(temporary))
+        environment = self.day.environment(device, self.day.shims["calls"], FAULT_MODE="kill", FAULT_AT="1",
+                                           FAULT_MARK=str(mark), TMPDIR=str(temporary))
         subprocess.run([BIN / "tallyctl", "report", "--preview"], env=environment, check=True, capture_output=True)
         self.assertFalse(mark.exists(), "the preview changes files")
 

@@ -138,6 +138,10 @@ PlistDictionary::PlistDictionary(std::initializer_list<Entry> entries) {
 }
 
 std::size_t PlistDictionary::indexOf(std::string_view key) const {
+  return indexOf(key, slots_.empty() ? 0 : KeyedHash::of(key));
+}
+
+std::size_t PlistDictionary::indexOf(std::string_view key, std::uint32_t hash) const {
   if (slots_.empty()) {
     for (std::size_t i = 0; i < entries_.size(); ++i) {
       if (entries_[i].first == key) return i;
@@ -145,7 +149,6 @@ std::size_t PlistDictionary::indexOf(std::string_view key) const {
     return kNoEntry;
   }
   const std::size_t mask = slots_.size() - 1;
-  const std::uint32_t hash = KeyedHash::of(key);
   for (std::size_t slot = hash & mask; slots_[slot].entry != 0; slot = (slot + 1) & mask) {
     const std::size_t entry = slots_[slot].entry - 1;
     if (slots_[slot].hash == hash && entries_[entry].first == key) return entry;
@@ -153,19 +156,22 @@ std::size_t PlistDictionary::indexOf(std::string_view key) const {
   return kNoEntry;
 }
 
-void PlistDictionary::insertIntoIndex(std::size_t entry) {
-  const std::size_t mask = slots_.size() - 1;
-  const std::uint32_t hash = KeyedHash::of(entries_[entry].first);
-  std::size_t slot = hash & mask;
-  while (slots_[slot].entry != 0) slot = (slot + 1) & mask;
-  slots_[slot] = {hash, static_cast<std::uint32_t>(entry + 1)};
+void PlistDictionary::place(std::vector<Slot>& slots, const Slot& filled) {
+  const std::size_t mask = slots.size() - 1;
+  std::size_t slot = filled.hash & mask;
+  while (slots[slot].entry != 0) slot = (slot + 1) & mask;
+  slots[slot] = filled;
+}
+
+PlistDictionary::Slot PlistDictionary::slotOf(std::size_t entry) const {
+  return {KeyedHash::of(entries_[entry].first), static_cast<std::uint32_t>(entry + 1)};
 }
 
 void PlistDictionary::rebuildIndex() {
   slots_.clear();
   if (entries_.size() < kIndexFrom) return;
-  slots_.resize(std::bit_ceil(entries_.size() * 4));
-  for (std::size_t i = 0; i < entries_.size(); ++i) insertIntoIndex(i);
+  slots_.resize(std::bit_ceil(entries_.size() * 2));
+  for (std::size_t i = 0; i < entries_.size(); ++i) place(slots_, slotOf(i));
 }
 
 const PlistValue* PlistDictionary::find(std::string_view key) const {
@@ -185,22 +191,29 @@ PlistValue PlistDictionary::get(std::string_view key) const {
 
 void PlistDictionary::set(std::string_view key, PlistValue value) {
   if (value.isNone()) return remove(key);
-  const std::size_t entry = indexOf(key);
+  const std::uint32_t hash = slots_.empty() ? 0 : KeyedHash::of(key);
+  const std::size_t entry = indexOf(key, hash);
   if (entry != kNoEntry) {
     entries_[entry].second = std::move(value);
     return;
   }
   // What may run out of memory comes first: the dictionary has the entry and its index, or neither.
   const std::size_t count = entries_.size() + 1;
-  const bool isIndexFull = count >= kIndexFrom && count * 2 > slots_.size();
-  std::vector<Slot> larger(isIndexFull ? std::bit_ceil(count * 4) : 0);
+  const bool isIndexFull = count >= kIndexFrom && count * 4 > slots_.size() * 3;
+  std::vector<Slot> larger(isIndexFull ? std::bit_ceil(count * 2) : 0);
   entries_.emplace_back(std::string(key), std::move(value));
-  if (isIndexFull) {
+  if (slots_.empty() && isIndexFull) {
     slots_ = std::move(larger);
-    for (std::size_t i = 0; i < count; ++i) insertIntoIndex(i);
-  } else if (!slots_.empty()) {
-    insertIntoIndex(count - 1);
+    for (std::size_t i = 0; i < count; ++i) place(slots_, slotOf(i));
+    return;
   }
+  if (isIndexFull) {
+    for (const Slot& slot : slots_) {
+      if (slot.entry != 0) place(larger, slot);
+    }
+    slots_ = std::move(larger);
+  }
+  if (!slots_.empty()) place(slots_, {hash, static_cast<std::uint32_t>(count)});
 }
 
 void PlistDictionary::remove(std::string_view key) {

@@ -166,15 +166,18 @@ class PlistDictionary {
   static constexpr std::size_t kNoEntry = static_cast<std::size_t>(-1);
   static constexpr std::size_t kIndexFrom = 9;  // smaller dictionaries are searched in order
 
-  std::size_t indexOf(std::string_view key) const;
-  void insertIntoIndex(std::size_t entry);
-  void rebuildIndex();
-
-  std::vector<Entry> entries_;
   struct Slot {
     std::uint32_t hash = 0;   // tells most other keys apart without a look at them
     std::uint32_t entry = 0;  // number plus 1; 0 is free
   };
+
+  std::size_t indexOf(std::string_view key) const;
+  std::size_t indexOf(std::string_view key, std::uint32_t hash) const;
+  Slot slotOf(std::size_t entry) const;
+  static void place(std::vector<Slot>& slots, const Slot& filled);
+  void rebuildIndex();
+
+  std::vector<Entry> entries_;
   std::vector<Slot> slots_;  // open addressing over entries_; a power of two long
 };
 

@@ -3,6 +3,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <span>
 #include <string>
 
@@ -27,12 +28,20 @@ struct PlistWriteResult {
   std::string error;  // one line; empty on success
 };
 
+// Takes a piece of what is written; false ends the writing.
+using PlistPieceSink = std::function<bool(std::span<const std::byte> piece)>;
+
 class PropertyListCodec {
  public:
   virtual ~PropertyListCodec() = default;
 
   virtual PlistParseResult parse(std::span<const std::byte> bytes) = 0;
   virtual PlistWriteResult write(const PlistValue& value, PlistForm form = PlistForm::Exact) = 0;
+  // Why the value cannot be written in that form, in one line; empty when it can.
+  virtual std::string whyUnwritable(const PlistValue& value, PlistForm form) = 0;
+  // The same bytes, piece by piece as they come to be: the result's stay empty.
+  virtual PlistWriteResult writeInPieces(const PlistValue& value, PlistForm form,
+                                         const PlistPieceSink& sink) = 0;
 };
 
 }  // namespace tbdaily

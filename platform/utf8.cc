@@ -2,6 +2,7 @@
 
 #include <array>
 #include <cstdio>
+#include <cstring>
 
 namespace tbdaily {
 
@@ -35,10 +36,25 @@ std::size_t carriedCharacterLength(std::string_view text) {
 
 namespace {
 
-// Whether the length that the function gives is never 0 on the way through the text.
+// Whether the next eight bytes are ASCII characters and no controls but DEL.
+bool beginsPlain(std::string_view text) {
+  constexpr std::uint64_t kHighBits = 0x8080808080808080, kSpaces = 0x2020202020202020;
+  std::uint64_t word = 0;
+  if (text.size() < sizeof word) return false;
+  std::memcpy(&word, text.data(), sizeof word);
+  // A byte below a space borrows from its high bit.
+  return ((word | (word - kSpaces)) & kHighBits) == 0;
+}
+
+// Whether the length that the function gives is never 0 on the way through the text, where plain characters
+// have a length of 1.
 template <typename CharacterLength>
 bool holdsOnly(std::string_view text, CharacterLength characterLength) {
   while (!text.empty()) {
+    if (beginsPlain(text)) {
+      text.remove_prefix(sizeof(std::uint64_t));
+      continue;
+    }
     const std::size_t length = characterLength(text);
     if (length == 0) return false;
     text.remove_prefix(length);

@@ -70,15 +70,19 @@ void TBReport::serializeWithDateAndAppInfo(DayNumber day, const PlistValue& appI
   const std::string whitelistDigest = _config != nullptr ? _config->configFileDigest() : "";
   _config.reset();
   const PlistValue root = PlistValue::dictionary(rootDictionary(day, appInfo, whitelistDigest));
-  const PlistWriteResult serialized = platform_.propertyListCodec.write(root, PlistForm::Plain);
-  if (!serialized.ok) {
-    platform_.systemLog.message(LogLevel::Error, "Could not create tallyd plist: %@", serialized.error);
+  PropertyListCodec& codec = platform_.propertyListCodec;
+  if (const std::string fault = codec.whyUnwritable(root, PlistForm::Plain); !fault.empty()) {
+    platform_.systemLog.message(LogLevel::Error, "Could not create tallyd plist: %@", fault);
     return;
   }
   const PlistValue options = noteOSVersion();
   const bool written = platform_.logSubmission.writeLogForSubmission(
-      kLogType, kLogName, options, PlistValue(),
-      [&serialized](LogOutput& file) { return file.write(std::as_bytes(std::span(serialized.bytes))); });
+      kLogType, kLogName, options, PlistValue(), [&](LogOutput& file) {
+        return codec
+            .writeInPieces(root, PlistForm::Plain,
+                           [&file](std::span<const std::byte> piece) { return file.write(piece); })
+            .ok;
+      });
   if (!written) platform_.systemLog.message(LogLevel::Error, "Failed to write tallyd log");
 }
 

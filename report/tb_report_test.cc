@@ -93,7 +93,7 @@ TEST_F(TBReportTest, IsNotWrittenWhenNothingWhitelistedHappened) {
 }
 
 TEST_F(TBReportTest, RemembersTheOSVersionBeforeTheLogIsWritten) {
-  fake_.propertyListCodec.writeError = "too odd";
+  fake_.propertyListCodec.fault = "too odd";
   writeLog();
   EXPECT_TRUE(fake_.systemLog.has("error: Could not create tallyd plist: too odd"));
   EXPECT_THAT(fake_.preferences.writes, IsEmpty());

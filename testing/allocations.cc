@@ -11,9 +11,11 @@ thread_local std::size_t refusedAt = kNever;
 
 }  // namespace
 
+[[gnu::noinline]] void* operator new(std::size_t size, const std::nothrow_t&) noexcept {
+  return ++taken == refusedAt ? nullptr : std::malloc(size != 0 ? size : 1);
+}
 [[gnu::noinline]] void* operator new(std::size_t size) {
-  if (++taken == refusedAt) throw std::bad_alloc();
-  void* memory = std::malloc(size != 0 ? size : 1);
+  void* memory = ::operator new(size, std::nothrow);
   if (memory == nullptr) throw std::bad_alloc();
   return memory;
 }

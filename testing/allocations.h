@@ -9,7 +9,7 @@ namespace tbdaily::testing {
 // Of this thread, since it began.
 std::size_t allocations();
 
-// While it lives, the n-th allocation (from 1) of this thread from now on throws std::bad_alloc. One at a
+// While it lives, the n-th allocation (from 1) of this thread from now on fails. One at a
 // time.
 class RefusedAllocation {
  public:

@@ -10,14 +10,17 @@ namespace tbdaily::testing {
 
 class FakePropertyListCodec : public PlistCodec {
  public:
-  PlistWriteResult write(const PlistValue& value, PlistForm form = PlistForm::Exact) override {
+  std::string whyUnwritable(const PlistValue& value, PlistForm form) override {
+    return fault.empty() ? PlistCodec::whyUnwritable(value, form) : std::exchange(fault, {});
+  }
+  PlistWriteResult writeInPieces(const PlistValue& value, PlistForm form,
+                                 const PlistPieceSink& sink) override {
     forms.push_back(form);
-    if (!writeError.empty()) return {false, {}, std::exchange(writeError, {})};
-    return PlistCodec::write(value, form);
+    return PlistCodec::writeInPieces(value, form, sink);
   }
 
-  std::vector<PlistForm> forms;  // of the writes so far, failed ones too
-  std::string writeError;        // of the next one, unless empty
+  std::vector<PlistForm> forms;  // of the writes so far
+  std::string fault;             // of the next value that is asked about, unless empty
 };
 
 }  // namespace tbdaily::testing

@@ -21,8 +21,17 @@ PlistParseResult PlistCodec::parse(std::span<const std::byte> bytes) {
 }
 
 PlistWriteResult PlistCodec::write(const PlistValue& value, PlistForm form) {
+  return writeInPieces(value, form, nullptr);
+}
+
+std::string PlistCodec::whyUnwritable(const PlistValue& value, PlistForm form) {
+  return whyNoXmlPlist(value, form);
+}
+
+PlistWriteResult PlistCodec::writeInPieces(const PlistValue& value, PlistForm form,
+                                           const PlistPieceSink& sink) {
   try {
-    return writeXmlPlist(value, form);
+    return writeXmlPlist(value, form, sink);
   } catch (const std::exception&) {
     return {false, {}, kOutOfMemory};
   }

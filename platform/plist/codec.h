@@ -12,6 +12,9 @@ class PlistCodec : public PropertyListCodec {
   // (binary).
   PlistParseResult parse(std::span<const std::byte> bytes) override;
   PlistWriteResult write(const PlistValue& value, PlistForm form = PlistForm::Exact) override;
+  std::string whyUnwritable(const PlistValue& value, PlistForm form) override;
+  PlistWriteResult writeInPieces(const PlistValue& value, PlistForm form,
+                                 const PlistPieceSink& sink) override;
 };
 
 }  // namespace tbdaily

@@ -19,6 +19,7 @@ namespace {
 
 constexpr std::string_view kHeader = "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<plist version=\"1.0\">\n";
 constexpr std::string_view kFooter = "</plist>\n";
+constexpr std::size_t kPieceSize = 64 * 1024;
 
 // The bytes of a text that cannot be copied as they are without a look at them.
 constexpr auto kNeedsCare = [] {
@@ -46,19 +47,21 @@ std::string_view escapeOf(char c) {
 
 class XmlWriter {
  public:
-  explicit XmlWriter(PlistForm form)
-      : exact_(form != PlistForm::Plain), replaces_(form != PlistForm::Exact) {}
+  XmlWriter(PlistForm form, const PlistPieceSink& sink)
+      : exact_(form != PlistForm::Plain), replaces_(form != PlistForm::Exact), sink_(sink) {}
 
   PlistWriteResult write(const PlistValue& value) {
     out_ += kHeader;
     if (!writeValue(value, 0)) return {false, {}, error_};
     out_ += kFooter;
+    if (sink_ && !handOn()) return {false, {}, error_};
     return {true, std::move(out_), {}};
   }
 
  private:
   // Each answers false after a failure, with the reason in error_.
   bool fail(const char* reason);
+  bool handOn();
   bool writeValue(const PlistValue& value, int depth);
   bool writeArray(const PlistArray& elements, int depth);
   bool writeDictionary(const PlistDictionary& entries, int depth);
@@ -71,6 +74,7 @@ class XmlWriter {
 
   bool exact_;
   bool replaces_;  // what XML cannot carry
+  const PlistPieceSink& sink_;
   std::string out_;
   const char* error_ = "";
 };
@@ -80,7 +84,14 @@ bool XmlWriter::fail(const char* reason) {
   return false;
 }
 
+bool XmlWriter::handOn() {
+  if (!sink_(std::as_bytes(std::span(out_)))) return fail("nobody takes what is written");
+  out_.clear();
+  return true;
+}
+
 bool XmlWriter::writeValue(const PlistValue& value, int depth) {
+  if (sink_ && out_.size() >= kPieceSize && !handOn()) return false;
   indent(depth);
   if (const auto text = value.asString()) return writeText("<string>", *text, "</string>\n");
   if (const auto number = value.asNumber()) {
@@ -198,8 +209,13 @@ void XmlWriter::writeReal(const PlistNumber& number) {
 
 }  // namespace
 
-PlistWriteResult writeXmlPlist(const PlistValue& value, PlistForm form) {
-  return XmlWriter(form).write(value);
+PlistWriteResult writeXmlPlist(const PlistValue& value, PlistForm form, const PlistPieceSink& sink) {
+  return XmlWriter(form, sink).write(value);
+}
+
+std::string whyNoXmlPlist(const PlistValue& value, PlistForm form) {
+  const PlistPieceSink nobody = [](std::span<const std::byte>) { return true; };
+  return XmlWriter(form, nobody).write(value).error;
 }
 
 }  // namespace tbdaily

@@ -5,7 +5,10 @@
 
 namespace tbdaily {
 
-// May throw std::bad_alloc.
-PlistWriteResult writeXmlPlist(const PlistValue& value, PlistForm form);
+// Into the result, or piece by piece into a sink. May throw std::bad_alloc, and what the sink throws.
+PlistWriteResult writeXmlPlist(const PlistValue& value, PlistForm form, const PlistPieceSink& sink = nullptr);
+
+// What keeps the value from being written; empty when nothing does.
+std::string whyNoXmlPlist(const PlistValue& value, PlistForm form);
 
 }  // namespace tbdaily

@@ -124,8 +124,11 @@ class DayRows {
     return true;
   }
 
-  // Those of one key, by day.
-  auto of(std::int64_t keyId) const { return std::ranges::equal_range(rows_, keyId, {}, &Row::keyId); }
+  // Those of one key, by day: from the first on as long as isOf holds.
+  auto firstOf(std::int64_t keyId) const { return std::ranges::lower_bound(rows_, keyId, {}, &Row::keyId); }
+  bool isOf(std::deque<Row>::const_iterator row, std::int64_t keyId) const {
+    return row != rows_.end() && row->keyId == keyId;
+  }
 
  private:
   // In the order of the table. A foreign program may have left days with a fraction.
@@ -327,10 +330,11 @@ void LinuxOpenHistory::enumerate(std::string_view keyPrefix, const DayRows& rows
     if (hasKey && name <= key) return reader_.noteDisorder();
     key = name;
     hasKey = true;
-    const auto ofKey = rows.of(keys.integer(1));
-    if (ofKey.empty() || !reader_.isUsableKey(key)) continue;
-    for (const DayRows::Row& each : ofKey) {
-      if (!row(std::string_view(key), each)) return;
+    const std::int64_t keyId = keys.integer(1);
+    auto each = rows.firstOf(keyId);
+    if (!rows.isOf(each, keyId) || !reader_.isUsableKey(key)) continue;
+    for (; rows.isOf(each, keyId); ++each) {
+      if (!row(std::string_view(key), *each)) return;
     }
   }
   reader_.noteEnd(code);
