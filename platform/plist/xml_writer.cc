@@ -19,7 +19,7 @@ namespace {
 
 constexpr std::string_view kHeader = "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<plist version=\"1.0\">\n";
 constexpr std::string_view kFooter = "</plist>\n";
-constexpr std::size_t kPieceSize = 64 * 1024;
+constexpr std::size_t kPieceSize = std::size_t{64} << 10;
 
 // The bytes of a text that cannot be copied as they are without a look at them.
 constexpr auto kNeedsCare = [] {

@@ -4,7 +4,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <compare>
 #include <deque>
 #include <limits>
 #include <optional>
@@ -126,7 +125,7 @@ class DayRows {
 
   // Those of one key, by day: from the first on as long as isOf holds.
   auto firstOf(std::int64_t keyId) const { return std::ranges::lower_bound(rows_, keyId, {}, &Row::keyId); }
-  bool isOf(std::deque<Row>::const_iterator row, std::int64_t keyId) const {
+  bool isOf(const std::deque<Row>::const_iterator& row, std::int64_t keyId) const {
     return row != rows_.end() && row->keyId == keyId;
   }
 
@@ -135,7 +134,9 @@ class DayRows {
   struct Place {
     std::int64_t keyId;
     double day;
-    auto operator<=>(const Place&) const = default;
+    friend bool operator<(const Place& a, const Place& b) {
+      return a.keyId != b.keyId ? a.keyId < b.keyId : a.day < b.day;
+    }
   };
 
   // Reads on from a place until rows of other days had better be jumped over, to `next`, or to the end.

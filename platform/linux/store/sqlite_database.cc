@@ -5,7 +5,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <array>
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
 #include <exception>
 #include <map>
@@ -54,21 +56,26 @@ class UnnamedLogs {
   std::map<std::string, int, std::less<>> files_;
 };
 
+constexpr std::string_view kDescriptors = "/proc/self/fd/";
+
 std::string descriptorPath(int file) {
-  return "/proc/self/fd/" + std::to_string(file);
+  return std::string(kDescriptors).append(std::to_string(file));
 }
 bool isDescriptorPath(std::string_view path) {
-  constexpr std::string_view kPrefix = "/proc/self/fd/";
-  return path.starts_with(kPrefix) && path.find('/', kPrefix.size()) == path.npos;
+  return path.starts_with(kDescriptors) && path.find('/', kDescriptors.size()) == path.npos;
 }
 
-// Opens a regular file or a folder alone. Never waits for the other end of a pipe.
-int openJudged(const char* path, int flags, int mode) {
-  const auto log = UnnamedLogs::all().find(path);
-  const std::string meant = log ? descriptorPath(*log) : path;
-  if (isDescriptorPath(meant))
+// Opens a regular file or a folder alone. Never waits for the other end of a pipe. SQLite calls it with its
+// locks held: nothing may be thrown, and so nothing is allocated.
+int openJudged(const char* path, int flags, int mode) noexcept {
+  std::array<char, 64> logPath;
+  if (const auto log = UnnamedLogs::all().find(path)) {
+    std::snprintf(logPath.data(), logPath.size(), "%s%d", kDescriptors.data(), *log);
+    path = logPath.data();
+  }
+  if (isDescriptorPath(path))
     flags &= ~(O_NOFOLLOW | O_CREAT);  // the one link that leads to a file without a name
-  const int file = ::open(meant.c_str(), flags | O_NONBLOCK | O_NOCTTY | O_CLOEXEC, mode);
+  const int file = ::open(path, flags | O_NONBLOCK | O_NOCTTY | O_CLOEXEC, mode);
   if (file < 0) return file;
   struct stat status {};
   int error = ::fstat(file, &status) == 0 ? 0 : errno;
@@ -81,7 +88,7 @@ int openJudged(const char* path, int flags, int mode) {
   return -1;
 }
 
-int takePathAsItIs(sqlite3_vfs*, const char* path, int room, char* out) {
+int takePathAsItIs(sqlite3_vfs*, const char* path, int room, char* out) noexcept {
   const std::size_t length = std::strlen(path) + 1;
   if (length > static_cast<std::size_t>(room)) return SQLITE_CANTOPEN;
   std::memcpy(out, path, length);
@@ -93,7 +100,7 @@ sqlite3_vfs* usualFileLayer() {
   return usual;
 }
 
-int knowUnnamedLogs(sqlite3_vfs*, const char* path, int question, int* answer) {
+int knowUnnamedLogs(sqlite3_vfs*, const char* path, int question, int* answer) noexcept {
   const auto log = UnnamedLogs::all().find(path);
   if (!log) return usualFileLayer()->xAccess(usualFileLayer(), path, question, answer);
   struct stat status {};
