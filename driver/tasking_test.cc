@@ -87,7 +87,7 @@ TEST_F(TaskingTest, WhatADomainDoesNotTakeIsMadeUpByTheNextRun) {
   EXPECT_EQ(plistText(job("TaskingUnwritten")), R"([{"Domain": "b", "Key": "x", "Value": 2}])");
   EXPECT_EQ(setting("a", "y"), 2);
 
-  fake_.preferences.unwritable.clear();
+  fake_.preferences.unwritable.reset();
   run();
   EXPECT_EQ(setting("b", "x"), 2);
   EXPECT_TRUE(job("TaskingUnwritten").isNone());
@@ -96,7 +96,7 @@ TEST_F(TaskingTest, WhatADomainDoesNotTakeIsMadeUpByTheNextRun) {
   schedule(R"({"TaskingID": "t3"})");
   run();
   EXPECT_EQ(setting("b", "x"), 2);
-  fake_.preferences.unwritable.clear();
+  fake_.preferences.unwritable.reset();
   run();
   EXPECT_TRUE(fake_.preferences.getValue("x", "b").isNone());
 }

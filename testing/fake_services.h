@@ -7,6 +7,7 @@
 #include <deque>
 #include <functional>
 #include <map>
+#include <optional>
 #include <set>
 #include <string>
 #include <utility>
@@ -53,14 +54,17 @@ class FakePreferences : public PreferencesStore {
   std::vector<std::string> applyChanges(std::span<const PreferenceChange> changes) override {
     std::set<std::string> unwritten;
     for (const PreferenceChange& change : changes) {
-      if (change.domain == unwritable) unwritten.emplace(change.domain);
-      if (change.domain != unwritable) setValue(change.key, change.value, change.domain);
+      if (unwritable == change.domain) {
+        unwritten.emplace(change.domain);
+      } else {
+        setValue(change.key, change.value, change.domain);
+      }
     }
     return {unwritten.begin(), unwritten.end()};
   }
 
   ByName<PlistDictionary> domains;
-  std::string unwritable;  // a domain that takes no changes for now
+  std::optional<std::string> unwritable;  // a domain that takes no changes for now
   std::vector<std::string> writes;
 };
 
