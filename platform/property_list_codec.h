@@ -37,8 +37,8 @@ class PropertyListCodec {
 
   virtual PlistParseResult parse(std::span<const std::byte> bytes) = 0;
   virtual PlistWriteResult write(const PlistValue& value, PlistForm form = PlistForm::Exact) = 0;
-  // Why the value cannot be written in that form, in one line; empty when it can.
-  virtual std::string whyUnwritable(const PlistValue& value, PlistForm form) = 0;
+  // Why the value cannot be written in the plain form, in one line; empty when it can.
+  virtual std::string whyNotPlain(const PlistValue& value) = 0;
   // The same bytes, piece by piece as they come to be: the result's stay empty.
   virtual PlistWriteResult writeInPieces(const PlistValue& value, PlistForm form,
                                          const PlistPieceSink& sink) = 0;

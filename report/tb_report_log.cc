@@ -71,7 +71,7 @@ void TBReport::serializeWithDateAndAppInfo(DayNumber day, const PlistValue& appI
   _config.reset();
   const PlistValue root = PlistValue::dictionary(rootDictionary(day, appInfo, whitelistDigest));
   PropertyListCodec& codec = platform_.propertyListCodec;
-  if (const std::string fault = codec.whyUnwritable(root, PlistForm::Plain); !fault.empty()) {
+  if (const std::string fault = codec.whyNotPlain(root); !fault.empty()) {
     platform_.systemLog.message(LogLevel::Error, "Could not create tallyd plist: %@", fault);
     return;
   }

@@ -10,8 +10,8 @@ namespace tbdaily::testing {
 
 class FakePropertyListCodec : public PlistCodec {
  public:
-  std::string whyUnwritable(const PlistValue& value, PlistForm form) override {
-    return fault.empty() ? PlistCodec::whyUnwritable(value, form) : std::exchange(fault, {});
+  std::string whyNotPlain(const PlistValue& value) override {
+    return fault.empty() ? PlistCodec::whyNotPlain(value) : std::exchange(fault, {});
   }
   PlistWriteResult writeInPieces(const PlistValue& value, PlistForm form,
                                  const PlistPieceSink& sink) override {

@@ -24,8 +24,8 @@ PlistWriteResult PlistCodec::write(const PlistValue& value, PlistForm form) {
   return writeInPieces(value, form, nullptr);
 }
 
-std::string PlistCodec::whyUnwritable(const PlistValue& value, PlistForm form) {
-  return whyNoXmlPlist(value, form);
+std::string PlistCodec::whyNotPlain(const PlistValue& value) {
+  return whyNoPlainXmlPlist(value);
 }
 
 PlistWriteResult PlistCodec::writeInPieces(const PlistValue& value, PlistForm form,

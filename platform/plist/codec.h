@@ -12,7 +12,7 @@ class PlistCodec : public PropertyListCodec {
   // (binary).
   PlistParseResult parse(std::span<const std::byte> bytes) override;
   PlistWriteResult write(const PlistValue& value, PlistForm form = PlistForm::Exact) override;
-  std::string whyUnwritable(const PlistValue& value, PlistForm form) override;
+  std::string whyNotPlain(const PlistValue& value) override;
   PlistWriteResult writeInPieces(const PlistValue& value, PlistForm form,
                                  const PlistPieceSink& sink) override;
 };

@@ -246,6 +246,34 @@ TEST(PropertyListCodec, NestingEndsAt512LevelsInEveryDirection) {
   }
 }
 
+TEST(PropertyListCodec, WritesTheSameInPiecesAndSaysBeforehandWhatItCannotWrite) {
+  PlistValue nested;
+  for (int depth = 0; depth < 513; ++depth)
+    nested = depth % 2 != 0 ? PlistValue::array({nested}) : PlistValue::dictionary({{"k", nested}});
+  const PlistValue odd[] = {
+      PlistValue(),
+      PlistValue::array({PlistValue()}),
+      PlistValue(PlistDate{HUGE_VAL}),
+      nested,
+      PlistValue::dictionary({{"k", PlistValue::array({PlistValue(PlistDate{1e300})})}}),
+      PlistValue::string("\x01\xff"),
+      PlistValue::array(PlistArray(20000, PlistValue::string("a & b")))};
+  PlistCodec codec;
+  for (const PlistValue& value : odd) {
+    const PlistWriteResult whole = codec.write(value, PlistForm::Plain);
+    EXPECT_EQ(codec.whyNotPlain(value), whole.error);
+    std::string pieces;
+    std::size_t count = 0;
+    const auto take = [&](std::span<const std::byte> piece) {
+      pieces.append(reinterpret_cast<const char*>(piece.data()), piece.size());
+      return ++count < 100;
+    };
+    EXPECT_EQ(codec.writeInPieces(value, PlistForm::Plain, take).ok, whole.ok);
+    EXPECT_EQ(whole.ok ? pieces : "", whole.bytes);
+    EXPECT_FALSE(codec.writeInPieces(value, PlistForm::Plain, [](auto) { return false; }).ok);
+  }
+}
+
 TEST(PropertyListCodec, ReadsEveryBinaryKind) {
   const std::pair<std::string, PlistValue> cases[] = {
       {"\x08", PlistValue::boolean(false)},

@@ -19,6 +19,8 @@ namespace {
 
 constexpr std::string_view kHeader = "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<plist version=\"1.0\">\n";
 constexpr std::string_view kFooter = "</plist>\n";
+constexpr const char* kAbsentValueError = "an absent value cannot be written";
+constexpr const char* kDateError = "a date outside of the calendar";
 constexpr std::size_t kPieceSize = std::size_t{64} << 10;
 
 // The bytes of a text that cannot be copied as they are without a look at them.
@@ -106,7 +108,7 @@ bool XmlWriter::writeValue(const PlistValue& value, int depth) {
   }
   if (const auto date = value.asDate()) return writeDate(*date);
   const auto bytes = value.asData();
-  if (!bytes) return fail("an absent value cannot be written");
+  if (!bytes) return fail(kAbsentValueError);
   out_ += "<data>";
   appendBase64(out_, *bytes);
   out_ += "</data>\n";
@@ -173,7 +175,7 @@ bool XmlWriter::writeText(std::string_view opening, std::string_view text, std::
 }
 
 bool XmlWriter::writeDate(PlistDate date) {
-  if (!isRepresentable(date)) return fail("a date outside of the calendar");
+  if (!isRepresentable(date)) return fail(kDateError);
   out_ += "<date>";
   out_ += exact_ ? exactDateText(date) : dateText(date, DateFraction::Drop);
   out_ += "</date>\n";
@@ -207,15 +209,35 @@ void XmlWriter::writeReal(const PlistNumber& number) {
   out_ += "</real>\n";
 }
 
+// What the writer would fail with in the plain form, which replaces every character that XML cannot carry.
+const char* faultIn(const PlistValue& value, int depth) {
+  const PlistDictionary* entries = value.asDictionary();
+  const PlistArray* elements = value.asArray();
+  const char* fault = "";
+  if (entries != nullptr || elements != nullptr) {
+    if (depth == kPlistNestingLimit) return kPlistNestingError;
+    if (entries != nullptr) {
+      for (auto entry = entries->begin(); *fault == '\0' && entry != entries->end(); ++entry)
+        fault = faultIn(entry->second, depth + 1);
+    } else {
+      for (auto element = elements->begin(); *fault == '\0' && element != elements->end(); ++element)
+        fault = faultIn(*element, depth + 1);
+    }
+    return fault;
+  }
+  if (value.isNone()) return kAbsentValueError;
+  const auto date = value.asDate();
+  return date && !isRepresentable(*date) ? kDateError : "";
+}
+
 }  // namespace
 
 PlistWriteResult writeXmlPlist(const PlistValue& value, PlistForm form, const PlistPieceSink& sink) {
   return XmlWriter(form, sink).write(value);
 }
 
-std::string whyNoXmlPlist(const PlistValue& value, PlistForm form) {
-  const PlistPieceSink nobody = [](std::span<const std::byte>) { return true; };
-  return XmlWriter(form, nobody).write(value).error;
+std::string whyNoPlainXmlPlist(const PlistValue& value) {
+  return faultIn(value, 0);
 }
 
 }  // namespace tbdaily

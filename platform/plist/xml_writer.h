@@ -8,7 +8,7 @@ namespace tbdaily {
 // Into the result, or piece by piece into a sink. May throw std::bad_alloc, and what the sink throws.
 PlistWriteResult writeXmlPlist(const PlistValue& value, PlistForm form, const PlistPieceSink& sink = nullptr);
 
-// What keeps the value from being written; empty when nothing does.
-std::string whyNoXmlPlist(const PlistValue& value, PlistForm form);
+// What keeps the value from being written in the plain form; empty when nothing does.
+std::string whyNoPlainXmlPlist(const PlistValue& value);
 
 }  // namespace tbdaily

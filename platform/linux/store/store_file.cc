@@ -259,13 +259,8 @@ std::string storeLogOf(const std::string& name) {
 
 std::optional<std::string_view> analyticsKeyFault(std::string_view key) {
   if (key.size() > kLongestAnalyticsKey) return "the key is longer than 1024 bytes";
-  while (!key.empty()) {
-    const std::size_t length = utf8CharacterLength(key);
-    if (length == 0) return "the key is not UTF-8";
-    if (carriedCharacterLength(key) == 0) return "the key holds a character that a report cannot carry";
-    key.remove_prefix(length);
-  }
-  return std::nullopt;
+  if (isCarriedText(key)) return std::nullopt;
+  return isUtf8(key) ? "the key holds a character that a report cannot carry" : "the key is not UTF-8";
 }
 
 StoreResult unusableStore(const StorePlace& place, std::string_view reason) {
