@@ -8,6 +8,7 @@ as many days before it too. The store is written as other programs do, and the n
 """
 
 import argparse
+import datetime
 import pathlib
 import plistlib
 import random
@@ -62,6 +63,7 @@ def main():
     write_list(chosen.root, "var/mobile/Library/Preferences/com.velmora.Crashferry.plist",
                {"DiagnosticLogSubmissionEnabled": True})
     write_list(chosen.root, "System/Device/usage.plist", {"records": []})
+    write_list(chosen.root, "System/Device/clock.plist", {"now": datetime.datetime(2026, 11, 24, 9, 7, 4)})
     store = chosen.root / "var/mobile/Library/Tallybook/TBDataStore.sqlitedb"
     store.parent.mkdir(parents=True, exist_ok=True)
     database = sqlite3.connect(store)
