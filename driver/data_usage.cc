@@ -1,6 +1,7 @@
 #include "driver/data_usage.h"
 
 #include <chrono>
+#include <deque>
 #include <memory>
 #include <semaphore>
 #include <string>
@@ -19,7 +20,6 @@ namespace tbdaily {
 namespace {
 
 constexpr std::int64_t kBytesPerKB = 1024;
-constexpr std::size_t kIncrementsAtOnce = 4096;  // of a long reply
 constexpr std::string_view kProcessPrefix = "com.velmora.";
 
 // Whose traffic a record counts.
@@ -112,30 +112,6 @@ class UsageComparison {
   std::string key_;
 };
 
-// Hands increments on in series.
-class IncrementBuffer {
- public:
-  explicit IncrementBuffer(AnalyticsClient& client) : client_(client) {}
-  void add(std::string_view key, std::int64_t increment) {
-    pending_.emplace_back(key, increment);
-    if (pending_.size() >= kIncrementsAtOnce) flush();
-  }
-  void flush() {
-    std::vector<ScalarFigure> increments;
-    increments.reserve(pending_.size());
-    for (const auto& [key, increment] : pending_) increments.push_back({key, increment});
-    if (!increments.empty() && !client_.addValuesForScalarKeys(increments)) areStored_ = false;
-    pending_.clear();
-  }
-  // All that were flushed.
-  bool areStored() const { return areStored_; }
-
- private:
-  AnalyticsClient& client_;
-  std::vector<std::pair<std::string, std::int64_t>> pending_;
-  bool areStored_ = true;
-};
-
 }  // namespace
 
 PlistDictionary compareUsage(const PlistValue& records, const PlistValue& baseline, DayNumber yesterday,
@@ -152,13 +128,15 @@ PlistDictionary compareUsage(const PlistValue& records, const PlistValue& baseli
 void ProcessDataUsageReply(Platform& platform, const PlistValue& records) {
   const DayNumber yesterday = dayBefore(platform.analyticsClient.currentDayNumber());
   const PlistValue stored = platform.preferences.ownValue(kUsageBaselineKey);
-  IncrementBuffer increments(platform.analyticsClient);
-  PlistDictionary baseline = compareUsage(
-      records, stored, yesterday,
-      [&increments](std::string_view key, std::int64_t increment) { increments.add(key, increment); });
-  increments.flush();
-  // Without them the next reply is compared with the old baseline, so that nothing is lost.
-  if (!increments.areStored()) return;
+  std::deque<std::string> keys;  // stay where they are while more come
+  std::vector<ScalarFigure> increments;
+  PlistDictionary baseline =
+      compareUsage(records, stored, yesterday, [&](std::string_view key, std::int64_t increment) {
+        increments.push_back({keys.emplace_back(key), increment});
+      });
+  // All of them or none; without them the next reply is compared with the old baseline, so that nothing is
+  // lost.
+  if (!increments.empty() && !platform.analyticsClient.addValuesForScalarKeys(increments)) return;
   platform.preferences.setOwnValue(kUsageBaselineKey, PlistValue::dictionary(std::move(baseline)));
   platform.preferences.synchronizeOwn();
 }

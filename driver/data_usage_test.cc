@@ -60,12 +60,18 @@ TEST_F(DataUsageTest, FirstRunsCountWhatBeganSinceYesterdayAndLaterOnesTheDiffer
   EXPECT_EQ(baseline().asDictionary()->size(), 1U);  // who is not in the reply is forgotten
 
   // What could not be stored is counted by the next run.
-  fake_.analyticsClient.isFull = true;
+  fake_.analyticsClient.roomForLoads = 0;
   const PlistDate later{restarted.secondsSinceReference + 1};
-  const PlistArray reply{record("bundleName", "b", later, {4096})};
+  PlistArray reply{record("bundleName", "b", later, {4096})};
   run(reply);
-  fake_.analyticsClient.isFull = false;
+  fake_.analyticsClient.roomForLoads = 1;
   EXPECT_THAT(run(reply), ElementsAre("add datausage.wifiInKB.b 4"));
+  // However long a reply is, it is stored whole or not at all.
+  for (int i = 0; i < 10000; ++i)
+    reply.push_back(record("bundleName", std::to_string(i).c_str(), later, {1024}));
+  fake_.analyticsClient.roomForLoads = 1;
+  EXPECT_EQ(run(reply).size(), 10000U);
+  EXPECT_THAT(run(reply), ElementsAre());
 }
 
 TEST_F(DataUsageTest, WhatIsNotAsItShouldBeIsSkipped) {

@@ -18,7 +18,7 @@ namespace tbdaily::testing {
 class FakeAnalyticsClient : public AnalyticsClient {
  public:
   DayNumber today = 0;
-  bool isFull = false;             // takes no increments that come together
+  int roomForLoads = 1000;         // how often it takes increments that come together
   std::vector<std::string> calls;  // "checkpoint", "set KEY VALUE", "add KEY VALUE", in order
 
   DayNumber currentDayNumber() override { return today; }
@@ -32,7 +32,7 @@ class FakeAnalyticsClient : public AnalyticsClient {
     calls.push_back("add " + std::string(key) + " " + std::to_string(increment));
   }
   bool addValuesForScalarKeys(std::span<const ScalarFigure> increments) override {
-    return !isFull && AnalyticsClient::addValuesForScalarKeys(increments);
+    return roomForLoads-- > 0 && AnalyticsClient::addValuesForScalarKeys(increments);
   }
 };
 
