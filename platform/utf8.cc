@@ -72,6 +72,15 @@ bool isCarriedText(std::string_view text) {
   return holdsOnly(text, carriedCharacterLength);
 }
 
+std::string_view wholeCharacters(std::string_view text, std::size_t most) {
+  if (text.size() <= most) return text;
+  const auto continuesCharacter = [text](std::size_t at) {
+    return (static_cast<unsigned char>(text[at]) & 0xC0) == 0x80;
+  };
+  while (most > 0 && continuesCharacter(most)) --most;
+  return text.substr(0, most);
+}
+
 void appendUtf8(std::string& out, char32_t codePoint) {
   const auto append = [&out](char32_t bits) { out += static_cast<char>(bits); };
   const auto appendRest = [&](unsigned shift) { append(0x80 | ((codePoint >> shift) & 0x3F)); };

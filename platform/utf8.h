@@ -25,6 +25,9 @@ std::size_t carriedCharacterLength(std::string_view text);
 // Whether all of the text can be stored and reported.
 bool isCarriedText(std::string_view text);
 
+// The characters of a UTF-8 text that lie wholly within its first `most` bytes.
+std::string_view wholeCharacters(std::string_view text, std::size_t most);
+
 // `codePoint` is a Unicode scalar value.
 void appendUtf8(std::string& out, char32_t codePoint);
 

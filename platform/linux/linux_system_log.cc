@@ -34,6 +34,16 @@ bool environmentIs(const char* variable, std::string_view value) {
   return text != nullptr && text == value;
 }
 
+// A line that cannot be made is no reason to end what it tells of.
+template <typename Line>
+void writeOrNote(Line&& line) {
+  try {
+    line();
+  } catch (const std::exception& failure) {
+    noteOnce(std::string("a line of the log is lost: ") + failure.what());
+  }
+}
+
 }  // namespace
 
 LinuxSystemLog::LinuxSystemLog(const Host& host, Kernel& kernel, DeviceAnswers& answers)
@@ -57,20 +67,6 @@ bool LinuxSystemLog::showsPrivate() {
   }
   return *showsPrivate_;
 }
-
-namespace {
-
-// A line that cannot be made is no reason to end what it tells of.
-template <typename Line>
-void writeOrNote(Line&& line) {
-  try {
-    line();
-  } catch (const std::exception& failure) {
-    noteOnce(std::string("a line of the log is lost: ") + failure.what());
-  }
-}
-
-}  // namespace
 
 void LinuxSystemLog::write(LogLevel level, std::string_view format, std::span<const LogArgument> arguments) {
   if (!isEnabled(level)) return;

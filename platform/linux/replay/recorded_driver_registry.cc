@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <iterator>
 
+#include "platform/utf8.h"
+
 namespace tbdaily {
 
 namespace {
@@ -41,16 +43,6 @@ bool matches(const PlistDictionary& entry, const PlistDictionary& matching) {
   }
   const PlistValue wanted = matching.get(kProviderClass);
   return wanted.asString() && entry.get("class").asString() == wanted.asString();
-}
-
-// The characters of a UTF-8 text that lie wholly within its first `most` bytes.
-std::string_view wholeCharacters(std::string_view text, std::size_t most) {
-  if (text.size() <= most) return text;
-  const auto continuesCharacter = [text](std::size_t at) {
-    return (static_cast<unsigned char>(text[at]) & 0xC0) == 0x80;
-  };
-  while (most > 0 && continuesCharacter(most)) --most;
-  return text.substr(0, most);
 }
 
 }  // namespace
