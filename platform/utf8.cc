@@ -74,10 +74,7 @@ bool isCarriedText(std::string_view text) {
 
 std::string_view wholeCharacters(std::string_view text, std::size_t most) {
   if (text.size() <= most) return text;
-  const auto continuesCharacter = [text](std::size_t at) {
-    return (static_cast<unsigned char>(text[at]) & 0xC0) == 0x80;
-  };
-  while (most > 0 && continuesCharacter(most)) --most;
+  while (most > 0 && continuesCharacter(text[most])) --most;
   return text.substr(0, most);
 }
 

@@ -25,6 +25,11 @@ std::size_t carriedCharacterLength(std::string_view text);
 // Whether all of the text can be stored and reported.
 bool isCarriedText(std::string_view text);
 
+// Whether a byte of UTF-8 is one behind the first of its character.
+constexpr bool continuesCharacter(char c) {
+  return (static_cast<unsigned char>(c) & 0xC0U) == 0x80U;
+}
+
 // The characters of a UTF-8 text that lie wholly within its first `most` bytes.
 std::string_view wholeCharacters(std::string_view text, std::size_t most);
 

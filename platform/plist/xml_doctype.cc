@@ -1,5 +1,7 @@
 #include "platform/plist/xml_doctype.h"
 
+#include "platform/utf8.h"
+
 namespace tbdaily {
 
 namespace {
@@ -60,8 +62,7 @@ DoctypePlace findDoctype(std::string_view document) {
 std::string blankOf(std::string_view text) {
   std::string blank;
   for (const char c : text) {
-    const bool continuesCharacter = (static_cast<unsigned char>(c) & 0xC0U) == 0x80U;
-    if (!continuesCharacter) blank += c == '\n' || c == '\r' ? c : ' ';
+    if (!continuesCharacter(c)) blank += c == '\n' || c == '\r' ? c : ' ';
   }
   return blank;
 }

@@ -58,8 +58,8 @@ ShownText ShownText::lines(std::string_view text) {
 }
 
 std::size_t ShownText::columns() const {
-  return static_cast<std::size_t>(std::count_if(
-      bytes_.begin(), bytes_.end(), [](char c) { return (static_cast<unsigned char>(c) & 0xC0) != 0x80; }));
+  return static_cast<std::size_t>(
+      std::count_if(bytes_.begin(), bytes_.end(), [](char c) { return !continuesCharacter(c); }));
 }
 
 ShownText ShownText::withoutTrailingSpaces() const {
