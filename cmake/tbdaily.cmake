@@ -26,6 +26,10 @@ if(TBDAILY_SANITIZE)
   add_link_options(-fsanitize=${TBDAILY_SANITIZE})
 endif()
 
+include(CheckLinkerFlag)
+check_linker_flag(CXX -Wl,-z,pack-relative-relocs TBDAILY_PACKS_RELOCATIONS)
+set(TBDAILY_PACKED_RELOCATIONS $<$<BOOL:${TBDAILY_PACKS_RELOCATIONS}>:-Wl,-z,pack-relative-relocs>)
+
 # tbdaily_library(NAME SOURCES ... DEPENDS ...): one folder, one library. DEPENDS says which other folders it may include.
 function(tbdaily_library name)
   cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
@@ -44,6 +48,22 @@ function(tbdaily_library name)
     else()
       target_precompile_headers(tbdaily_${name} REUSE_FROM tbdaily_platform)
     endif()
+  endif()
+endfunction()
+
+# tbdaily_program(NAME SOURCES ... DEPENDS ...): a program that starts often and ends soon. The language's own library is part of it:
+# looking up that library's names takes longer than the work of a day that is done already.
+function(tbdaily_program name)
+  cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
+  list(TRANSFORM ARG_DEPENDS PREPEND tbdaily_)
+  add_executable(${name} ${ARG_SOURCES})
+  target_link_libraries(${name} PRIVATE ${ARG_DEPENDS} tbdaily_options)
+  tbdaily_include_runtime(${name})
+endfunction()
+
+function(tbdaily_include_runtime target)
+  if(CMAKE_BUILD_TYPE STREQUAL Release AND NOT TBDAILY_SANITIZE)
+    target_link_options(${target} PRIVATE -static-libstdc++ -static-libgcc -Wl,--gc-sections ${TBDAILY_PACKED_RELOCATIONS})
   endif()
 endfunction()
 

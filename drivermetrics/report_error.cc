@@ -1,7 +1,7 @@
 #include "drivermetrics/report_error.h"
 
 #include <array>
-#include <iostream>
+#include <cstdio>
 #include <mutex>
 #include <utility>
 
@@ -44,7 +44,8 @@ void writeLine(const std::string& line) {
   Log& log = processLog();
   const std::lock_guard lock(log.mutex);
   if (log.sink) return log.sink(line);
-  std::cerr << tbdaily::withoutControls(line, tbdaily::TextPlace::Line) + '\n';
+  const std::string shown = tbdaily::withoutControls(line, tbdaily::TextPlace::Line) + '\n';
+  std::fwrite(shown.data(), 1, shown.size(), stderr);
 }
 }  // namespace
 

@@ -1,16 +1,16 @@
 #include "platform/linux/host_identity.h"
 
 #include <sha2.h>
-#include <sys/random.h>
+#include <stdlib.h>
 
 #include <array>
 #include <cstdint>
-#include <fstream>
 #include <iterator>
 #include <optional>
 #include <span>
 
 #include "platform/hexadecimal.h"
+#include "platform/linux/base/file_io.h"
 #include "platform/uuid.h"
 
 namespace tbdaily {
@@ -47,11 +47,13 @@ Sha256 hmacSha256(std::span<const std::uint8_t> key, std::span<const std::uint8_
 }
 
 std::string firstLine(const std::filesystem::path& path) {
-  std::ifstream file(path);
-  std::string line;
-  std::getline(file, line);
-  while (!line.empty() && (line.back() == '\0' || line.back() == ' ' || line.back() == '\r')) line.pop_back();
-  return line;
+  constexpr std::size_t kMaximumSize = 4096;
+  FileContents file;
+  if (readHostFile(path, file, kMaximumSize) != 0) return {};
+  std::string_view rest = file.text(), line = takeLine(rest);
+  while (!line.empty() && (line.back() == '\0' || line.back() == ' ' || line.back() == '\r'))
+    line.remove_suffix(1);
+  return std::string(line);
 }
 
 std::optional<IdBytes> machineIdentifier(const Host& host) {
@@ -96,10 +98,7 @@ std::string hardwareModelName(const Host& host) {
 
 std::string randomUuid() {
   UuidBytes bytes{};
-  if (::getrandom(bytes.data(), bytes.size(), 0) != static_cast<ssize_t>(bytes.size())) {
-    std::ifstream source("/dev/urandom", std::ios::binary);
-    source.read(reinterpret_cast<char*>(bytes.data()), static_cast<std::streamsize>(bytes.size()));
-  }
+  ::arc4random_buf(bytes.data(), bytes.size());
   markAsRandomUuid(bytes);
   return uuidText(bytes);
 }

@@ -34,12 +34,10 @@ bool isVisibleApplication(const fs::path& desktopEntry) {
   constexpr std::size_t kMaximumSize = std::size_t{1} << 20;  // anybody with a home may put files there
   FileContents contents;
   if (readHostFile(desktopEntry, contents, kMaximumSize) != 0) return false;
-  std::string_view rest(reinterpret_cast<const char*>(contents.bytes.data()), contents.bytes.size());
+  std::string_view rest = contents.text();
   bool inEntry = false, isApplication = false;
   while (!rest.empty()) {
-    const std::size_t end = std::min(rest.find('\n'), rest.size());
-    const std::string_view text = trimmed(rest.substr(0, end));
-    rest.remove_prefix(std::min(end + 1, rest.size()));
+    const std::string_view text = trimmed(takeLine(rest));
     if (text.starts_with('[')) {
       if (inEntry) break;
       inEntry = text == "[Desktop Entry]";

@@ -1,10 +1,12 @@
 #include "platform/linux/os_release.h"
 
-#include <fstream>
+#include "platform/linux/base/file_io.h"
 
 namespace tbdaily {
 
 namespace {
+
+constexpr std::size_t kMaximumSize = std::size_t{1} << 16;
 
 // The file is a list of shell assignments: a value may be quoted, and a backslash takes the next character as
 // it is; in double quotes only one that would mean something there.
@@ -33,13 +35,13 @@ std::string unquote(std::string_view text) {
 
 std::optional<std::string> osReleaseValue(const Host& host, std::string_view variable) {
   for (const std::string_view place : {"/etc/os-release", "/usr/lib/os-release"}) {
-    std::ifstream file(host.livePath(place));
-    if (!file) continue;
+    FileContents file;
+    if (readHostFile(host.livePath(place), file, kMaximumSize) != 0) continue;
     std::optional<std::string> last;  // of two assignments the later one holds
-    for (std::string line; std::getline(file, line);) {
+    for (std::string_view rest = file.text(); !rest.empty();) {
+      const std::string_view line = takeLine(rest);
       const std::size_t equals = line.find('=');
-      if (equals == std::string::npos || std::string_view(line).substr(0, equals) != variable) continue;
-      last = unquote(std::string_view(line).substr(equals + 1));
+      if (equals != line.npos && line.substr(0, equals) == variable) last = unquote(line.substr(equals + 1));
     }
     return last && !last->empty() ? last : std::nullopt;
   }

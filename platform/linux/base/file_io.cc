@@ -44,9 +44,11 @@ int readOpenFile(int fd, FileContents& contents, std::size_t maximumSize) {
   if (static_cast<std::uint64_t>(status.st_size) > maximumSize) return EFBIG;
   contents.identity = FileIdentity::of(status);
   if (!isSettled(contents.identity)) contents.identity = {};
-  // Room for one byte more than the file had tells whether it grew since.
+  // Room for one byte more than the file had tells whether it grew since. The kernel's own files have no
+  // size.
+  constexpr std::size_t kSmallestRead = 4096;
   const auto size = static_cast<std::size_t>(status.st_size);
-  contents.bytes.resize(size + 1);
+  contents.bytes.resize(std::max(size + 1, kSmallestRead));
   std::size_t filled = 0;
   while (true) {
     if (filled == contents.bytes.size()) contents.bytes.resize(filled + std::max<std::size_t>(filled / 8, 1));
@@ -75,6 +77,12 @@ int readHostFile(const std::filesystem::path& path, FileContents& contents, std:
   FileDescriptor file;
   const int error = openHostFile(path, file);
   return error == 0 ? readOpenFile(file.get(), contents, maximumSize) : error;
+}
+
+std::string_view takeLine(std::string_view& rest) {
+  const std::string_view line = rest.substr(0, rest.find('\n'));
+  rest.remove_prefix(std::min(line.size() + 1, rest.size()));
+  return line;
 }
 
 int writeAll(int fd, std::span<const std::byte> bytes) {

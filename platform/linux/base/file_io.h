@@ -65,7 +65,12 @@ struct FileContents {
   // The file's, by which a later look may tell that it is unchanged; that of no file where it may not, since
   // the file had just been written and a second write could leave no trace in its times.
   FileIdentity identity;
+
+  std::string_view text() const { return {reinterpret_cast<const char*>(bytes.data()), bytes.size()}; }
 };
+
+// The first line without its end, taken from what is left of a text.
+std::string_view takeLine(std::string_view& rest);
 
 inline constexpr std::size_t kMaximumFileSize = std::size_t{1} << 30;
 
