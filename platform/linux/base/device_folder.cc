@@ -4,8 +4,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <array>
 #include <cerrno>
-#include <memory>
 
 #include "platform/linux/base/device_files.h"
 #include "platform/linux/base/file_judgement.h"
@@ -30,21 +30,19 @@ int DeviceFolder::open(const std::string& name, int flags, FileDescriptor& file)
 
 int DeviceFolder::names(std::vector<std::string>& names) const {
   // A descriptor of its own: reading moves its place in the folder.
-  const int copy = ::openat(descriptor_.get(), ".", kOpenFolder);
-  if (copy < 0) return errno;
-  const std::unique_ptr<DIR, int (*)(DIR*)> entries(::fdopendir(copy), &::closedir);
-  if (entries == nullptr) {
-    const int error = errno;
-    ::close(copy);
-    return error;
+  const FileDescriptor copy(::openat(descriptor_.get(), ".", kOpenFolder));
+  if (!copy.isOpen()) return errno;
+  alignas(dirent64) std::array<char, 32768> entries;
+  while (true) {
+    const ssize_t filled = ::getdents64(copy.get(), entries.data(), entries.size());
+    if (filled <= 0) return filled == 0 ? 0 : errno;
+    for (std::size_t at = 0; at < static_cast<std::size_t>(filled);) {
+      const auto* entry = reinterpret_cast<const dirent64*>(entries.data() + at);
+      const std::string_view name = entry->d_name;
+      if (name != "." && name != "..") names.emplace_back(name);
+      at += entry->d_reclen;
+    }
   }
-  errno = 0;
-  while (const dirent* entry = ::readdir(entries.get())) {
-    const std::string_view name = entry->d_name;
-    if (name != "." && name != "..") names.emplace_back(name);
-    errno = 0;
-  }
-  return errno;
 }
 
 int DeviceFolder::status(const std::string& name, struct stat& status) const {

@@ -152,8 +152,12 @@ Verdict examineUntouched(const Site& site, Examination examination, SqliteDataba
   FileContents contents;
   if (examination == Examination::Pages && site.folder->openForReading(site.place.name, file) == 0 &&
       readOpenFile(file.get(), contents, static_cast<std::size_t>(kFullExaminationBytes)) == 0) {
+    StoreCondition& condition = *site.place.condition;
     if (database.openImage(std::move(contents.bytes)) != SQLITE_OK) return failed(database, site.place);
-    return examine(database, site.place, examination);
+    if (condition.isKnownWhole(contents.identity)) return examine(database, site.place, Examination::Layout);
+    Verdict verdict = examine(database, site.place, examination);
+    if (verdict.state == StoreState::Usable) condition.setWhole(contents.identity);
+    return verdict;
   }
   if (site.open(database, SqliteMode::Immutable) != SQLITE_OK) return failed(database, site.place);
   return examine(database, site.place, examination);

@@ -5,9 +5,11 @@
 #include <chrono>
 #include <filesystem>
 #include <memory>
+#include <mutex>
 #include <string>
 
 #include "platform/linux/base/device_files.h"
+#include "platform/linux/base/file_io.h"
 
 namespace tbdaily {
 
@@ -30,10 +32,22 @@ class StoreCondition {
   bool isDamaged() const { return isDamaged_; }
   void setDamaged() { isDamaged_ = true; }
 
+  // The file whose pages were found whole: as long as nobody writes to it, they need no second look.
+  bool isKnownWhole(const FileIdentity& file) const {
+    const std::lock_guard lock(mutex_);
+    return file == whole_ && file != FileIdentity();
+  }
+  void setWhole(const FileIdentity& file) {
+    const std::lock_guard lock(mutex_);
+    whole_ = file;
+  }
+
  private:
   const std::chrono::milliseconds busyTimeout_;
   std::atomic<bool> isLocked_ = false;
   std::atomic<bool> isDamaged_ = false;
+  mutable std::mutex mutex_;
+  FileIdentity whole_;  // at first that of no file
 };
 
 struct StorePlace {
