@@ -90,7 +90,7 @@ void AnalyticsStore::rollbackLoad() {
 
 void AnalyticsStore::endLoad() {
   loading_ = false;
-  loadedKeys_.clear();
+  forgetLoadedKeys();
   if (database_.isOpen()) database_.execute(kUsualCache);
 }
 
@@ -249,15 +249,23 @@ int AnalyticsStore::findOrInsertKey(std::string_view key, std::int64_t& id) {
 }
 
 int AnalyticsStore::loadedKey(std::string_view key, LoadedKey*& entry) {
-  auto place = loadedKeys_.find(key);
+  // Most lines have the key of the line before.
+  auto place =
+      lastLoaded_ != loadedKeys_.end() && lastLoaded_->first == key ? lastLoaded_ : loadedKeys_.find(key);
   if (place == loadedKeys_.end()) {
     LoadedKey found;
     if (const int code = findOrInsertKey(key, found.id); code != SQLITE_OK) return code;
-    if (loadedKeys_.size() == kLoadedKeysKept) loadedKeys_.clear();
+    if (loadedKeys_.size() == kLoadedKeysKept) forgetLoadedKeys();
     place = loadedKeys_.emplace(key, found).first;
   }
+  lastLoaded_ = place;
   entry = &place->second;
   return SQLITE_OK;
+}
+
+void AnalyticsStore::forgetLoadedKeys() {
+  loadedKeys_.clear();
+  lastLoaded_ = loadedKeys_.end();
 }
 
 int AnalyticsStore::putScalar(std::int64_t keyId, DayNumber day, std::int64_t value) {

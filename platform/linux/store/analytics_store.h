@@ -95,6 +95,7 @@ class AnalyticsStore {
 
   int findOrInsertKey(std::string_view key, std::int64_t& id);
   int loadedKey(std::string_view key, LoadedKey*& entry);
+  void forgetLoadedKeys();
   int putScalar(std::int64_t keyId, DayNumber day, std::int64_t value);
   int putValues(LoadedKey& key, DayNumber day, std::int32_t secondsInDay, std::span<const double> values);
 
@@ -103,7 +104,9 @@ class AnalyticsStore {
   SqliteDatabase database_;
   std::array<SqliteStatement, QueryCount> statements_;  // prepared at first use; gone before the database
   bool loading_ = false;
-  std::map<std::string, LoadedKey, std::less<>> loadedKeys_;  // of the load that is under way
+  using LoadedKeys = std::map<std::string, LoadedKey, std::less<>>;
+  LoadedKeys loadedKeys_;  // of the load that is under way
+  LoadedKeys::iterator lastLoaded_ = loadedKeys_.end();
 };
 
 }  // namespace tbdaily
