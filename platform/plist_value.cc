@@ -1,8 +1,10 @@
 #include "platform/plist_value.h"
 
+#include <algorithm>
 #include <bit>
 #include <cmath>
 #include <limits>
+#include <utility>
 
 #include "platform/keyed_hash.h"
 
@@ -137,6 +139,13 @@ PlistDictionary::PlistDictionary(std::initializer_list<Entry> entries) {
   for (const Entry& entry : entries) set(entry.first, entry.second);
 }
 
+PlistDictionary::PlistDictionary(std::vector<Entry> entries) : entries_(std::move(entries)) {
+  if (makeIndex()) return;
+  std::vector<Entry> repeated = std::exchange(entries_, {});
+  slots_.clear();
+  for (Entry& entry : repeated) set(entry.first, std::move(entry.second));
+}
+
 std::size_t PlistDictionary::indexOf(std::string_view key) const {
   return indexOf(key, slots_.empty() ? 0 : KeyedHash::of(key));
 }
@@ -163,15 +172,35 @@ void PlistDictionary::place(std::vector<Slot>& slots, const Slot& filled) {
   slots[slot] = filled;
 }
 
-PlistDictionary::Slot PlistDictionary::slotOf(std::size_t entry) const {
-  return {KeyedHash::of(entries_[entry].first), static_cast<std::uint32_t>(entry + 1)};
-}
-
-void PlistDictionary::rebuildIndex() {
-  slots_.clear();
-  if (entries_.size() < kIndexFrom) return;
-  slots_.resize(std::bit_ceil(entries_.size() * 2));
-  for (std::size_t i = 0; i < entries_.size(); ++i) place(slots_, slotOf(i));
+// Of all entries; false where a key comes twice.
+bool PlistDictionary::makeIndex() {
+  slots_.clear();  // without an index, should there be no memory for one, keys are searched in order
+  const std::size_t count = entries_.size();
+  if (count < kIndexFrom) {
+    for (std::size_t i = 1; i < count; ++i) {
+      for (std::size_t before = 0; before < i; ++before) {
+        if (entries_[before].first == entries_[i].first) return false;
+      }
+    }
+    return true;
+  }
+  std::vector<std::uint32_t> hashes(count);
+  std::ranges::transform(entries_, hashes.begin(),
+                         [](const Entry& entry) { return KeyedHash::of(entry.first); });
+  slots_.assign(std::bit_ceil(count + count / 2), {});
+  const std::size_t mask = slots_.size() - 1;
+  for (std::size_t i = 0; i < count; ++i) {
+    // The index of many entries is not in the caches: the places of the next ones are fetched meanwhile.
+    constexpr std::size_t kAhead = 16;
+    if (i + kAhead < count) __builtin_prefetch(&slots_[hashes[i + kAhead] & mask], 1);
+    std::size_t slot = hashes[i] & mask;
+    for (; slots_[slot].entry != 0; slot = (slot + 1) & mask) {
+      if (slots_[slot].hash == hashes[i] && entries_[slots_[slot].entry - 1].first == entries_[i].first)
+        return false;
+    }
+    slots_[slot] = {hashes[i], static_cast<std::uint32_t>(i + 1)};
+  }
+  return true;
 }
 
 const PlistValue* PlistDictionary::find(std::string_view key) const {
@@ -204,7 +233,8 @@ void PlistDictionary::set(std::string_view key, PlistValue value) {
   entries_.emplace_back(std::string(key), std::move(value));
   if (slots_.empty() && isIndexFull) {
     slots_ = std::move(larger);
-    for (std::size_t i = 0; i < count; ++i) place(slots_, slotOf(i));
+    for (std::size_t i = 0; i < count; ++i)
+      place(slots_, {KeyedHash::of(entries_[i].first), static_cast<std::uint32_t>(i + 1)});
     return;
   }
   if (isIndexFull) {
@@ -220,7 +250,7 @@ void PlistDictionary::remove(std::string_view key) {
   const std::size_t entry = indexOf(key);
   if (entry == kNoEntry) return;
   entries_.erase(entries_.begin() + static_cast<std::ptrdiff_t>(entry));
-  rebuildIndex();
+  makeIndex();
 }
 
 bool operator==(const PlistDictionary& a, const PlistDictionary& b) {

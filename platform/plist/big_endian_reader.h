@@ -1,8 +1,10 @@
 // Reads big-endian integers of a buffer whose offsets and lengths nobody has checked.
 #pragma once
 
+#include <bit>
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 #include <optional>
 #include <span>
 
@@ -25,6 +27,12 @@ class BigEndianReader {
     const auto bytes = slice(offset, width);
     if (!bytes) return std::nullopt;
     std::uint64_t value = 0;
+    if (width > 0 && bytes_.size() - offset >= sizeof value) {
+      // More than is wanted, at once.
+      std::memcpy(&value, bytes->data(), sizeof value);
+      if constexpr (std::endian::native == std::endian::little) value = __builtin_bswap64(value);
+      return value >> (8 * (sizeof value - width));
+    }
     for (const std::byte byte : *bytes) value = value << 8 | std::to_integer<std::uint64_t>(byte);
     return value;
   }

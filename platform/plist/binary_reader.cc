@@ -83,23 +83,34 @@ class BinaryReader {
     std::uint64_t contents = 0;
   };
 
+  // The text lives in the bytes or in the value.
+  struct Key {
+    std::string_view text;
+    std::uint64_t payload = 0;
+    PlistValue value;
+  };
+
   // Each fails at most once; nothing and false mean that it has.
   std::nullopt_t fail(std::uint64_t offset, std::string_view reason);
   bool readTrailer();
   std::string_view trailerFault() const;
+  std::optional<Marker> markerOf(std::uint64_t index, std::uint64_t referrer);
   const Object* read(std::uint64_t index, std::uint64_t referrer, int depth);
-  std::optional<Object> readObject(std::uint64_t offset, int depth);
+  const Object* readOnce(const Marker& marker, std::uint64_t index, std::uint64_t referrer, int depth);
+  std::optional<Object> readScalar(const Marker& marker);
   std::optional<Object> readSimple(const Marker& marker);
   std::optional<std::int64_t> readInteger(const Marker& marker);
   std::optional<Object> readReal(const Marker& marker);
   std::optional<Object> readDate(const Marker& marker);
   std::optional<std::uint64_t> readLength(Marker& marker);
-  std::optional<Object> readPayload(Marker marker);
-  std::optional<std::string> readAscii(const Marker& marker, std::span<const std::byte> bytes);
+  std::optional<std::span<const std::byte>> readBytes(Marker marker);
+  std::optional<Object> readPayload(const Marker& marker);
+  std::optional<std::string_view> readAscii(const Marker& marker, std::span<const std::byte> bytes);
   std::optional<std::string> readUtf16(const Marker& marker, std::span<const std::byte> bytes);
   std::optional<Object> readContainer(Marker marker, int depth);
   bool readElements(const Marker& marker, std::uint64_t count, int depth, Object& object);
   bool readEntries(const Marker& marker, std::uint64_t count, int depth, Object& object);
+  std::optional<Key> readKey(std::uint64_t place, int depth);
   const Object* readReference(std::uint64_t place, int depth);
   bool addTo(Object& container, const Object& child, const Marker& marker);
   bool fitsLimits(std::uint64_t offset, const Made& more);
@@ -109,9 +120,12 @@ class BinaryReader {
   Trailer trailer_;
   std::uint64_t valueLimit_, payloadLimit_;
   Made made_;
-  std::vector<std::uint32_t>
-      states_;  // of each object by its index: one of the above, from kFirstRead on its place in read_
+  // Of each object of text, data or a container by its index: one of the above, from kFirstRead on its place
+  // in read_.
+  std::vector<std::uint32_t> states_;
   std::vector<Object> read_;
+  Object
+      scalar_;  // the last one that was read; what takes no room of its own is read again where it is shared
   std::string error_;
 };
 
@@ -166,26 +180,53 @@ std::string_view BinaryReader::trailerFault() const {
   return {};
 }
 
-// The object of that index; null after a failure. The result is borrowed until the next object is read.
 // `referrer` is where the index was found.
+std::optional<BinaryReader::Marker> BinaryReader::markerOf(std::uint64_t index, std::uint64_t referrer) {
+  if (index >= states_.size()) return fail(referrer, "a reference to no object");
+  const std::uint64_t entry = trailer_.tableOffset + index * trailer_.offsetWidth;
+  const std::uint64_t offset = *objects_.unsignedAt(entry, trailer_.offsetWidth);
+  if (offset < kMagic.size() || offset >= objects_.bytes().size())
+    return fail(entry, "an offset outside of the objects");
+  const auto byte = static_cast<unsigned>(*objects_.unsignedAt(offset, 1));
+  return Marker{offset, byte >> 4, byte & 15U, offset + 1};
+}
+
+// The object of that index; null after a failure. The result is borrowed until the next object is read.
 const Object* BinaryReader::read(std::uint64_t index, std::uint64_t referrer, int depth) {
-  if (index >= states_.size()) {
-    fail(referrer, "a reference to no object");
-    return nullptr;
+  const auto marker = markerOf(index, referrer);
+  if (!marker) return nullptr;
+  switch (marker->kind) {
+    case kSimple:
+    case kInteger:
+    case kReal:
+    case kDate: {
+      auto scalar = readScalar(*marker);
+      if (!scalar) return nullptr;
+      scalar_ = std::move(*scalar);
+      return &scalar_;
+    }
+    case kData:
+    case kAscii:
+    case kUtf16:
+    case kArray:
+    case kDictionary:
+      return readOnce(*marker, index, referrer, depth);
+    default:
+      fail(marker->offset, "an unknown marker");
+      return nullptr;
   }
+}
+
+const Object* BinaryReader::readOnce(const Marker& marker, std::uint64_t index, std::uint64_t referrer,
+                                     int depth) {
   if (states_[index] == kInProgress) {
     fail(referrer, "an object that holds itself");
     return nullptr;
   }
   if (states_[index] == kUnread) {
     states_[index] = kInProgress;
-    const std::uint64_t entry = trailer_.tableOffset + index * trailer_.offsetWidth;
-    const std::uint64_t offset = *objects_.unsignedAt(entry, trailer_.offsetWidth);
-    if (offset < kMagic.size() || offset >= objects_.bytes().size()) {
-      fail(entry, "an offset outside of the objects");
-      return nullptr;
-    }
-    std::optional<Object> object = readObject(offset, depth);
+    const bool isContainer = marker.kind == kArray || marker.kind == kDictionary;
+    std::optional<Object> object = isContainer ? readContainer(marker, depth) : readPayload(marker);
     if (!object) return nullptr;
     states_[index] = static_cast<std::uint32_t>(read_.size()) + kFirstRead;
     read_.push_back(std::move(*object));
@@ -193,30 +234,12 @@ const Object* BinaryReader::read(std::uint64_t index, std::uint64_t referrer, in
   return &read_[states_[index] - kFirstRead];
 }
 
-std::optional<Object> BinaryReader::readObject(std::uint64_t offset, int depth) {
-  const auto byte = static_cast<unsigned>(*objects_.unsignedAt(offset, 1));
-  const Marker marker{offset, byte >> 4, byte & 15U, offset + 1};
-  switch (marker.kind) {
-    case kSimple:
-      return readSimple(marker);
-    case kInteger: {
-      const auto value = readInteger(marker);
-      return value ? std::optional(Object{PlistValue::int64(*value)}) : std::nullopt;
-    }
-    case kReal:
-      return readReal(marker);
-    case kDate:
-      return readDate(marker);
-    case kData:
-    case kAscii:
-    case kUtf16:
-      return readPayload(marker);
-    case kArray:
-    case kDictionary:
-      return readContainer(marker, depth);
-    default:
-      return fail(offset, "an unknown marker");
-  }
+std::optional<Object> BinaryReader::readScalar(const Marker& marker) {
+  if (marker.kind == kSimple) return readSimple(marker);
+  if (marker.kind == kReal) return readReal(marker);
+  if (marker.kind == kDate) return readDate(marker);
+  const auto value = readInteger(marker);
+  return value ? std::optional(Object{PlistValue::int64(*value)}) : std::nullopt;
 }
 
 std::optional<Object> BinaryReader::readSimple(const Marker& marker) {
@@ -268,28 +291,38 @@ std::optional<std::uint64_t> BinaryReader::readLength(Marker& marker) {
   return static_cast<std::uint64_t>(*value);
 }
 
-std::optional<Object> BinaryReader::readPayload(Marker marker) {
+// Of text or data.
+std::optional<std::span<const std::byte>> BinaryReader::readBytes(Marker marker) {
   const auto length = readLength(marker);
   if (!length) return std::nullopt;
   const std::uint64_t unit = marker.kind == kUtf16 ? 2 : 1;
   const auto bytes =
       *length > objects_.bytes().size() ? std::nullopt : objects_.slice(marker.contents, *length * unit);
   if (!bytes) return fail(marker.offset, "text or data that is cut off");
-  if (!fitsLimits(marker.offset, {.payload = bytes->size()})) return std::nullopt;
+  return bytes;
+}
+
+std::optional<Object> BinaryReader::readPayload(const Marker& marker) {
+  const auto bytes = readBytes(marker);
+  if (!bytes || !fitsLimits(marker.offset, {.payload = bytes->size()})) return std::nullopt;
   if (marker.kind == kData)
     return Object{PlistValue::data(PlistData(bytes->begin(), bytes->end())), 1, bytes->size()};
-  auto text = marker.kind == kAscii ? readAscii(marker, *bytes) : readUtf16(marker, *bytes);
+  std::optional<std::string> text;
+  if (marker.kind == kAscii) {
+    text = readAscii(marker, *bytes);
+  } else {
+    text = readUtf16(marker, *bytes);
+  }
   if (!text) return std::nullopt;
   return Object{PlistValue::string(std::move(*text)), 1, bytes->size()};
 }
 
-std::optional<std::string> BinaryReader::readAscii(const Marker& marker, std::span<const std::byte> bytes) {
-  std::string text(bytes.size(), '\0');
+// Borrowed from the bytes.
+std::optional<std::string_view> BinaryReader::readAscii(const Marker& marker,
+                                                        std::span<const std::byte> bytes) {
+  const std::string_view text(reinterpret_cast<const char*>(bytes.data()), bytes.size());
   std::byte seen{0};
-  std::ranges::transform(bytes, text.begin(), [&seen](std::byte byte) {
-    seen |= byte;
-    return static_cast<char>(byte);
-  });
+  for (const std::byte byte : bytes) seen |= byte;
   if ((seen & std::byte{0x80}) != std::byte{0}) return fail(marker.offset, "a character outside of ASCII");
   return text;
 }
@@ -346,26 +379,38 @@ bool BinaryReader::readElements(const Marker& marker, std::uint64_t count, int d
 }
 
 bool BinaryReader::readEntries(const Marker& marker, std::uint64_t count, int depth, Object& object) {
-  PlistDictionary entries;
+  std::vector<PlistDictionary::Entry> entries;
   entries.reserve(count);
   for (std::uint64_t i = 0; i < count; ++i) {
     const std::uint64_t place = marker.contents + i * trailer_.referenceWidth;
-    const Object* key = readReference(place, depth + 1);
-    if (key == nullptr) return false;
-    const PlistValue keyValue = key->value;
-    const auto keyText = keyValue.asString();
-    if (!keyText) {
-      fail(place, "a key that is no string");
-      return false;
-    }
+    const auto key = readKey(place, depth + 1);
+    if (!key) return false;
     object.payload = saturatingSum(object.payload, key->payload);
     if (!fitsLimits(place, {.keys = key->payload})) return false;
     const Object* value = readReference(place + count * trailer_.referenceWidth, depth + 1);
     if (value == nullptr || !addTo(object, *value, marker)) return false;
-    entries.set(*keyText, value->value);
+    entries.emplace_back(key->text, value->value);
   }
-  object.value = PlistValue::dictionary(std::move(entries));
+  object.value = PlistValue::dictionary(PlistDictionary(std::move(entries)));
   return true;
+}
+
+std::optional<BinaryReader::Key> BinaryReader::readKey(std::uint64_t place, int depth) {
+  const std::uint64_t index = *objects_.unsignedAt(place, trailer_.referenceWidth);
+  const auto marker = markerOf(index, place);
+  if (!marker) return std::nullopt;
+  if (marker->kind == kAscii) {
+    const auto bytes = readBytes(*marker);
+    const auto text = bytes ? readAscii(*marker, *bytes) : std::nullopt;
+    return text ? std::optional(Key{*text, text->size(), {}}) : std::nullopt;
+  }
+  const Object* object = read(index, place, depth);
+  if (object == nullptr) return std::nullopt;
+  Key key{{}, object->payload, object->value};
+  const auto text = key.value.asString();
+  if (!text) return fail(place, "a key that is no string");
+  key.text = *text;
+  return key;
 }
 
 const Object* BinaryReader::readReference(std::uint64_t place, int depth) {

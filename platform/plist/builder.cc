@@ -10,8 +10,8 @@ bool PlistBuilder::open(Container kind) {
   return true;
 }
 
-void PlistBuilder::setKey(std::string key) {
-  open_.back().key = std::move(key);
+void PlistBuilder::setKey(std::string_view key) {
+  open_.back().key = key;
   open_.back().hasKey = true;
 }
 
@@ -19,7 +19,7 @@ void PlistBuilder::add(PlistValue value) {
   if (open_.empty()) {
     root_ = std::move(value);
   } else if (OpenContainer& container = open_.back(); container.kind == Container::Dictionary) {
-    container.entries.set(container.key, std::move(value));
+    container.entries.emplace_back(container.key, std::move(value));
     container.hasKey = false;
   } else {
     container.elements.push_back(std::move(value));
@@ -29,8 +29,9 @@ void PlistBuilder::add(PlistValue value) {
 void PlistBuilder::close() {
   OpenContainer container = std::move(open_.back());
   open_.pop_back();
-  add(container.kind == Container::Dictionary ? PlistValue::dictionary(std::move(container.entries))
-                                              : PlistValue::array(std::move(container.elements)));
+  add(container.kind == Container::Dictionary
+          ? PlistValue::dictionary(PlistDictionary(std::move(container.entries)))
+          : PlistValue::array(std::move(container.elements)));
 }
 
 }  // namespace tbdaily

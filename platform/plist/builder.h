@@ -2,6 +2,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -23,7 +24,7 @@ class PlistBuilder {
   // False at the limit of nesting; nothing is opened then. Otherwise only where takesValue().
   bool open(Container kind);
   // Only in a dictionary.
-  void setKey(std::string key);
+  void setKey(std::string_view key);
   // Only where takesValue(). Values of the same key replace each other.
   void add(PlistValue value);
   // Only while a container is open and no key waits.
@@ -37,7 +38,7 @@ class PlistBuilder {
     bool hasKey = false;
     std::string key;
     PlistArray elements;
-    PlistDictionary entries;
+    std::vector<PlistDictionary::Entry> entries;
   };
 
   std::vector<OpenContainer> open_;

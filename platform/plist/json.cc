@@ -40,7 +40,7 @@ class ValueBuilder : public nlohmann::json_sax<Json> {
   bool end_object() override { return close(); }
   bool end_array() override { return close(); }
   bool key(string_t& value) override {
-    builder_.setKey(std::move(value));
+    builder_.setKey(value);
     return true;
   }
   bool parse_error(std::size_t position, const std::string&,

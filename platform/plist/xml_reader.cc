@@ -6,6 +6,7 @@
 #include <array>
 #include <exception>
 #include <memory>
+#include <random>
 #include <type_traits>
 #include <utility>
 
@@ -114,6 +115,12 @@ void XmlReader::guarded(void* self, Function function) {
 
 XmlReader::XmlReader() : parser_(XML_ParserCreate("UTF-8")) {
   if (!parser_) throw std::bad_alloc();
+  // Drawn once: else each parser asks the kernel for its own.
+  static const unsigned long salt = [] {
+    std::random_device random;
+    return std::uint64_t{random()} << 32 | random() | 1;
+  }();
+  XML_SetHashSalt(parser_.get(), salt);
   XML_SetUserData(parser_.get(), this);
   XML_SetElementHandler(
       parser_.get(),
@@ -227,7 +234,7 @@ void XmlReader::startValue(Element element, const XML_Char** attributes) {
 
 void XmlReader::endElement() {
   if (open_ == Element::Key) {
-    builder_.setKey(std::move(text_));
+    builder_.setKey(text_);
   } else if (open_ != Element::None) {
     endScalar(open_);
   } else if (builder_.hasKey()) {
