@@ -36,10 +36,18 @@ std::deque<std::string> namesOf(std::string_view path) {
 
 // "var/log/x" for "/var/log/x", with every ".." taken away; "." for the root itself.
 std::string belowRoot(std::string_view path) {
-  const fs::path relative = (fs::path("/") / path).lexically_normal().relative_path();
-  std::string text = relative.native();
-  while (!text.empty() && text.back() == '/') text.pop_back();
-  return text.empty() ? "." : text;
+  std::string normal;
+  while (!path.empty()) {
+    const std::string_view name = path.substr(0, path.find('/'));
+    path.remove_prefix(std::min(name.size() + 1, path.size()));
+    if (name.empty() || name == ".") continue;
+    if (name == "..") {
+      normal.resize(normal.find_last_of('/') == normal.npos ? 0 : normal.find_last_of('/'));
+    } else {
+      normal.append(normal.empty() ? "" : "/").append(name);
+    }
+  }
+  return normal.empty() ? "." : normal;
 }
 
 bool isOurs(const struct stat& status) {
@@ -65,7 +73,8 @@ bool leadsThrough(const std::vector<FileDescriptor>& way, const struct stat& fol
 }  // namespace
 
 fs::path DeviceFiles::place(std::string_view path) const {
-  return root_ / (fs::path("/") / path).lexically_normal().relative_path();
+  const std::string below = belowRoot(path);
+  return below == "." ? root_ / "" : root_ / below;
 }
 
 int DeviceFiles::openRootDescriptor() const {
