@@ -134,8 +134,10 @@ bool LinuxPreferences::changeDomain(std::string_view name, std::span<const Chang
   const std::string bytes = bytesOf(name, stored, changes);
   domain.forget();  // whatever becomes of the write
   if (bytes.empty()) return false;
-  const int error = folder.replaceFile(file, bytes);
-  return error == 0 || fail(folder.place(file), error);
+  if (const int error = folder.replaceFile(file, bytes); error != 0) return fail(folder.place(file), error);
+  struct stat status {};
+  if (folder.status(file, status) == 0) stored_.insert_or_assign(std::string(name), FileIdentity::of(status));
+  return true;
 }
 
 void LinuxPreferences::setValue(std::string_view key, const PlistValue& value, std::string_view name) {
@@ -160,15 +162,25 @@ std::vector<std::string> LinuxPreferences::applyChanges(std::span<const Preferen
   return unwritten;
 }
 
+bool LinuxPreferences::isStored(std::string_view name, const FileIdentity& file) {
+  const std::lock_guard guard(mutex_);
+  const auto found = stored_.find(name);
+  return found != stored_.end() && found->second == file;
+}
+
 void LinuxPreferences::synchronize(std::string_view name) {
   if (!acceptsDomain(name)) return;
   DeviceFolder folder;
-  FileDescriptor file;
   const std::string fileName = std::string(name) + ".plist";
   int error = host_.files().openFolder(kFolder, folder);
-  if (error == 0) error = folder.openForReading(fileName, file);
+  struct stat status {};
+  if (error == 0) error = folder.status(fileName, status);
+  if (error == 0 && !isStored(name, FileIdentity::of(status))) {
+    FileDescriptor file;
+    error = folder.openForReading(fileName, file);
+    if (error == 0 && ::fsync(file.get()) != 0) error = errno;
+  }
   if (error == ENOENT) return;
-  if (error == 0 && ::fsync(file.get()) != 0) error = errno;
   if (error == 0) error = folder.sync();
   if (error != 0) noteWriteFailure(host_.files().place(path(name)), error);
 }

@@ -43,12 +43,16 @@ class LinuxPreferences : public PreferencesStore {
   // The file's contents after the changes; empty when they cannot be written.
   std::string bytesOf(std::string_view name, const PlistDictionary& stored, std::span<const Change> changes);
   bool isWritable(const Change& change, std::string_view name);
+  // Whether the file is as this process put it there.
+  bool isStored(std::string_view name, const FileIdentity& file);
   static bool moveAside(const DeviceFolder& folder, const std::string& file);
 
   const Host& host_;
   PropertyListCodec& codec_;
   std::mutex mutex_;  // over what follows: a usage reply is processed on a thread of its own
   std::map<std::string, CachedPlistFile, std::less<>> domains_;
+  // The files that this process put in place last: their contents are on storage, if not yet their names.
+  std::map<std::string, FileIdentity, std::less<>> stored_;
 };
 
 }  // namespace tbdaily
