@@ -1,46 +1,115 @@
 #!/usr/bin/env python3
-"""The job beside what one would use instead, in turn in one run; both sides must come to the same.
+"""Each subject beside what one would use instead, in turn in one run; both sides must come to the same.
 
-usage: compare.py BIN FOLDER [--rounds N]
+usage: compare.py BIN FOLDER [--moment]
 
-BIN has the programs of the release preset, FOLDER keeps the devices that are made for it. Processor time (user and system)
-of the best of so many rounds, as ratios. Status 1 when a result differs; a goal that is missed is marked.
+BIN has the programs of the release preset, FOLDER keeps the devices that are made for it. Prints one table: ratios, goals,
+and a mark where one is missed. Status 1 when two sides differ. Whole programs are measured by the processor's time (user
+and system), the best of several rounds; --moment takes small inputs and few rounds, to see that all of it runs: its ratios
+say nothing.
 """
 
 import argparse
+import json
 import os
 import pathlib
 import plistlib
+import re
 import shutil
+import sqlite3
 import subprocess
 import sys
 
 PEERS = pathlib.Path(__file__).resolve().parent / "peers"
-SPOOL = "var/mobile/Library/Logs/Pending"
+SPOOL = "var/mobile/Library/Logs"
 STORE = "var/mobile/Library/Tallybook/TBDataStore.sqlitedb"
 MEBIBYTE = 1 << 20
+NANOSECONDS = {"ns": 1, "us": 1e3, "ms": 1e6, "s": 1e9}
 
 
-def device(folder, name, *options):
-    root = folder / name
-    if not root.exists():
-        part = folder / (name + ".part")
-        shutil.rmtree(part, ignore_errors=True)
-        subprocess.run([sys.executable, PEERS / "make_day.py", part, *options], check=True)
-        part.rename(root)
-    return root
+class Differs(Exception):
+    """A subject and its peer did not come to the same."""
 
 
-def measured(*command, stdin=None, **environment):
-    """(seconds of processor time, peak of memory in bytes)"""
-    with open(stdin or os.devnull, "rb") as source:
-        process = subprocess.Popen([str(word) for word in command], stdin=source, stdout=subprocess.DEVNULL,
-                                   stderr=subprocess.DEVNULL, env=dict(os.environ, **environment))
-        _, status, usage = os.wait4(process.pid, 0)
-    process.returncode = os.waitstatus_to_exitcode(status)
-    if process.returncode != 0:
-        sys.exit(f"{command[0]} ended with status {process.returncode}")
-    return usage.ru_utime + usage.ru_stime, usage.ru_maxrss * 1024
+class Table:
+    """Rows of Markdown, printed as they come; the work of each in the order of its number."""
+
+    def __init__(self):
+        self.differing = 0
+        print("| # | work | beside it | measured | goal | |\n|---|---|---|---|---|---|", flush=True)
+
+    @staticmethod
+    def row(number, work, peer, measured, goal, holds):
+        print(f"| {number} | {work} | {peer} | {measured} | {goal} | {'' if holds else 'missed'} |", flush=True)
+
+    def differs(self, number, reason):
+        self.differing += 1
+        print(f"| {number} | | | results differ: {reason} | | differs |", flush=True)
+
+
+class Workshop:
+    """The programs, the folder of the devices, and how long is measured."""
+
+    def __init__(self, binary, folder, moment):
+        self.binary, self.folder, self.moment = binary.resolve(), folder.resolve(), moment
+        self.folder.mkdir(parents=True, exist_ok=True)
+
+    def rounds(self, usual):
+        return 1 if self.moment else usual
+
+    def size(self, usual):
+        return usual // 100 if self.moment else usual
+
+    def made(self, name, maker, *options):
+        """What a maker of the peers makes under that name; made anew when the maker or its options changed."""
+        root = self.folder / (name + ("-moment" if self.moment else ""))
+        recipe = self.folder / (root.name + ".recipe")
+        words = " ".join([(PEERS / maker).read_text(), *map(str, options)])
+        if not root.exists() or not recipe.exists() or recipe.read_text() != words:
+            shutil.rmtree(root, ignore_errors=True)
+            lines = [sys.executable, PEERS / maker, root, *options]
+            subprocess.run(list(map(str, lines)), check=True)
+            recipe.write_text(words)
+        return root
+
+    def program(self, name):
+        return self.binary / name
+
+    def measured(self, *command, stdin=None, cwd=None, **environment):
+        """(seconds of the processor, peak of memory in bytes)"""
+        with open(stdin or os.devnull, "rb") as source:
+            done = subprocess.run([str(word) for word in (self.program("measure"), *command)], stdin=source, cwd=cwd,
+                                  capture_output=True, check=False, env=dict(os.environ, **environment))
+        if done.returncode != 0:
+            sys.exit(f"compare: {command[0]} ended with status {done.returncode}: {done.stderr.decode()}")
+        seconds, _, peak = done.stdout.split()
+        return float(seconds), int(peak)
+
+    def job(self, root, *options):
+        return self.measured(self.program("tbdaily"), *options, TBDAILY_ROOT=str(root), TBDAILY_LIVE="0")
+
+    def large_job(self, root):
+        def run():
+            shutil.rmtree(root / SPOOL, ignore_errors=True)
+            return self.job(root, "-f")
+        return run
+
+    def bench(self, program, names):
+        """Of each benchmark of the program whose name matches the best time in nanoseconds."""
+        options = (["--benchmark_min_time=0.001"] if self.moment else
+                   ["--benchmark_min_time=0.05", "--benchmark_repetitions=7", "--benchmark_enable_random_interleaving=true"])
+        done = subprocess.run([self.program(program), "--benchmark_format=json", f"--benchmark_filter={names}", *options],
+                              stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, check=True)
+        best = {}
+        for run in json.loads(done.stdout)["benchmarks"]:
+            if run.get("run_type") == "aggregate":
+                continue
+            if run.get("error_occurred"):
+                raise Differs(f"{run['name']}: {run['error_message']}")
+            name = run["name"].removesuffix("/real_time")
+            time = run["real_time"] * NANOSECONDS[run["time_unit"]]
+            best[name] = min(best.get(name, time), time)
+        return best
 
 
 def best(rounds, *subjects):
@@ -53,64 +122,229 @@ def best(rounds, *subjects):
     return results
 
 
-class Table:
-    def __init__(self):
-        print("| work | beside it | measured | goal | |\n|---|---|---|---|---|")
-
-    @staticmethod
-    def row(work, peer, measure, goal, holds):
-        print(f"| {work} | {peer} | {measure} | {goal} | {'' if holds else 'missed'} |", flush=True)
-
-
-def job(binary, root):
-    def run():
-        shutil.rmtree(root / SPOOL, ignore_errors=True)
-        return measured(binary / "tbdaily", "-f", TBDAILY_ROOT=str(root), TBDAILY_LIVE="0")
-    return run
-
-
 def report_of(root):
-    (place,) = (root / SPOOL).glob("*.193")
+    (place,) = (root / SPOOL / "Pending").glob("*.193")
     return plistlib.loads(place.read_bytes()), place.stat().st_size
 
 
-def differs(root, script_output):
-    report, script = report_of(root)[0], plistlib.loads(script_output.read_bytes())
+def expect_equal_reports(report, script):
     wrong = [table for table, entries in script.items()
              if {key: report[table].get(key) for key in entries} != entries
              or (table != "TBScalars" and len(report[table]) != len(entries))]
     if wrong:
-        print(f"compare: the reports differ in {', '.join(wrong)}", file=sys.stderr)
-    return bool(wrong)
+        raise Differs("the reports have other " + ", ".join(wrong))
+
+
+def daily_report(shop, table):
+    sizes = ["--scalars", shop.size(200_000), "--distributions", shop.size(2_000)]
+    day = shop.made("day", "make_day.py", *sizes)
+    (own, peak), (shell, _) = best(shop.rounds(7), shop.large_job(day),
+                                   lambda: shop.measured("sqlite3", day / STORE, stdin=PEERS / "report.sql"))
+    table.row(1, "`tbdaily -f`: 200,000 scalars, 2,000 distributions of 1,000 values", "`sqlite3` shell, the same rows",
+              f"{own / shell:.2f} times ({own:.3f} s, {shell:.3f} s)", "at most 1.0", own <= shell)
+    output = shop.folder / "report.plist"
+    (script, _), = best(1, lambda: shop.measured(sys.executable, PEERS / "report.py", day, output))
+    report, size = report_of(day)
+    expect_equal_reports(report, plistlib.loads(output.read_bytes()))
+    table.row(2, "the same", "a script in Python that makes an equal report",
+              f"{script / own:.1f} times as fast ({script:.2f} s)", "at least 10", script >= 10 * own)
+    table.row(3, "peak of memory of the same", f"the report, {size / MEBIBYTE:.1f} MiB", f"{peak / MEBIBYTE:.1f} MiB",
+              f"at most {2.5 * size / MEBIBYTE + 8:.1f} MiB", peak <= 2.5 * size + 8 * MEBIBYTE)
+    large = shop.made("large", "make_day.py", *sizes, "--values", 10_000)
+    (_, large_peak), = best(1, shop.large_job(large))
+    table.row(3, "the same with ten times the values", "the peak above", f"{large_peak / peak:.3f} times", "within 5 %",
+              abs(large_peak / peak - 1) <= 0.05)
+
+
+def many_days(shop, table):
+    sizes = ["--scalars", shop.size(20_000), "--distributions", shop.size(200)]
+    alone = shop.made("tenth", "make_day.py", *sizes)
+    many = shop.made("days", "make_day.py", *sizes, "--days", 90)
+    (among, _), (single, _) = best(shop.rounds(15), shop.large_job(many), shop.large_job(alone))
+    if report_of(many)[0]["TBScalars"].keys() != report_of(alone)[0]["TBScalars"].keys():
+        raise Differs("the reports have other scalars")
+    table.row(4, "a tenth of row 1's day in a store of 90 days", "the same day alone",
+              f"{among / single:.2f} times ({among:.3f} s, {single:.3f} s)", "at most 1.2", among <= 1.2 * single)
+
+
+def property_lists(shop, table):
+    times = shop.bench("plist_bench", "(readXml|expatAlone|readBinary|checkedPass|dictionaryAlone)/scalars")
+    xml = times["readXml/scalars"] / times["expatAlone/scalars"]
+    table.row(5, "an XML property list of 15 MB", "expat with handlers that count", f"{xml:.2f} times", "at most 1.5", xml <= 1.5)
+    binary = times["readBinary/scalars"] / times["checkedPass/scalars"]
+    made = times["dictionaryAlone/scalars"] / times["checkedPass/scalars"]
+    table.row(6, "the same in binary", "a checked pass that makes no value",
+              f"{binary:.1f} times (its dictionary alone {made:.1f})", "at most 2.5", binary <= 2.5)
+
+
+def spread(times, name, sizes):
+    """The slowest over the fastest, for each unit of size."""
+    per_unit = [times[f"{name}/{size}"] / size for size in sizes]
+    return max(per_unit) / min(per_unit)
+
+
+def statistics_buffers(shop, table):
+    sizes = [1, MEBIBYTE, 64 * MEBIBYTE]
+    times = shop.bench("storage_bench", "(parseAndRelease|sameNodesAllocatedAndFreed)/")
+    ratios = [times[f"parseAndRelease/{size}"] / times[f"sameNodesAllocatedAndFreed/{size}"] for size in sizes]
+    table.row(7, "a statistics buffer parsed and released: one record set, 1 MiB, 64 MiB", "the same nodes allocated and freed",
+              ", ".join(f"{ratio:.2f}" for ratio in ratios) + " times", "at most 1.2", max(ratios) <= 1.2)
+    flat = spread(times, "parseAndRelease", sizes[1:])
+    table.row(7, "the same, 1 MiB and 64 MiB", "each other, a byte", f"within {flat:.2f}", "within 1.5", flat <= 1.5)
+
+
+def snapshots(shop, table):
+    times = shop.bench("snapshot_bench", "Layout")
+    for layout in ("fixedLayout", "describedLayout"):
+        faster = times[layout + "ThroughSnprintf"] / times[layout]
+        table.row(8, f"snapshot records as text, `{layout}`", "the same pieces through `snprintf`",
+                  f"{faster:.1f} times as fast", "at least 5", faster >= 5)
+
+
+def channels(shop, table):
+    sizes = [1_000, 4_000, 16_000, 64_000]
+    times = shop.bench("metrics_bench", "BM_(Sampling|Delta|PlainCopyOfTheBuffer)/")
+    copies = [times[f"BM_Sampling/{size}"] / times[f"BM_PlainCopyOfTheBuffer/{size}"] for size in sizes]
+    table.row(9, "a sampling of 1,000, 4,000, 16,000, 64,000 channels", "a plain copy of the shared buffer",
+              ", ".join(f"{ratio:.0f}" for ratio in copies) + " times", "at most 25", max(copies) <= 25)
+    for number, name in (9, "BM_Sampling"), (10, "BM_Delta"):
+        flat = spread(times, name, sizes)
+        each = ", ".join(f"{times[f'{name}/{size}'] / size:.0f}" for size in sizes)
+        table.row(number, f"a {name.removeprefix('BM_').lower()} of so many", "each other, a channel",
+                  f"within {flat:.2f} ({each} ns)", "within 1.5", flat <= 1.5)
+
+
+def kernel_chunks(shop, table):
+    times = shop.bench("kcdata_bench", "(walk|readMemory)/67108864|walkNested")
+    ratio = times["walk/67108864"] / times["readMemory/67108864"]
+    table.row(11, "the search of 64 MiB of kcdata", "summing the same memory", f"{ratio:.2f} times", "at most 1.2", ratio <= 1.2)
+    deeper = spread(times, "walkNested", [50_000, 100_000])
+    table.row(11, "nested 100,000 deep", "50,000 deep, a level", f"within {deeper:.2f}", "within 1.1", deeper <= 1.1)
+
+
+def prefixes(shop, table):
+    sizes = [1_000, 10_000, 100_000, 1_000_000]
+    times = shop.bench("report_bench", "(firstMatchingPrefix|hashLookup)/")
+    own = [times[f"firstMatchingPrefix/{size}"] for size in sizes]
+    peer = [times[f"hashLookup/{size}"] for size in sizes]
+    table.row(12, "whitelist look-up among 1,000 to 1,000,000 prefixes", "a hash look-up of the prefix",
+              f"within {max(own) / min(own):.2f} ({', '.join(f'{t:.0f}' for t in own)} ns; hash {', '.join(f'{t:.0f}' for t in peer)})",
+              "within 2", max(own) <= 2 * min(own))
+
+
+def system_calls(shop, root):
+    done = subprocess.run(["strace", "-f", "-qq", "-c", "-o", "/dev/stdout", shop.program("tbdaily"), "-f"], check=True,
+                          stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, env=dict(os.environ, TBDAILY_ROOT=str(root)))
+    return int(re.search(rb"\s(\d+)(?:\s+\d+)? total", done.stdout).group(1))
+
+
+def starts(shop, table):
+    root = shop.folder / "sample"
+    shutil.rmtree(root, ignore_errors=True)
+    live = {"TBDAILY_ROOT": str(root)}
+    subprocess.run([shop.program("tallyctl"), "init"], check=True, stdout=subprocess.DEVNULL, env=dict(os.environ, **live))
+    first, again = system_calls(shop, root), system_calls(shop, root)
+
+    def fresh_spool():
+        shutil.rmtree(root / SPOOL, ignore_errors=True)
+        return shop.measured(shop.program("tbdaily"), "-f", **live)
+    (true, _), (done, peak), (full, _), (usage, _) = best(
+        shop.rounds(60), lambda: shop.measured("/bin/true"), lambda: shop.measured(shop.program("tbdaily"), "-d", **live),
+        fresh_spool, lambda: shop.measured(shop.program("tallyctl"), "--help", **live))
+    table.row(13, "`tbdaily -d`, the day already done", "`/bin/true`",
+              f"{done / true:.2f} times ({done * 1e3:.2f} ms, {true * 1e3:.2f} ms)", "at most 2.0", done <= 2 * true)
+    table.row(13, "its peak of memory", "", f"{peak / MEBIBYTE:.1f} MiB", "at most 8 MiB", peak <= 8 * MEBIBYTE)
+    table.row(14, "`tbdaily -f` on the sample device", "row 13's `-d`", f"{full / done:.1f} times ({full * 1e3:.1f} ms)",
+              "at most 4", full <= 4 * done)
+    table.row(14, "its system calls, on each day but the first", "", f"{again} ({first} on the first)", "at most 800", again <= 800)
+    table.row(18, "`tallyctl --help`", "`/bin/true`", f"{usage / true:.2f} times", "at most 4", usage <= 4 * true)
+
+
+SUMS = "SELECT count(*), sum(key_id), sum(day), sum({}) FROM {}"
+
+
+def sums_of(store):
+    with sqlite3.connect(f"file:{store}?mode=ro", uri=True) as database:
+        return [database.execute(SUMS.format(column, rows)).fetchone()
+                for rows, column in (("scalars", "value"), ("distribution_values", "seq + seconds"))]
+
+
+def load(shop, table):
+    lines = shop.made("lines", "make_lines.py", shop.size(2_000_000))
+    device, shell = lines / "device", lines / "shell.db"
+
+    def own():
+        shutil.rmtree(device, ignore_errors=True)
+        device.mkdir()
+        return shop.measured(shop.program("tallyctl"), "--root", device, "record", "import", lines / "lines.tsv")
+
+    def peer():
+        for file in lines.glob("shell.db*"):
+            file.unlink()
+        return shop.measured("sqlite3", shell, stdin=PEERS / "import.sql", cwd=lines)
+    (ours, _), (theirs, _) = best(shop.rounds(3), own, peer)
+    if sums_of(device / STORE) != sums_of(shell):
+        raise Differs("the stores hold other rows")
+    table.row(15, "`record import` of 2,000,000 lines", "`sqlite3` `.import` into the same tables",
+              f"{ours / theirs:.2f} times ({ours:.2f} s, {theirs:.2f} s)", "at most 1.0", ours <= theirs)
+
+
+def preferences(shop, table):
+    times = shop.bench("preferences_bench", "")
+    ratio = times["setAndSynchronize"] / times["writeRenameAndForce"]
+    table.row(16, "a preference set and synchronized", "write, rename and fsync by hand", f"{ratio:.2f} times", "at most 1.3",
+              ratio <= 1.3)
+
+
+def long_messages(shop, table):
+    """Each on a fresh copy of its device, less what the same device takes without it."""
+    def device(name, option, count):
+        root = shop.made(name, "make_day.py", "--scalars", 10, "--distributions", 1, option, count)
+        copy = shop.folder / "copy"
+
+        def run():
+            shutil.rmtree(copy, ignore_errors=True)
+            shutil.copytree(root, copy)
+            return shop.job(copy, "-f")
+        return run, copy
+    count = shop.size(100_000)
+    bare, _ = device("bare", "--records", 0)
+    for option, what in ("--records", "a usage reply of 100,000 records"), ("--settings", "a tasking of 100,000 items"):
+        once, _ = device("once" + option, option, count)
+        twice, copy = device("twice" + option, option, 2 * count)
+        (none, _), (one, _), (two, _) = best(shop.rounds(5), bare, once, twice)
+        if option == "--settings":
+            folder = copy / "var/mobile/Library/Preferences"
+            stored = sum(len(plistlib.loads(file.read_bytes())) for file in folder.glob("org.example.domain*.plist"))
+            if stored != 2 * count:
+                raise Differs(f"{stored} settings are stored")
+        growth = (two - none) / (one - none) / 2
+        table.row(17, what, "the same twice as large", f"{growth:.2f} of linear ({one:.2f} s, {two:.2f} s)", "within 10 %",
+                  abs(growth - 1) <= 0.1)
+        if option == "--records":
+            table.row(17, "the reply", "", f"{one:.2f} s", "at most 1 s", one <= 1)
+
+
+ROWS = [daily_report, many_days, property_lists, statistics_buffers, snapshots, channels, kernel_chunks, prefixes, starts, load,
+        preferences, long_messages]
 
 
 def main():
     parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
     parser.add_argument("binary", type=pathlib.Path)
     parser.add_argument("folder", type=pathlib.Path)
-    parser.add_argument("--rounds", type=int, default=5)
+    parser.add_argument("--moment", action="store_true")
+    parser.add_argument("--only", nargs="*", metavar="ROWS", choices=[rows.__name__ for rows in ROWS], default=[])
     chosen = parser.parse_args()
-    chosen.folder.mkdir(parents=True, exist_ok=True)
-    day, large = device(chosen.folder, "day"), device(chosen.folder, "large", "--values", "10000")
-    output = chosen.folder / "report.plist"
-    table = Table()
-
-    (own, peak), (shell, _) = best(chosen.rounds, job(chosen.binary, day),
-                                   lambda: measured("sqlite3", day / STORE, stdin=PEERS / "report.sql"))
-    table.row("`tbdaily -f`, 200,000 scalars, 2,000 distributions of 1,000 values", "`sqlite3` shell, the same rows",
-              f"{own / shell:.2f} times ({own:.2f} s, {shell:.2f} s)", "at most 1.0", own <= shell)
-    # Before this process grows: a child's peak counts from what its parent holds when it begins.
-    (_, large_peak), = best(1, job(chosen.binary, large))
-    (script, _), = best(1, lambda: measured(sys.executable, PEERS / "report.py", day, output))
-    failed = differs(day, output)
-    table.row("the same", "a script in Python", f"{script / own:.1f} times as fast ({script:.1f} s)", "at least 10",
-              script >= 10 * own)
-    size = report_of(day)[1]
-    table.row("peak of memory of the same", f"the report, {size / MEBIBYTE:.1f} MiB", f"{peak / MEBIBYTE:.1f} MiB",
-              "2.5 times and 8 MiB", peak <= 2.5 * size + 8 * MEBIBYTE)
-    table.row("peak with ten times the values", "the peak above", f"{large_peak / peak:.3f} times", "within 5 %",
-              abs(large_peak / peak - 1) <= 0.05)
-    return 1 if failed else 0
+    shop, table = Workshop(chosen.binary, chosen.folder, chosen.moment), Table()
+    for rows in ROWS:
+        if chosen.only and rows.__name__ not in chosen.only:
+            continue
+        try:
+            rows(shop, table)
+        except Differs as difference:
+            table.differs(rows.__name__, difference)
+    return 1 if table.differing else 0
 
 
 if __name__ == "__main__":

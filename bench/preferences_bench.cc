@@ -1,5 +1,6 @@
-// A preference that is set and synchronized, beside the same by hand: a file written anew and renamed, both it and its
-// folder forced to storage. In the folder for temporary files (TMPDIR): where that is memory, storage costs nothing.
+// A preference that is set and synchronized, beside the same by hand: a file written anew and renamed, both
+// it and its folder forced to storage. In the folder for temporary files (TMPDIR): where that is memory,
+// storage costs nothing.
 
 #include <benchmark/benchmark.h>
 #include <fcntl.h>
@@ -26,10 +27,12 @@ struct Device {
 
   // A domain of forty counters.
   Device() {
-    for (int i = 0; i < 40; ++i) preferences.setValue("Counter" + std::to_string(i), PlistValue::int64(i), kDomain);
+    for (int i = 0; i < 40; ++i)
+      preferences.setValue("Counter" + std::to_string(i), PlistValue::int64(i), kDomain);
   }
   std::filesystem::path place() const {
-    return folder.path() / std::string(LinuxPreferences::kFolder).substr(1) / (std::string(kDomain) + ".plist");
+    return folder.path() / std::string(LinuxPreferences::kFolder).substr(1) /
+           (std::string(kDomain) + ".plist");
   }
 };
 
@@ -41,7 +44,8 @@ void setAndSynchronize(benchmark::State& state) {
     device.preferences.synchronize(kDomain);
   }
   LinuxPreferences others(device.host, device.codec);
-  if (!(others.getValue(kKey, kDomain) == PlistValue::int64(value))) state.SkipWithError("the value is not stored");
+  if (!(others.getValue(kKey, kDomain) == PlistValue::int64(value)))
+    state.SkipWithError("the value is not stored");
 }
 BENCHMARK(setAndSynchronize)->UseRealTime()->Unit(benchmark::kMicrosecond);
 
@@ -50,7 +54,8 @@ bool writeByHand(const std::filesystem::path& place, std::string_view bytes) {
   const int file = ::open(passing.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
   const int folder = ::open(place.parent_path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
   const bool isWritten = ::write(file, bytes.data(), bytes.size()) == static_cast<ssize_t>(bytes.size()) &&
-                         ::fsync(file) == 0 && ::rename(passing.c_str(), place.c_str()) == 0 && ::fsync(folder) == 0;
+                         ::fsync(file) == 0 && ::rename(passing.c_str(), place.c_str()) == 0 &&
+                         ::fsync(folder) == 0;
   ::close(file);
   ::close(folder);
   return isWritten;

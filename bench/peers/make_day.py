@@ -1,10 +1,13 @@
 #!/usr/bin/env python3
 """A device root with one large day: scalars under 300 prefixes, distributions, half of them with histograms.
 
-usage: make_day.py ROOT [--values N] [--days N]
+usage: make_day.py ROOT [--scalars N] [--distributions N] [--values N] [--days N] [--older-values N] [--records N]
+                        [--settings N]
 
-200,000 scalars and 2,000 distributions of N values each (1,000), on the sample device's yesterday; with --days the same on
-as many days before it too. The store is written as other programs do, and the numbers are the same each time.
+So many scalars (200,000) and distributions (2,000) of so many values each (1,000) on the sample device's yesterday; with
+--days the same keys on as many days in all, the older ones with --older-values of each distribution; with --records and
+--settings a reply of network usage and a tasking of that many items. The store is written as other programs do, and the
+numbers are the same each time.
 """
 
 import argparse
@@ -15,7 +18,8 @@ import random
 import sqlite3
 
 YESTERDAY = 20780
-PREFIXES, SCALARS, DISTRIBUTIONS = 300, 200_000, 2_000
+NOW = datetime.datetime(2026, 11, 24, 9, 7, 4)
+PREFIXES = 300
 INTERVALS = [10, 20, 50, 100, 200, 500, 1000, 2000, 5000, 10000]
 SCHEMA = """
 PRAGMA journal_mode = WAL;
@@ -32,14 +36,6 @@ def prefix(number):
     return f"com.velmora.subsystem{number:03d}."
 
 
-def scalar_keys():
-    return [f"{prefix(i % PREFIXES)}counter.{i:06d}" for i in range(SCALARS)]
-
-
-def distribution_keys():
-    return [f"com.velmora.{'shape' if i % 2 else 'plain'}.latency.{i:04d}" for i in range(DISTRIBUTIONS)]
-
-
 def whitelist():
     options = [{}, {"sig_fig": 2}, {"bucket_interval": 100}]
     return {"Subsystems": {"ScalarKeyPrefixes": {prefix(i): options[i % 3] for i in range(PREFIXES)}},
@@ -53,33 +49,55 @@ def write_list(root, place, value):
     file.write_bytes(plistlib.dumps(value, sort_keys=False))
 
 
-def main():
-    parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
-    parser.add_argument("root", type=pathlib.Path)
-    parser.add_argument("--values", type=int, default=1000)
-    parser.add_argument("--days", type=int, default=1)
-    chosen = parser.parse_args()
-    write_list(chosen.root, "Library/Application Support/Tallybook/Whitelist_Nimbos.plist", whitelist())
-    write_list(chosen.root, "var/mobile/Library/Preferences/com.velmora.Crashferry.plist",
-               {"DiagnosticLogSubmissionEnabled": True})
-    write_list(chosen.root, "System/Device/usage.plist", {"records": []})
-    write_list(chosen.root, "System/Device/clock.plist", {"now": datetime.datetime(2026, 11, 24, 9, 7, 4)})
-    store = chosen.root / "var/mobile/Library/Tallybook/TBDataStore.sqlitedb"
+def usage_records(count, numbers):
+    return [{"bundleName": f"org.example.app{i:06d}", "since": NOW - datetime.timedelta(hours=30),
+             "wifiInBytes": numbers.randrange(1 << 30), "wifiOutBytes": numbers.randrange(1 << 20),
+             "wwanInBytes": numbers.randrange(1 << 30), "wwanOutBytes": numbers.randrange(1 << 20)}
+            for i in range(count)]
+
+
+def tasking(settings):
+    if settings == 0:
+        return {}
+    items = [{"Domain": f"org.example.domain{i % 50:02d}", "Key": f"Setting{i:06d}", "Value": i} for i in range(settings)]
+    return {"ScheduledTasking": {"TaskingID": "benchmark", "TaskingDigest": "0", "TaskingPayload": items}}
+
+
+def write_store(root, chosen, numbers):
+    store = root / "var/mobile/Library/Tallybook/TBDataStore.sqlitedb"
     store.parent.mkdir(parents=True, exist_ok=True)
     database = sqlite3.connect(store)
     database.executescript(SCHEMA)
-    numbers = random.Random(20780)
-    scalars, distributions = scalar_keys(), distribution_keys()
+    scalars = [f"{prefix(i % PREFIXES)}counter.{i:06d}" for i in range(chosen.scalars)]
+    distributions = [f"com.velmora.{'shape' if i % 2 else 'plain'}.latency.{i:04d}" for i in range(chosen.distributions)]
+    days = range(YESTERDAY - chosen.days + 1, YESTERDAY + 1)
     database.executemany("INSERT INTO keys (id, name) VALUES (?, ?)", enumerate(scalars + distributions, 1))
-    for day in range(YESTERDAY - chosen.days + 1, YESTERDAY + 1):
-        database.executemany("INSERT INTO scalars VALUES (?, ?, ?)",
-                             ((i, day, numbers.randrange(1_000_000)) for i in range(1, SCALARS + 1)))
-        database.executemany("INSERT INTO distribution_values VALUES (?, ?, ?, ?, ?)",
-                             ((i, day, seq, numbers.randrange(86400), numbers.lognormvariate(5, 1.5))
-                              for i in range(SCALARS + 1, SCALARS + DISTRIBUTIONS + 1) for seq in range(chosen.values)))
+    database.executemany("INSERT INTO scalars VALUES (?, ?, ?)",
+                         ((i, day, numbers.randrange(1_000_000))
+                          for i in range(1, len(scalars) + 1) for day in days))
+    database.executemany("INSERT INTO distribution_values VALUES (?, ?, ?, ?, ?)",
+                         ((len(scalars) + i, day, seq, numbers.randrange(86400), numbers.lognormvariate(5, 1.5))
+                          for i in range(1, len(distributions) + 1) for day in days
+                          for seq in range(chosen.values if day == YESTERDAY else chosen.older_values)))
     database.commit()
     database.execute("PRAGMA wal_checkpoint(TRUNCATE)")
     database.close()
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
+    parser.add_argument("root", type=pathlib.Path)
+    for option, default in {"scalars": 200_000, "distributions": 2_000, "values": 1_000, "days": 1, "older-values": 100,
+                            "records": 0, "settings": 0}.items():
+        parser.add_argument("--" + option, type=int, default=default)
+    chosen = parser.parse_args()
+    numbers = random.Random(YESTERDAY)
+    write_list(chosen.root, "Library/Application Support/Tallybook/Whitelist_Nimbos.plist", whitelist())
+    write_list(chosen.root, "var/mobile/Library/Preferences/com.velmora.Crashferry.plist",
+               {"DiagnosticLogSubmissionEnabled": True, **tasking(chosen.settings)})
+    write_list(chosen.root, "System/Device/usage.plist", {"records": usage_records(chosen.records, numbers)})
+    write_list(chosen.root, "System/Device/clock.plist", {"now": NOW})
+    write_store(chosen.root, chosen, numbers)
 
 
 if __name__ == "__main__":

@@ -26,7 +26,7 @@ constexpr std::int64_t kEndOfSequence = std::numeric_limits<std::int64_t>::max()
 
 const std::array<std::string_view, AnalyticsStore::QueryCount> AnalyticsStore::kQueries{
     "SELECT id FROM keys WHERE name = ?1",
-    "INSERT INTO keys (name) VALUES (?1) RETURNING id",
+    "INSERT INTO keys (name) VALUES (?1)",
     "SELECT value FROM scalars WHERE key_id = ?1 AND day = ?2",
     "INSERT INTO scalars (key_id, day, value) VALUES (?1, ?2, ?3) "
     "ON CONFLICT (key_id, day) DO UPDATE SET value = excluded.value",
@@ -39,13 +39,13 @@ const std::array<std::string_view, AnalyticsStore::QueryCount> AnalyticsStore::k
 };
 
 StoreResult AnalyticsStore::setScalar(std::string_view key, DayNumber day, std::int64_t value) {
-  return writeRow(key, [&](LoadedKey& entry) { return putScalar(entry.id, day, value); });
+  return writeRow(key, [&](LoadedKey& entry) { return putScalar(entry, day, value); });
 }
 
 StoreResult AnalyticsStore::addScalar(std::string_view key, DayNumber day, std::int64_t increment) {
   return writeRow(key, [&](LoadedKey& entry) {
     auto sum = static_cast<std::uint64_t>(increment);
-    {
+    if (entry.mayHaveScalars) {
       SqliteStatement& find = statement(FindScalar);
       const StatementRun run(find);
       find.bind(1, entry.id);
@@ -54,7 +54,7 @@ StoreResult AnalyticsStore::addScalar(std::string_view key, DayNumber day, std::
       if (code == SQLITE_ROW) sum += static_cast<std::uint64_t>(find.integer(0));
       if (code != SQLITE_ROW && code != SQLITE_DONE) return code;
     }
-    return putScalar(entry.id, day, static_cast<std::int64_t>(sum));
+    return putScalar(entry, day, static_cast<std::int64_t>(sum));
   });
 }
 
@@ -157,7 +157,7 @@ StoreResult AnalyticsStore::writeRow(std::string_view key, const Write& write) {
   if (!loading_) {
     return transaction([&] {
       LoadedKey entry;
-      const int code = findOrInsertKey(key, entry.id);
+      const int code = findOrInsertKey(key, entry);
       return code == SQLITE_OK ? write(entry) : code;
     });
   }
@@ -232,20 +232,21 @@ SqliteStatement& AnalyticsStore::statement(Query query) {
   return prepared;
 }
 
-int AnalyticsStore::findOrInsertKey(std::string_view key, std::int64_t& id) {
-  for (const Query query : {FindKey, InsertKey}) {
-    SqliteStatement& find = statement(query);
-    const StatementRun run(find);
-    find.bind(1, key);
-    const int code = find.step();
-    if (code == SQLITE_ROW) {
-      id = find.integer(0);
-      // A statement that returns what it inserted has to be run to its end.
-      return query == InsertKey && find.step() != SQLITE_DONE ? database_.errorCode() : SQLITE_OK;
-    }
-    if (code != SQLITE_DONE) return code;
-  }
-  return SQLITE_ERROR;
+int AnalyticsStore::findOrInsertKey(std::string_view key, LoadedKey& entry) {
+  SqliteStatement& find = statement(FindKey);
+  const StatementRun run(find);
+  find.bind(1, key);
+  const int found = find.step();
+  if (found == SQLITE_ROW) entry.id = find.integer(0);
+  if (found != SQLITE_DONE) return found == SQLITE_ROW ? SQLITE_OK : found;
+  SqliteStatement& insert = statement(InsertKey);
+  const StatementRun insertion(insert);
+  insert.bind(1, key);
+  const int code = insert.step();
+  if (code != SQLITE_DONE) return code;
+  entry.id = database_.lastInsertedRow();
+  entry.mayHaveScalars = false;
+  return SQLITE_OK;
 }
 
 int AnalyticsStore::loadedKey(std::string_view key, LoadedKey*& entry) {
@@ -254,7 +255,7 @@ int AnalyticsStore::loadedKey(std::string_view key, LoadedKey*& entry) {
       lastLoaded_ != loadedKeys_.end() && lastLoaded_->first == key ? lastLoaded_ : loadedKeys_.find(key);
   if (place == loadedKeys_.end()) {
     LoadedKey found;
-    if (const int code = findOrInsertKey(key, found.id); code != SQLITE_OK) return code;
+    if (const int code = findOrInsertKey(key, found); code != SQLITE_OK) return code;
     if (loadedKeys_.size() == kLoadedKeysKept) forgetLoadedKeys();
     place = loadedKeys_.emplace(key, found).first;
   }
@@ -268,12 +269,13 @@ void AnalyticsStore::forgetLoadedKeys() {
   lastLoaded_ = loadedKeys_.end();
 }
 
-int AnalyticsStore::putScalar(std::int64_t keyId, DayNumber day, std::int64_t value) {
+int AnalyticsStore::putScalar(LoadedKey& key, DayNumber day, std::int64_t value) {
   SqliteStatement& put = statement(SetScalar);
   const StatementRun run(put);
-  put.bind(1, keyId);
+  put.bind(1, key.id);
   put.bind(2, std::int64_t{day});
   put.bind(3, value);
+  key.mayHaveScalars = true;
   const int code = put.step();
   return code == SQLITE_DONE ? SQLITE_OK : code;
 }

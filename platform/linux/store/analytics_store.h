@@ -73,6 +73,7 @@ class AnalyticsStore {
   // What a load knows of a key, so that most lines need no look-up.
   struct LoadedKey {
     std::int64_t id = 0;
+    bool mayHaveScalars = true;  // not when it was made a moment ago
     bool hasSequence = false;
     DayNumber day = 0;  // of the sequence
     std::int64_t nextSequence = 0;
@@ -93,10 +94,10 @@ class AnalyticsStore {
   void close();
   SqliteStatement& statement(Query query);
 
-  int findOrInsertKey(std::string_view key, std::int64_t& id);
+  int findOrInsertKey(std::string_view key, LoadedKey& entry);
   int loadedKey(std::string_view key, LoadedKey*& entry);
   void forgetLoadedKeys();
-  int putScalar(std::int64_t keyId, DayNumber day, std::int64_t value);
+  int putScalar(LoadedKey& key, DayNumber day, std::int64_t value);
   int putValues(LoadedKey& key, DayNumber day, std::int32_t secondsInDay, std::span<const double> values);
 
   const StorePlace place_;

@@ -368,6 +368,10 @@ bool SqliteDatabase::hasMoved() const {
   return moved != 0;
 }
 
+std::int64_t SqliteDatabase::lastInsertedRow() const {
+  return sqlite3_last_insert_rowid(connection_.get());
+}
+
 std::int64_t SqliteDatabase::changedRows() const {
   return sqlite3_changes64(connection_.get());
 }

@@ -120,6 +120,7 @@ class SqliteDatabase {
   // Whether the path leads to another file than the one that is open.
   bool hasMoved() const;
   std::int64_t changedRows() const;  // by the last statement
+  std::int64_t lastInsertedRow() const;
 
   // Runs a statement "SELECT visit(A, B, ...) FROM ..." and calls `visitor` with each of its rows: quicker
   // than one step for each, where all are wanted. SQLITE_DONE at the end, SQLITE_ABORT where the visitor
