@@ -19,6 +19,7 @@ import shutil
 import sqlite3
 import subprocess
 import sys
+import time
 
 PEERS = pathlib.Path(__file__).resolve().parent / "peers"
 SPOOL = "var/mobile/Library/Logs"
@@ -34,13 +35,13 @@ class Differs(Exception):
 class Table:
     """Rows of Markdown, printed as they come; the work of each in the order of its number."""
 
-    def __init__(self):
-        self.differing = 0
+    def __init__(self, moment):
+        self.moment, self.differing = moment, 0
         print("| # | work | beside it | measured | goal | |\n|---|---|---|---|---|---|", flush=True)
 
-    @staticmethod
-    def row(number, work, peer, measured, goal, holds):
-        print(f"| {number} | {work} | {peer} | {measured} | {goal} | {'' if holds else 'missed'} |", flush=True)
+    def row(self, number, work, peer, measured, goal, holds):
+        mark = "ran" if self.moment else "" if holds else "missed"
+        print(f"| {number} | {work} | {peer} | {measured} | {goal} | {mark} |", flush=True)
 
     def differs(self, number, reason):
         self.differing += 1
@@ -233,9 +234,12 @@ def prefixes(shop, table):
 
 
 def system_calls(shop, root):
-    done = subprocess.run(["strace", "-f", "-qq", "-c", "-o", "/dev/stdout", shop.program("tbdaily"), "-f"], check=True,
+    done = subprocess.run(["strace", "-f", "-qq", "-c", "-o", "/dev/stdout", shop.program("tbdaily"), "-f"], check=False,
                           stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, env=dict(os.environ, TBDAILY_ROOT=str(root)))
-    return int(re.search(rb"\s(\d+)(?:\s+\d+)? total", done.stdout).group(1))
+    found = re.search(rb"\s(\d+)(?:\s+\d+)? total", done.stdout)
+    if not found:
+        sys.exit("compare: strace cannot trace here")
+    return int(found.group(1))
 
 
 def starts(shop, table):
@@ -243,6 +247,7 @@ def starts(shop, table):
     shutil.rmtree(root, ignore_errors=True)
     live = {"TBDAILY_ROOT": str(root)}
     subprocess.run([shop.program("tallyctl"), "init"], check=True, stdout=subprocess.DEVNULL, env=dict(os.environ, **live))
+    time.sleep(0.2)  # files that were written a moment ago are read again and again
     first, again = system_calls(shop, root), system_calls(shop, root)
 
     def fresh_spool():
@@ -336,7 +341,7 @@ def main():
     parser.add_argument("--moment", action="store_true")
     parser.add_argument("--only", nargs="*", metavar="ROWS", choices=[rows.__name__ for rows in ROWS], default=[])
     chosen = parser.parse_args()
-    shop, table = Workshop(chosen.binary, chosen.folder, chosen.moment), Table()
+    shop, table = Workshop(chosen.binary, chosen.folder, chosen.moment), Table(chosen.moment)
     for rows in ROWS:
         if chosen.only and rows.__name__ not in chosen.only:
             continue

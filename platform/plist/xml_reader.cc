@@ -51,8 +51,15 @@ constexpr std::array kElements = {
 };
 
 Element elementNamed(std::string_view name) {
-  const auto found = std::ranges::find(kElements, name, &ElementName::name);
-  return found != kElements.end() ? found->element : Element::None;
+  for (const ElementName& known : kElements) {
+    // The first letter tells nearly all of them apart.
+    if (name.front() == known.name.front() && name == known.name) return known.element;
+  }
+  return Element::None;
+}
+
+bool isBlank(char c) {
+  return c == ' ' || c == '\t' || c == '\r' || c == '\n';
 }
 
 bool equalsIgnoringCase(std::string_view a, std::string_view b) {
@@ -271,7 +278,7 @@ void XmlReader::addOr(std::optional<PlistValue> value, const char* reason) {
 void XmlReader::characters(std::string_view text) {
   if (open_ != Element::None && open_ != Element::True && open_ != Element::False) {
     text_ += text;
-  } else if (text.find_first_not_of(" \t\r\n") != std::string_view::npos) {
+  } else if (!std::ranges::all_of(text, isBlank)) {
     fail("text where only elements may be");
   }
 }
