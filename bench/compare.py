@@ -95,10 +95,10 @@ class Workshop:
             return self.job(root, "-f")
         return run
 
-    def bench(self, program, names):
+    def bench(self, program, names, least_time=0.05):
         """Of each benchmark of the program whose name matches the best time in nanoseconds."""
         options = (["--benchmark_min_time=0.001"] if self.moment else
-                   ["--benchmark_min_time=0.05", "--benchmark_repetitions=7", "--benchmark_enable_random_interleaving=true"])
+                   [f"--benchmark_min_time={least_time}", "--benchmark_repetitions=7", "--benchmark_enable_random_interleaving=true"])
         done = subprocess.run([self.program(program), "--benchmark_format=json", f"--benchmark_filter={names}", *options],
                               stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, check=True)
         best = {}
@@ -169,7 +169,7 @@ def many_days(shop, table):
 
 
 def property_lists(shop, table):
-    times = shop.bench("plist_bench", "(readXml|expatAlone|readBinary|checkedPass|dictionaryAlone)/scalars")
+    times = shop.bench("plist_bench", "(readXml|expatAlone|readBinary|checkedPass|dictionaryAlone)/scalars", 0.3)
     xml = times["readXml/scalars"] / times["expatAlone/scalars"]
     table.row(5, "an XML property list of 15 MB", "expat with handlers that count", f"{xml:.2f} times", "at most 1.5", xml <= 1.5)
     binary = times["readBinary/scalars"] / times["checkedPass/scalars"]

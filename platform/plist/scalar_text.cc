@@ -14,16 +14,14 @@ namespace tbdaily {
 
 namespace {
 
-constexpr std::string_view kXmlSpace = " \t\r\n";
-
 bool isDigit(char c) {
   return c >= '0' && c <= '9';
 }
 
 std::string_view trimmed(std::string_view text) {
-  const std::size_t begin = text.find_first_not_of(kXmlSpace);
-  if (begin == std::string_view::npos) return {};
-  return text.substr(begin, text.find_last_not_of(kXmlSpace) - begin + 1);
+  while (!text.empty() && isXmlSpace(text.front())) text.remove_prefix(1);
+  while (!text.empty() && isXmlSpace(text.back())) text.remove_suffix(1);
+  return text;
 }
 
 // Takes a sign off the front; whether it was a minus.

@@ -9,6 +9,11 @@
 
 namespace tbdaily {
 
+// White space as XML has it, which may stand around a scalar.
+inline bool isXmlSpace(char c) {
+  return c == ' ' || c == '\t' || c == '\r' || c == '\n';
+}
+
 // An optional sign and decimal digits. The width in bits is 8, 32 or 64; nothing for a number that does not
 // fit it.
 std::optional<PlistNumber> integerOfText(std::string_view text, int bits);

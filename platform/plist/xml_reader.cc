@@ -58,10 +58,6 @@ Element elementNamed(std::string_view name) {
   return Element::None;
 }
 
-bool isBlank(char c) {
-  return c == ' ' || c == '\t' || c == '\r' || c == '\n';
-}
-
 bool equalsIgnoringCase(std::string_view a, std::string_view b) {
   const auto upper = [](char c) { return c >= 'a' && c <= 'z' ? static_cast<char>(c - 32) : c; };
   return std::ranges::equal(a, b, {}, upper, upper);
@@ -278,7 +274,7 @@ void XmlReader::addOr(std::optional<PlistValue> value, const char* reason) {
 void XmlReader::characters(std::string_view text) {
   if (open_ != Element::None && open_ != Element::True && open_ != Element::False) {
     text_ += text;
-  } else if (!std::ranges::all_of(text, isBlank)) {
+  } else if (!std::ranges::all_of(text, isXmlSpace)) {
     fail("text where only elements may be");
   }
 }
