@@ -1,4 +1,5 @@
-// Snapshot records as text, by the renderers and by the same pieces through snprintf.
+// Snapshot records as text, by the renderers and by the same pieces through snprintf; both make the same
+// text.
 
 #include <benchmark/benchmark.h>
 
@@ -54,32 +55,6 @@ std::vector<std::byte> header() {
   return bytes;
 }
 
-void fixedLayout(benchmark::State& state) {
-  const std::vector<std::byte> bytes = records();
-  std::vector<char> text(kCapacity);
-  for (auto _ : state) {
-    std::size_t size = text.size();
-    if (!STXParseSnapshotBuffer(bytes, text.data(), size)) state.SkipWithError("does not fit");
-    benchmark::DoNotOptimize(text.data());
-  }
-  state.SetItemsProcessed(state.iterations() * std::int64_t{kRecords});
-}
-BENCHMARK(fixedLayout)->Unit(benchmark::kMicrosecond);
-
-void describedLayout(benchmark::State& state) {
-  const std::vector<std::byte> bytes = records(), description = header();
-  std::vector<char> text(kCapacity);
-  for (auto _ : state) {
-    std::size_t size = text.size();
-    std::uint32_t cursor = 0;
-    if (!STXParseSnapshotBufferWithInplaceParser(bytes, text.data(), size, description, cursor))
-      state.SkipWithError("does not fit");
-    benchmark::DoNotOptimize(text.data());
-  }
-  state.SetItemsProcessed(state.iterations() * std::int64_t{kRecords});
-}
-BENCHMARK(describedLayout)->Unit(benchmark::kMicrosecond);
-
 // Groups take their formats as arguments.
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
 
@@ -130,48 +105,104 @@ void printDescribedGroups(Printed& print, const Record& r, const char* label, st
   printGroup(print, r, at + 2, {"%5u", "/%5u"});
 }
 
-void fixedLayoutThroughSnprintf(benchmark::State& state) {
+// Each writes all records and answers the length of the text, or 0 when it does not fit.
+
+std::size_t renderFixed(const std::vector<std::byte>& bytes, std::vector<char>& text) {
+  std::size_t size = text.size();
+  return STXParseSnapshotBuffer(bytes, text.data(), size) ? size : 0;
+}
+
+std::size_t printFixed(const std::vector<Record>& decoded, std::vector<char>& text) {
+  Printed print{text.data(), text.data() + text.size()};
+  print("%s", kSnapshotLegend.data());
+  for (const Record& r : decoded) {
+    print(
+        "T=%04u E=%02u HR=%4u HW=%4u NR=%4u NW=%4u TH=%8u.%02u GC=%4u W=%2u BI=%3u BU=%3u V=%5u "
+        "BF=%2u/%2u P=%2u H=%2u/%2u X=%2u/%2u L=%3u/%3u C=%2u/%2u S=%4u U=%8u RO=%4u",
+        r[0], r[26], r[27], r[28], r[29], r[30], r[39] / 1000, r[39] % 1000 / 10, r[31], r[33], r[36], r[37],
+        r[45], r[47], r[48], r[1], r[41], r[40], r[50], r[51], r[43], r[44], r[53], r[54], r[42], r[52],
+        r[14]);
+    for (std::size_t i = 1; i < 4; ++i) print("/%4u", r[14 + 3 * i]);
+    printGroup(print, r, 15, {" RL=%7u", "/%7u"});
+    printGroup(print, r, 16, {" RM=%5u", "/%5u"});
+    printGroup(print, r, 2, {" WO=%4u", "/%4u"});
+    printGroup(print, r, 3, {" WL=%7u", "/%7u"});
+    printGroup(print, r, 4, {" WM=%5u", "/%5u"});
+    print("\n");
+  }
+  print("\n");
+  return static_cast<std::size_t>(print.at - text.data());
+}
+
+std::size_t renderDescribed(const std::vector<std::byte>& bytes, const std::vector<std::byte>& description,
+                            std::vector<char>& text) {
+  std::size_t size = text.size();
+  std::uint32_t cursor = 0;
+  return STXParseSnapshotBufferWithInplaceParser(bytes, text.data(), size, description, cursor) ? size - 1
+                                                                                                : 0;
+}
+
+std::size_t printDescribed(const std::vector<Record>& decoded, std::vector<char>& text) {
+  Printed print{text.data(), text.data() + text.size()};
+  print("- STX Snapshot - \n%s\n", "");
+  for (const Record& r : decoded) {
+    for (std::size_t i = 0; i < kDescribedValues; ++i) print(" AB=%4u", r[30 + i]);
+    print(" TH=%8u.%02u", r[39] / 1000, r[39] % 1000 / 10);
+    printDescribedGroups(print, r, " R%s=", 14);
+    printDescribedGroups(print, r, " W%s=", 2);
+    print("\n");
+  }
+  return static_cast<std::size_t>(print.at - text.data());
+}
+
+// Runs `render` again and again, if it makes the text that `print` makes.
+template <typename Render, typename Print>
+void measureRendering(benchmark::State& state, const Render& render, const Print& print) {
+  std::vector<char> text(kCapacity), expected(kCapacity);
+  const std::string_view rendered(text.data(), render(text));
+  if (rendered.empty() || rendered != std::string_view(expected.data(), print(expected)))
+    return state.SkipWithError("not the text that snprintf makes");
+  for (auto _ : state) {
+    benchmark::DoNotOptimize(render(text));
+    benchmark::ClobberMemory();
+  }
+  state.SetItemsProcessed(state.iterations() * std::int64_t{kRecords});
+}
+
+template <typename Print>
+void measurePrinting(benchmark::State& state, const Print& print) {
   const std::vector<Record> decoded = decodedRecords();
   std::vector<char> text(kCapacity);
   for (auto _ : state) {
-    Printed print{text.data(), text.data() + text.size()};
-    print("%s", kSnapshotLegend.data());
-    for (const Record& r : decoded) {
-      print(
-          "T=%04u E=%02u HR=%4u HW=%4u NR=%4u NW=%4u TH=%8u.%02u GC=%4u W=%2u BI=%3u BU=%3u V=%5u "
-          "BF=%2u/%2u P=%2u H=%2u/%2u X=%2u/%2u L=%3u/%3u C=%2u/%2u S=%4u U=%8u RO=%4u",
-          r[0], r[26], r[27], r[28], r[29], r[30], r[39] / 1000, r[39] % 1000 / 10, r[31], r[33], r[36],
-          r[37], r[45], r[47], r[48], r[1], r[41], r[40], r[50], r[51], r[43], r[44], r[53], r[54], r[42],
-          r[52], r[14]);
-      for (std::size_t i = 1; i < 4; ++i) print("/%4u", r[14 + 3 * i]);
-      printGroup(print, r, 15, {" RL=%7u", "/%7u"});
-      printGroup(print, r, 16, {" RM=%5u", "/%5u"});
-      printGroup(print, r, 2, {" WO=%4u", "/%4u"});
-      printGroup(print, r, 3, {" WL=%7u", "/%7u"});
-      printGroup(print, r, 4, {" WM=%5u", "/%5u"});
-      print("\n");
-    }
-    benchmark::DoNotOptimize(text.data());
+    benchmark::DoNotOptimize(print(decoded, text));
+    benchmark::ClobberMemory();
   }
   state.SetItemsProcessed(state.iterations() * std::int64_t{kRecords});
+}
+
+void fixedLayout(benchmark::State& state) {
+  const std::vector<std::byte> bytes = records();
+  measureRendering(
+      state, [&](std::vector<char>& text) { return renderFixed(bytes, text); },
+      [](std::vector<char>& text) { return printFixed(decodedRecords(), text); });
+}
+BENCHMARK(fixedLayout)->Unit(benchmark::kMicrosecond);
+
+void describedLayout(benchmark::State& state) {
+  const std::vector<std::byte> bytes = records(), description = header();
+  measureRendering(
+      state, [&](std::vector<char>& text) { return renderDescribed(bytes, description, text); },
+      [](std::vector<char>& text) { return printDescribed(decodedRecords(), text); });
+}
+BENCHMARK(describedLayout)->Unit(benchmark::kMicrosecond);
+
+void fixedLayoutThroughSnprintf(benchmark::State& state) {
+  measurePrinting(state, printFixed);
 }
 BENCHMARK(fixedLayoutThroughSnprintf)->Unit(benchmark::kMicrosecond);
 
 void describedLayoutThroughSnprintf(benchmark::State& state) {
-  const std::vector<Record> decoded = decodedRecords();
-  std::vector<char> text(kCapacity);
-  for (auto _ : state) {
-    Printed print{text.data(), text.data() + text.size()};
-    for (const Record& r : decoded) {
-      for (std::size_t i = 0; i < kDescribedValues; ++i) print(" AB=%4u", r[30 + i]);
-      print(" TH=%8u.%02u", r[39] / 1000, r[39] % 1000 / 10);
-      printDescribedGroups(print, r, " R%s=", 14);
-      printDescribedGroups(print, r, " W%s=", 2);
-      print("\n");
-    }
-    benchmark::DoNotOptimize(text.data());
-  }
-  state.SetItemsProcessed(state.iterations() * std::int64_t{kRecords});
+  measurePrinting(state, printDescribed);
 }
 BENCHMARK(describedLayoutThroughSnprintf)->Unit(benchmark::kMicrosecond);
 

@@ -12,13 +12,20 @@ std::size_t commonLength(std::string_view a, std::string_view b) {
       std::mismatch(a.begin(), a.begin() + static_cast<std::ptrdiff_t>(limit), b.begin()).first - a.begin());
 }
 
-unsigned char byteOf(char c) {
-  return static_cast<unsigned char>(c);
+std::uint8_t byteOf(char c) {
+  return static_cast<std::uint8_t>(c);
 }
+
+// How many slots for each child a node may have.
+constexpr std::size_t kMostSpread = 4;
 
 }  // namespace
 
 PrefixIndex::PrefixIndex(const std::vector<std::string_view>& prefixes) {
+  struct Listed {
+    std::string_view prefix;
+    std::uint32_t place;
+  };
   std::vector<Listed> sorted;
   sorted.reserve(prefixes.size());
   for (std::uint32_t place = 0; place < prefixes.size(); ++place) {
@@ -35,52 +42,74 @@ PrefixIndex::PrefixIndex(const std::vector<std::string_view>& prefixes) {
   };
   nodes_.emplace_back();
   std::vector<Pending> pending{{0, 0, sorted.size(), 0}};
+  std::vector<std::size_t> begins;  // of the children's runs
   while (!pending.empty()) {
     const Pending work = pending.back();
     pending.pop_back();
-    const auto firstChild = static_cast<std::uint32_t>(nodes_.size());
-    for (std::size_t begin = work.begin; begin < work.end;) {
+    const auto byteAt = [&](std::size_t i) { return byteOf(sorted[i].prefix[work.depth]); };
+    begins.clear();
+    for (std::size_t i = work.begin; i < work.end; ++i) {
+      if (i == work.begin || byteAt(i) != byteAt(i - 1)) begins.push_back(i);
+    }
+    if (begins.empty()) continue;
+
+    Node parent = nodes_[work.node];
+    parent.firstChild = static_cast<std::uint32_t>(nodes_.size());
+    parent.lowest = byteAt(work.begin);
+    const std::size_t span = std::size_t{1} + byteAt(work.end - 1) - parent.lowest;
+    parent.isSpread = span <= kMostSpread * begins.size();
+    parent.slots = static_cast<std::uint16_t>(parent.isSpread ? span : begins.size());
+    nodes_[work.node] = parent;
+    nodes_.resize(nodes_.size() + parent.slots);
+    for (std::size_t child = 0; child < begins.size(); ++child) {
+      const std::size_t begin = begins[child], end = child + 1 < begins.size() ? begins[child + 1] : work.end;
+      const std::size_t slot = parent.isSpread ? std::size_t{byteAt(begin)} - parent.lowest : child;
+      const auto index = static_cast<std::uint32_t>(parent.firstChild + slot);
       const std::string_view first = sorted[begin].prefix;
-      std::size_t end = begin + 1;
-      while (end < work.end && sorted[end].prefix[work.depth] == first[work.depth]) ++end;
       // The run is sorted, so its ends share what all of it shares.
       const std::size_t depth = commonLength(first, sorted[end - 1].prefix);
-      Node node;
-      node.labelStart = static_cast<std::uint32_t>(labels_.size());
-      node.labelLength = static_cast<std::uint32_t>(depth - work.depth);
+      nodes_[index].labelStart = static_cast<std::uint32_t>(labels_.size());
+      nodes_[index].labelLength = static_cast<std::uint32_t>(depth - work.depth);
       labels_.append(first.substr(work.depth, depth - work.depth));
       const bool endsHere = first.size() == depth;
-      if (endsHere) node.place = sorted[begin].place;
-      const auto index = static_cast<std::uint32_t>(nodes_.size());
-      nodes_.push_back(node);
-      const std::size_t rest = begin + (endsHere ? 1 : 0);
-      if (rest < end) pending.push_back({index, rest, end, depth});
-      begin = end;
+      if (endsHere) nodes_[index].place = sorted[begin].place;
+      pending.push_back({index, begin + (endsHere ? 1 : 0), end, depth});
     }
-    nodes_[work.node].firstChild = firstChild;
-    nodes_[work.node].childCount = static_cast<std::uint32_t>(nodes_.size()) - firstChild;
   }
 }
 
-const PrefixIndex::Node* PrefixIndex::childFor(const Node& node, char byte) const {
-  const Node* begin = nodes_.data() + node.firstChild;
-  const Node* end = begin + node.childCount;
-  const Node* found = std::lower_bound(
-      begin, end, byteOf(byte),
-      [this](const Node& child, unsigned char wanted) { return byteOf(labels_[child.labelStart]) < wanted; });
-  return found != end && labels_[found->labelStart] == byte ? found : nullptr;
+inline const PrefixIndex::Node* PrefixIndex::childFor(const Node& node, std::uint8_t byte) const {
+  if (!node.isSpread) return searchedChild(node, byte);
+  const std::size_t slot = std::size_t{byte} - node.lowest;  // of a lower byte, beyond all slots
+  if (slot >= node.slots) return nullptr;
+  const Node* const child = &nodes_[node.firstChild + slot];
+  return child->labelLength > 0 ? child : nullptr;
+}
+
+const PrefixIndex::Node* PrefixIndex::searchedChild(const Node& node, std::uint8_t byte) const {
+  const Node* const begin = nodes_.data() + node.firstChild;
+  const Node* const end = begin + node.slots;
+  const auto firstByte = [this](const Node& child) { return byteOf(labels_[child.labelStart]); };
+  const Node* const found = std::ranges::lower_bound(begin, end, byte, {}, firstByte);
+  return found != end && firstByte(*found) == byte ? found : nullptr;
 }
 
 std::optional<std::uint32_t> PrefixIndex::firstMatch(std::string_view key) const {
   const Node* node = nodes_.data();
   std::uint32_t place = kNoPlace;
-  while (!key.empty() && (node = childFor(*node, key.front())) != nullptr) {
-    const std::string_view label = std::string_view(labels_).substr(node->labelStart, node->labelLength);
-    if (!key.starts_with(label)) break;
-    key.remove_prefix(label.size());
+  while (!key.empty() && (node = childFor(*node, byteOf(key.front()))) != nullptr) {
+    key.remove_prefix(1);
+    // Most labels are the one byte that led here. Others are compared apart, so that the way along the key
+    // does not wait for the node.
+    if (node->labelLength > 1) {
+      const std::string_view rest(&labels_[node->labelStart + 1], node->labelLength - 1);
+      if (!key.starts_with(rest)) break;
+      key.remove_prefix(rest.size());
+    }
     place = std::min(place, node->place);
   }
-  return place == kNoPlace ? std::nullopt : std::optional(place);
+  if (place == kNoPlace) return std::nullopt;
+  return place;
 }
 
 }  // namespace tbdaily

@@ -24,17 +24,21 @@ class PrefixIndex {
  private:
   static constexpr std::uint32_t kNoPlace = UINT32_MAX;
 
+  // The children of a node stand together, in order of their first byte. Where that does not take much more
+  // room, each stands as far from the first as its byte from the lowest, and slots between them are empty.
   struct Node {
-    std::uint32_t labelStart = 0, labelLength = 0;  // the bytes from the parent to here, in labels_
-    std::uint32_t firstChild = 0, childCount = 0;   // children stand together, in order of their first byte
+    std::uint32_t labelStart = 0, labelLength = 0;  // the bytes from the parent to here, in labels_; empty: 0
+    std::uint32_t firstChild = 0;
     std::uint32_t place = kNoPlace;
-  };
-  struct Listed {
-    std::string_view prefix;
-    std::uint32_t place;
+    std::uint16_t slots = 0;  // of the children
+    std::uint8_t lowest = 0;  // the first byte of the first child
+    bool isSpread = false;
   };
 
-  const Node* childFor(const Node& node, char byte) const;
+  // The child to which the byte leads, or null.
+  const Node* childFor(const Node& node, std::uint8_t byte) const;
+  // The same of a node that is not spread.
+  const Node* searchedChild(const Node& node, std::uint8_t byte) const;
 
   std::vector<Node> nodes_;
   std::string labels_;

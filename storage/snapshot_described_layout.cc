@@ -88,16 +88,18 @@ void renderHeading(SnapshotText& out, const SnapshotHeader& header) {
   out.append("\n");
 }
 
+constexpr ShortText kNoLabel;
+
 void renderPriorities(SnapshotText& out, std::span<const std::byte> record, const Field& field) {
   const std::size_t inside = record.size() - std::min<std::size_t>(record.size(), field.offset);
   const std::size_t priorities = std::min<std::size_t>(field.arraySize, inside) / kTripleSize;
   const ByteReader reader(record);
   for (const SnapshotColumn& column : kDescribedPriorityColumns) {
-    field.format.append(out, column.label);
+    field.format.append(out, column.label.view());
     const std::size_t first = field.offset + column.word * sizeof(std::uint32_t);
     for (std::size_t i = 0; i < priorities && out.fits(); ++i) {
-      if (i > 0) out.append("/");
-      out.appendNumber(reader.at<std::uint32_t>(first + i * kTripleSize).value_or(0), column.width);
+      const auto value = reader.at<std::uint32_t>(first + i * kTripleSize).value_or(0);
+      out.appendNumber(i == 0 ? kNoLabel : kPriorityDelimiter, value, column.width);
     }
   }
 }
@@ -155,7 +157,7 @@ bool renderRecords(SnapshotText& out, std::span<const std::byte> records, const 
     const auto record = records.subspan(cursor++ * stride);
     if (fields.isEmpty(record)) continue;
     fields.render(out, record);
-    out.append("\n");
+    out.appendShort("\n");
     if (!out.fits()) return false;
     kept = out.length();
   }

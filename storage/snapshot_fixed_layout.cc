@@ -22,25 +22,21 @@ class SnapshotRecord {
 };
 
 void renderColumns(SnapshotText& out, const SnapshotRecord& record, std::span<const SnapshotColumn> columns) {
-  for (const SnapshotColumn& column : columns) {
-    out.append(column.label);
-    out.appendNumber(record[column.word], column.width, column.fill);
-  }
+  for (const SnapshotColumn& column : columns)
+    out.appendNumber(column.label, record[column.word], column.width, column.fill);
 }
 
 void renderHysteresis(SnapshotText& out, const SnapshotRecord& record) {
   const auto [whole, hundredths] = splitThousands(record[kSnapshotHysteresisColumn.word]);
-  out.append(kSnapshotHysteresisColumn.label);
-  out.appendNumber(whole, kSnapshotHysteresisColumn.width);
-  out.append(".");
-  out.appendNumber(hundredths, 2, '0');
+  out.appendNumber(kSnapshotHysteresisColumn.label, whole, kSnapshotHysteresisColumn.width);
+  out.appendNumber(".", hundredths, 2, '0');
 }
 
 void renderPriorities(SnapshotText& out, const SnapshotRecord& record) {
   for (const SnapshotColumn& column : kSnapshotPriorityColumns) {
     for (std::size_t priority = 0; priority < kSnapshotPriorities; ++priority) {
-      out.append(priority == 0 ? column.label : "/");
-      out.appendNumber(record[column.word + priority * kPriorityTripleWords], column.width);
+      const ShortText& label = priority == 0 ? column.label : kPriorityDelimiter;
+      out.appendNumber(label, record[column.word + priority * kPriorityTripleWords], column.width);
     }
   }
 }
@@ -57,7 +53,7 @@ bool STXParseSnapshotBuffer(std::span<const std::byte> records, char* text, std:
     renderHysteresis(out, record);
     renderColumns(out, record, kSnapshotColumnsAfterHysteresis);
     renderPriorities(out, record);
-    out.append("\n");
+    out.appendShort("\n");
   }
   out.append("\n");
   out.endAt(out.length());

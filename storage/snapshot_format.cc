@@ -56,6 +56,7 @@ bool readConversion(std::string_view& rest, std::string_view types, Conversion& 
   }
   if (rest.empty() || types.find(rest.front()) == types.npos) return false;
   conversion.type = rest.front();
+  conversion.isUsual = conversion.type == 'u' && !conversion.left && !conversion.precision;
   rest.remove_prefix(1);
   return true;
 }
@@ -91,9 +92,36 @@ std::size_t leadingZeros(const Conversion& conversion, std::size_t prefix, std::
   return fills && conversion.width > length ? zeros + conversion.width - length : zeros;
 }
 
-void appendInteger(SnapshotText& out, const Conversion& conversion, std::uint32_t value) {
-  if (conversion.type == 'u' && !conversion.left && !conversion.precision)
-    return out.appendNumber(value, conversion.width, conversion.zero ? '0' : ' ');
+}  // namespace
+
+SnapshotFormat::SnapshotFormat(std::span<const char, kSize> raw, Arguments arguments) {
+  const auto end = std::ranges::find(raw, '\0');
+  if (end != raw.end() && read({raw.begin(), end}, arguments)) return;
+  plain_.front() = ShortText(std::string_view(raw.begin(), end));
+  conversionCount_ = 0;
+}
+
+bool SnapshotFormat::read(std::string_view rest, Arguments arguments) {
+  const std::string_view types = arguments == Arguments::kText ? "s" : "diuoxX";
+  const std::size_t most = arguments == Arguments::kTwoValues ? 2 : 1;
+  while (!rest.empty()) {
+    const char next = rest.front();
+    rest.remove_prefix(1);
+    if (next != '%' || rest.starts_with('%')) {
+      if (next == '%') rest.remove_prefix(1);
+      plain_[conversionCount_].append(next);
+      continue;
+    }
+    if (conversionCount_ == most) return false;
+    Conversion& conversion = conversions_[conversionCount_++];
+    if (!readConversion(rest, types, conversion)) return false;
+  }
+  return true;
+}
+
+void SnapshotFormat::appendUnusual(SnapshotText& out, const ShortText& label, const Conversion& conversion,
+                                   std::uint32_t value) {
+  out.appendShort(label);
   const bool isSigned = conversion.type == 'd' || conversion.type == 'i';
   const bool negative = isSigned && value >> 31 != 0;
   const std::uint32_t magnitude = negative ? 0 - value : value;
@@ -115,57 +143,13 @@ void appendInteger(SnapshotText& out, const Conversion& conversion, std::uint32_
   });
 }
 
-}  // namespace
-
-SnapshotFormat::SnapshotFormat(std::span<const char, kSize> raw, Arguments arguments) {
-  const auto end = std::ranges::find(raw, '\0');
-  if (end != raw.end() && read({raw.begin(), end}, arguments)) return;
-  std::copy(raw.begin(), end, plain_.begin());
-  plainLength_ = static_cast<std::uint8_t>(end - raw.begin());
-  conversionCount_ = 0;
-}
-
-bool SnapshotFormat::read(std::string_view rest, Arguments arguments) {
-  const std::string_view types = arguments == Arguments::kText ? "s" : "diuoxX";
-  const std::size_t most = arguments == Arguments::kTwoValues ? 2 : 1;
-  while (!rest.empty()) {
-    const char next = rest.front();
-    rest.remove_prefix(1);
-    if (next != '%' || rest.starts_with('%')) {
-      if (next == '%') rest.remove_prefix(1);
-      plain_[plainLength_++] = next;
-      continue;
-    }
-    if (conversionCount_ == most) return false;
-    Conversion& conversion = conversions_[conversionCount_++];
-    conversion.at = plainLength_;
-    if (!readConversion(rest, types, conversion)) return false;
-  }
-  return true;
-}
-
-// `print` appends a conversion, given its index.
-template <typename Print>
-void SnapshotFormat::appendPieces(SnapshotText& out, const Print& print) const {
-  const std::string_view plain(plain_.data(), plainLength_);
-  std::size_t done = 0;
-  for (std::size_t i = 0; i < conversionCount_; ++i) {
-    out.append(plain.substr(done, conversions_[i].at - done));
-    done = conversions_[i].at;
-    print(i);
-  }
-  out.append(plain.substr(done));
-}
-
-void SnapshotFormat::append(SnapshotText& out, const std::array<std::uint32_t, kMostValues>& values) const {
-  appendPieces(out, [&](std::size_t i) { appendInteger(out, conversions_[i], values[i]); });
-}
-
 void SnapshotFormat::append(SnapshotText& out, std::string_view argument) const {
-  appendPieces(out, [&](std::size_t i) {
+  for (std::size_t i = 0; i < conversionCount_; ++i) {
+    out.appendShort(plain_[i]);
     const std::string_view shown = argument.substr(0, conversions_[i].precision.value_or(argument.size()));
     appendPadded(out, conversions_[i], shown.size(), [&] { out.append(shown); });
-  });
+  }
+  out.appendShort(plain_[conversionCount_]);
 }
 
 }  // namespace tbdaily

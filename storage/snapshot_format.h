@@ -28,11 +28,14 @@ class SnapshotFormat {
   SnapshotFormat(std::span<const char, kSize> raw, Arguments arguments);
 
   // The one that fits the arguments with which the format was read.
-  void append(SnapshotText& out, const std::array<std::uint32_t, kMostValues>& values) const;
+  void append(SnapshotText& out, const std::array<std::uint32_t, kMostValues>& values) const {
+    for (std::size_t i = 0; i < conversionCount_; ++i)
+      appendInteger(out, plain_[i], conversions_[i], values[i]);
+    out.appendShort(plain_[conversionCount_]);
+  }
   void append(SnapshotText& out, std::string_view argument) const;
 
   struct Conversion {
-    std::uint8_t at = 0;  // the characters of the plain text that come before
     char type = '\0';
     bool left = false;
     bool plus = false;
@@ -41,17 +44,22 @@ class SnapshotFormat {
     bool zero = false;
     std::uint8_t width = 0;
     std::optional<std::uint8_t> precision;
+    bool isUsual = false;  // %u, perhaps with a width, with zeros or spaces before the digits
   };
 
  private:
   bool read(std::string_view rest, Arguments arguments);
-  template <typename Print>
-  void appendPieces(SnapshotText& out, const Print& print) const;
+  static void appendInteger(SnapshotText& out, const ShortText& label, const Conversion& conversion,
+                            std::uint32_t value) {
+    if (!conversion.isUsual) return appendUnusual(out, label, conversion, value);
+    out.appendNumber(label, value, conversion.width, conversion.zero ? '0' : ' ');
+  }
+  static void appendUnusual(SnapshotText& out, const ShortText& label, const Conversion& conversion,
+                            std::uint32_t value);
 
-  std::array<char, kSize> plain_{};  // without the conversions
-  std::uint8_t plainLength_ = 0;
-  std::uint8_t conversionCount_ = 0;
+  std::array<ShortText, kMostValues + 1> plain_;  // before each conversion and behind the last
   std::array<Conversion, kMostValues> conversions_{};
+  std::uint8_t conversionCount_ = 0;
 };
 
 }  // namespace tbdaily

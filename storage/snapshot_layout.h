@@ -6,6 +6,8 @@
 #include <cstdint>
 #include <string_view>
 
+#include "storage/short_text.h"
+
 namespace tbdaily {
 
 // The C row lacks its line end: readers of the text know it so.
@@ -44,7 +46,7 @@ inline constexpr std::size_t kSnapshotRecordSize = 252;
 
 // One number of the line: its label, the word of the record, and the width to which it is filled up.
 struct SnapshotColumn {
-  std::string_view label;
+  ShortText label;
   std::uint8_t word = 0;
   std::uint8_t width = 0;
   char fill = ' ';
@@ -87,6 +89,7 @@ inline constexpr std::array<SnapshotColumn, 18> kSnapshotColumnsAfterHysteresis 
 // Operations, total latency and maximum latency (both in microseconds) of one priority.
 inline constexpr std::size_t kPriorityTripleWords = 3;
 inline constexpr std::size_t kSnapshotPriorities = 4;
+inline constexpr ShortText kPriorityDelimiter = "/";
 
 // One value of every priority, slashes between them. The word is that of priority 0.
 inline constexpr std::array<SnapshotColumn, 6> kSnapshotPriorityColumns = {{

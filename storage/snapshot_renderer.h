@@ -1,8 +1,8 @@
 // The storage controller's history of short intervals, the snapshots, as text: one line for each interval.
 //
 // Every counter is a little-endian 32-bit word. Both renderers write into the caller's characters and
-// allocate nothing; no byte is written at or past the capacity. A piece of text does not fit when no room is
-// left for the NUL that ends it.
+// allocate nothing; no byte is written at or past the capacity, and what stands behind the text and its NUL
+// is undefined. A piece of text does not fit when no room is left for the NUL that ends it.
 #pragma once
 
 #include <cstddef>

@@ -1,11 +1,15 @@
 // The bounded text that the snapshot renderers write into.
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
 #include <span>
 #include <string_view>
+
+#include "platform/byte_writer.h"
+#include "storage/short_text.h"
 
 namespace tbdaily {
 
@@ -19,7 +23,8 @@ constexpr ThousandsSplit splitThousands(std::uint32_t value) {
 }
 
 // Appends to the caller's characters and never writes at or past their capacity. A piece that leaves no room
-// for the NUL is cut; nothing is appended from then on, and fits() is false.
+// for the NUL is cut; nothing is appended from then on, and fits() is false. Short pieces are written as a
+// whole number of bytes, so what stands behind the text within the capacity is undefined.
 class SnapshotText {
  public:
   static constexpr std::size_t kWidest = 64;
@@ -30,6 +35,11 @@ class SnapshotText {
   std::size_t length() const { return length_; }
 
   void append(std::string_view piece) { appendBytes(std::as_bytes(std::span(piece))); }
+  void appendShort(const ShortText& piece) {
+    if (space() <= ShortText::kCapacity) return append(piece.view());
+    std::memcpy(text_ + length_, piece.characters().data(), ShortText::kCapacity);
+    length_ += piece.size();
+  }
   void appendBytes(std::span<const std::byte> piece) {
     const std::size_t count = room(piece.size());
     if (count > 0) std::memcpy(text_ + length_, piece.data(), count);
@@ -40,8 +50,19 @@ class SnapshotText {
     if (count > 0) std::memset(text_ + length_, fill, count);
     length_ += count;
   }
-  // Unsigned decimal, filled up on the left to the width (at most kWidest).
-  void appendNumber(std::uint32_t value, std::size_t width, char fill = ' ');
+  // A label, then the value in unsigned decimal, filled up on the left to the width (at most kWidest).
+  void appendNumber(const ShortText& label, std::uint32_t value, std::size_t width, char fill = ' ') {
+    const std::size_t digits = decimalDigits(value), length = std::max(width, digits);
+    if (length > kShortNumber || space() <= ShortText::kCapacity + kShortNumber) {
+      appendShort(label);
+      return appendLongNumber(value, length, digits, fill);
+    }
+    char* const at = text_ + length_;
+    std::memcpy(at, label.characters().data(), ShortText::kCapacity);
+    writeLittleEndian(std::as_writable_bytes(std::span(at + label.size(), kShortNumber)),
+                      eightCharacters(value, digits, fill) >> 8 * (kShortNumber - length));
+    length_ += label.size() + length;
+  }
 
   // Ends the text with a NUL after `length` characters (at most length()).
   void endAt(std::size_t length) {
@@ -49,15 +70,17 @@ class SnapshotText {
   }
 
  private:
-  // A number that leaves no room for the NUL.
-  [[gnu::noinline]] void appendCut(std::uint32_t value, std::size_t length, std::size_t digits, char fill);
+  static constexpr std::size_t kShortNumber = sizeof(std::uint64_t);
 
+  // A number longer than eight characters, or with little room for it.
+  void appendLongNumber(std::uint32_t value, std::size_t length, std::size_t digits, char fill);
+
+  std::size_t space() const { return capacity_ - length_; }
   // How many characters of a piece may be written.
   std::size_t room(std::size_t count) {
-    const std::size_t space = capacity_ - length_;
-    if (count < space) return count;
+    if (count < space()) return count;
     fits_ = false;
-    return space > 0 ? space - 1 : 0;
+    return space() > 0 ? space() - 1 : 0;
   }
 
   char* text_;

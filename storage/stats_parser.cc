@@ -1,11 +1,10 @@
 // One pass over the statistics buffer, in place.
 
 #include <algorithm>
-#include <new>
+#include <array>
 #include <type_traits>
 #include <variant>
 
-#include "platform/byte_reader.h"
 #include "storage/stats_context.h"
 #include "storage/stats_table.h"
 
@@ -13,22 +12,9 @@ namespace tbdaily {
 
 namespace {
 
-constexpr std::size_t kWordSize = sizeof(std::uint64_t);
 constexpr std::uint32_t kLargestIdentifier = 0x30000000;
 constexpr std::uint32_t kUnknownDriverVersion = 0xFFFFFFFF;
 constexpr std::uint32_t kReadCountHisto = 265;
-
-// The words of a buffer. Every index is checked against the word count before it is read.
-class WordReader {
- public:
-  explicit WordReader(std::span<const std::byte> buffer) : reader_(buffer) {}
-  std::uint64_t operator[](std::size_t index) const {
-    return reader_.at<std::uint64_t>(index * kWordSize).value_or(0);
-  }
-
- private:
-  ByteReader reader_;
-};
 
 // The fields that hold the first value of one statistic each; narrow ones hold its low 32 bits.
 struct FieldRow {
@@ -68,58 +54,69 @@ constexpr auto kFieldOfRow = [] {
   return fields;
 }();
 
-void storeField(StatsContext& context, std::uint16_t row, std::uint64_t value) {
-  if (kFieldOfRow[row] == kNoField) return;
+void storeField(StatsContext& context, const FieldRow& row, std::uint64_t value) {
   std::visit(
       [&](auto member) {
         auto& field = context.*member;
         field = static_cast<std::remove_reference_t<decltype(field)>>(value);
       },
-      kFields[kFieldOfRow[row]].field);
+      row.field);
 }
 
-void AppendStatNode(StatsContext& context, const StatNode& node) {
-  try {
-    context.nodes.push_back(node);
-  } catch (const std::bad_alloc&) {
-    // A value without memory is left out; the rest of the buffer still counts.
-  }
+// The fixed fields of a record whose first values, at least one, are taken; they start at word `first`.
+void RecordStat(StatsContext& context, std::uint16_t row, const StatWords& words, std::size_t first,
+                std::uint16_t count) {
+  if (kFieldOfRow[row] != kNoField) storeField(context, kFields[kFieldOfRow[row]], words[first]);
+  if (kStats[row].id != kReadCountHisto) return;
+  for (std::size_t i = 0; i < count; ++i) context.readCountHisto[i] = words[first + i];
 }
 
-// The first `count` values of a record, which start at word `first`.
-void RecordStat(StatsContext& context, std::uint16_t row, const WordReader& words, std::size_t first,
-                std::size_t count) {
-  if (count == 0) return;
-  storeField(context, row, words[first]);
-  const bool isReadCountHisto = kStats[row].id == kReadCountHisto;
-  if (count == 1) AppendStatNode(context, {words[first], row, StatNode::kBareName});
-  for (std::size_t i = 0; i < count; ++i) {
-    const std::uint64_t value = words[first + i];
-    if (isReadCountHisto) context.readCountHisto[i] = value;
-    if (count > 1) AppendStatNode(context, {value, row, static_cast<std::uint16_t>(i)});
+// Asks the memory for what is read next. Values are jumped over, so the processor does not see by itself
+// which words those are.
+class ReadAhead {
+ public:
+  explicit ReadAhead(const StatWords& words) : words_(words) {}
+  void beyond(std::size_t at) {
+    for (; asked_ < at + kDistance; asked_ += kWordsOfLine) words_.prefetch(asked_);
   }
-}
+
+ private:
+  static constexpr std::size_t kWordsOfLine = 8;  // of a cache's memory
+  static constexpr std::size_t kDistance = 512;   // in words
+
+  const StatWords& words_;
+  std::size_t asked_ = 0;  // the words before this one
+};
 
 }  // namespace
 
 bool STXParseBufferToCxt(StatsContext& context, std::span<const std::byte> buffer) {
   context.driverVersion = kUnknownDriverVersion;
-  const std::size_t end = static_cast<std::uint32_t>(buffer.size()) / kWordSize;
-  const WordReader words(buffer);
-  std::size_t at = 0;
-  while (at < end) {
-    const std::uint64_t header = words[at++];
-    const auto id = static_cast<std::uint32_t>(header);
-    const auto values = static_cast<std::uint32_t>(header >> 32);
-    if (id > kLargestIdentifier || values > end - at) {
+  const StatWords words(buffer.first(static_cast<std::uint32_t>(buffer.size())));
+  ReadAhead ahead(words);
+  std::size_t at = 0, listed = 0;
+  bool isCorrupt = false;
+  while (at < words.size()) {
+    const StatRecordHeader header = words.headerAt(at);
+    ahead.beyond(at);
+    isCorrupt = header.id > kLargestIdentifier || header.values >= words.size() - at;
+    if (isCorrupt) {
       context.exportVersion = 0;
-      return false;
+      break;
     }
-    if (const auto row = findStat(id))
-      RecordStat(context, *row, words, at, std::min<std::size_t>(values, kStats[*row].limit));
-    at += values;
+    if (const auto row = findStat(header.id)) {
+      const std::uint16_t count = takenValues(*row, header.values);
+      if (count > 0) RecordStat(context, *row, words, at + 1, count);
+      listed += count;
+    }
+    at += 1 + std::size_t{header.values};
   }
-  return end > 0;
+  context.nodes = StatNodes(words.first(at), listed);
+  return words.size() > 0 && !isCorrupt;
+}
+
+void STXReleaseContext(StatsContext& context) {
+  context = StatsContext();
 }
 
 }  // namespace tbdaily

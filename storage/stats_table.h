@@ -1,8 +1,11 @@
 // The statistics that the controller's buffer may hold.
 #pragma once
 
+#include <algorithm>
 #include <array>
+#include <cstddef>
 #include <cstdint>
+#include <limits>
 #include <optional>
 #include <string_view>
 
@@ -377,8 +380,29 @@ inline constexpr std::array<StatDefinition, 356> kStats = {{
     {470, "raidReconstructFailPartition", 2},
     // clang-format on
 }};
+static_assert(std::ranges::is_sorted(kStats, std::ranges::less_equal(), &StatDefinition::id) &&
+              std::ranges::adjacent_find(kStats, {}, &StatDefinition::id) == kStats.end());
+
+inline constexpr std::uint16_t kNoStatRow = std::numeric_limits<std::uint16_t>::max();
+
+// The identifiers are small and dense: one look tells the row.
+inline constexpr auto kStatRowOfId = [] {
+  std::array<std::uint16_t, kStats.back().id + 1> rows{};
+  rows.fill(kNoStatRow);
+  for (std::size_t row = 0; row < kStats.size(); ++row)
+    rows[kStats[row].id] = static_cast<std::uint16_t>(row);
+  return rows;
+}();
 
 // The row of kStats that has the identifier.
-std::optional<std::uint16_t> findStat(std::uint32_t id);
+inline std::optional<std::uint16_t> findStat(std::uint32_t id) {
+  if (id >= kStatRowOfId.size() || kStatRowOfId[id] == kNoStatRow) return std::nullopt;
+  return kStatRowOfId[id];
+}
+
+// How many of a record's values its statistic takes.
+inline std::uint16_t takenValues(std::uint16_t row, std::uint32_t values) {
+  return static_cast<std::uint16_t>(std::min<std::uint32_t>(values, kStats[row].limit));
+}
 
 }  // namespace tbdaily

@@ -1,9 +1,9 @@
 #include "storage/storage_connection.h"
 
 #include <array>
-#include <new>
 #include <optional>
 #include <string>
+#include <utility>
 
 #include "platform/byte_reader.h"
 
@@ -12,8 +12,6 @@ namespace tbdaily {
 namespace {
 
 constexpr std::uint32_t kConnectionType = 0;
-// A multiple of every page size in use.
-constexpr auto kPageAlignment = static_cast<std::align_val_t>(65536);
 
 // The connection, or 0.
 KdHandle openService(DriverRegistry& registry, KdHandle service, KdStatus& status) {
@@ -51,7 +49,9 @@ bool fetchAndParse(const StorageConnection& connection, const NandExporter& desc
                       dataFetch ? dataFetch->command : 0U);
     return false;
   }
-  return descriptor.parseBufferToCxt(context, buffer.filled());
+  const bool accepted = descriptor.parseBufferToCxt(context, buffer.filled());
+  context.buffer = std::move(buffer);
+  return accepted;
 }
 
 }  // namespace
@@ -69,13 +69,6 @@ KdHandle findNandExporter(DriverRegistry& registry, const NandExporter*& descrip
 
 StorageService::StorageService(DriverRegistry& registry, NandExporterTable exporters)
     : registry_(registry), handle_(registry, findNandExporter(registry, descriptor_, exporters)) {}
-
-StorageBuffer::StorageBuffer(std::size_t size)
-    : memory_(static_cast<std::byte*>(::operator new(size, kPageAlignment, std::nothrow))), size_(size) {}
-
-void StorageBuffer::Release::operator()(std::byte* memory) const {
-  ::operator delete(memory, kPageAlignment);
-}
 
 StorageConnection::StorageConnection(const StorageService& service, Diagnostics& diagnostics)
     : service_(service), diagnostics_(diagnostics) {

@@ -5,13 +5,13 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <memory>
 #include <span>
 
 #include "platform/diagnostics.h"
 #include "platform/driver_handle.h"
 #include "platform/driver_registry.h"
 #include "storage/exporters.h"
+#include "storage/storage_buffer.h"
 #include "storage/stx_request.h"
 
 namespace tbdaily {
@@ -36,28 +36,6 @@ class StorageService {
   DriverRegistry& registry_;
   const NandExporter* descriptor_ = nullptr;
   DriverHandle handle_;
-};
-
-// A page-aligned buffer that a driver fills. Its bytes are indeterminate until then.
-class StorageBuffer {
- public:
-  // No memory: a buffer that is false.
-  explicit StorageBuffer(std::size_t size);
-
-  explicit operator bool() const { return memory_ != nullptr; }
-  std::span<std::byte> all() { return {memory_.get(), size_}; }
-  // What the last fetch filled; only these bytes may be read.
-  std::span<const std::byte> filled() const { return {memory_.get(), filled_}; }
-  // More than the buffer holds counts as all of it.
-  void setFilled(std::size_t size) { filled_ = size < size_ ? size : size_; }
-
- private:
-  struct Release {
-    void operator()(std::byte* memory) const;
-  };
-  std::unique_ptr<std::byte, Release> memory_;
-  std::size_t size_;
-  std::size_t filled_ = 0;
 };
 
 // A connection of user-client type 0. The destructor closes it, and says so when that fails. Borrows the
@@ -89,8 +67,8 @@ class StorageConnection {
 };
 
 // Fetches the statistics buffer and has the descriptor's function parse it into the context, which the caller
-// provides zero-filled. Always writes the descriptor. True when the buffer was fetched and accepted; the
-// context may hold values after a refusal too.
+// provides zero-filled and which keeps the buffer. Always writes the descriptor. True when the buffer was
+// fetched and accepted; the context may hold values after a refusal too.
 bool FetchStatsContext(DriverRegistry& registry, const NandExporter*& descriptor, StatsContext& context,
                        Diagnostics& diagnostics, NandExporterTable exporters = nand_exporters);
 

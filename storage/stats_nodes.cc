@@ -1,8 +1,7 @@
-#include "storage/stats_context.h"
+#include "storage/stats_nodes.h"
 
+#include <array>
 #include <charconv>
-
-#include "storage/stats_table.h"
 
 namespace tbdaily {
 
@@ -19,10 +18,6 @@ bool StatNode::isNamed(std::string_view name) const {
   std::array<char, std::numeric_limits<std::uint16_t>::digits10 + 1> digits{};
   const auto written = std::to_chars(digits.data(), digits.data() + digits.size(), element);
   return name.substr(stat.size()) == std::string_view(digits.data(), written.ptr);
-}
-
-void STXReleaseContext(StatsContext& context) {
-  context = StatsContext();
 }
 
 }  // namespace tbdaily
