@@ -96,7 +96,8 @@ class Workshop:
         return run
 
     def bench(self, program, names, least_time=0.05):
-        """Of each benchmark of the program whose name matches the best time in nanoseconds."""
+        """Of each benchmark of the program whose name matches the best time in nanoseconds, and under "NAME a byte" the
+        time for each byte where bytes are counted."""
         options = (["--benchmark_min_time=0.001"] if self.moment else
                    [f"--benchmark_min_time={least_time}", "--benchmark_repetitions=7", "--benchmark_enable_random_interleaving=true"])
         done = subprocess.run([self.program(program), "--benchmark_format=json", f"--benchmark_filter={names}", *options],
@@ -110,6 +111,8 @@ class Workshop:
             name = run["name"].removesuffix("/real_time")
             time = run["real_time"] * NANOSECONDS[run["time_unit"]]
             best[name] = min(best.get(name, time), time)
+            if "bytes_per_second" in run:
+                best[name + " a byte"] = min(best.get(name + " a byte", 1e9), 1e9 / run["bytes_per_second"])
         return best
 
 
@@ -186,12 +189,13 @@ def spread(times, name, sizes):
 
 def statistics_buffers(shop, table):
     sizes = [1, MEBIBYTE, 64 * MEBIBYTE]
-    times = shop.bench("storage_bench", "(parseAndRelease|sameNodesAllocatedAndFreed)/")
+    times = shop.bench("storage_bench", "^(parseAndRelease|sameNodesAllocatedAndFreed)/")
     ratios = [times[f"parseAndRelease/{size}"] / times[f"sameNodesAllocatedAndFreed/{size}"] for size in sizes]
     table.row(7, "a statistics buffer parsed and released: one record set, 1 MiB, 64 MiB", "the same nodes allocated and freed",
               ", ".join(f"{ratio:.2f}" for ratio in ratios) + " times", "at most 1.2", max(ratios) <= 1.2)
-    flat = spread(times, "parseAndRelease", sizes[1:])
-    table.row(7, "the same, 1 MiB and 64 MiB", "each other, a byte", f"within {flat:.2f}", "within 1.5", flat <= 1.5)
+    each = [times[f"parseAndRelease/{size} a byte"] for size in sizes]
+    flat = max(each) / min(each)
+    table.row(7, "the same", "each other, a byte", f"within {flat:.2f}", "within 1.5", flat <= 1.5)
 
 
 def snapshots(shop, table):
