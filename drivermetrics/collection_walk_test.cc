@@ -27,7 +27,7 @@ class RandomChannels {
       PlistData bytes;
       testing::appendElement(bytes, 0, 0, channelType(KdReportChannelGetFormat(channel.get())),
                              {.words = {1, 2, 3, 4}});
-      channel->rawElements = ElementData(bytes);
+      channel->copyElements(bytes);
     }
     return channels;
   }
@@ -90,7 +90,7 @@ TEST(CollectionWalk, VisitsClonesAndPrunesLikeAList) {
     for (std::size_t i = 0; i < copies.size(); ++i) {
       EXPECT_NE(copies[i], expected[i]);
       EXPECT_EQ(copies[i]->source, expected[i]->source);
-      EXPECT_EQ(copies[i]->rawElements.bytes().data(), expected[i]->rawElements.bytes().data());
+      EXPECT_EQ(copies[i]->elements().data(), expected[i]->elements().data());
     }
     EXPECT_TRUE(copy->queryOptions.isNone());
 
@@ -139,7 +139,7 @@ TEST(CollectionWalk, PairsChannelsInTheirOrder) {
         before.get(), after.get(),
         [&](const ChannelRecord& partner, const ChannelRecord&, ChannelRecord& copy) {
           partners.push_back(&partner);
-          EXPECT_NE(copy.rawElements.bytes().data(), partner.rawElements.bytes().data());
+          EXPECT_NE(copy.elements().data(), partner.elements().data());
           EXPECT_EQ(getRawElements(&copy, KdReportChannelGetFormat(&copy))->word(0, 3), kKdReportInvalid);
           return std::uint32_t{0};
         });

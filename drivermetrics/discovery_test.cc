@@ -108,7 +108,7 @@ TEST_F(Discovery, FilesChannelsByDriverGroupAndSubgroup) {
   ASSERT_NE(one, nullptr);
   EXPECT_EQ(one->channels.get()->size(), 1U);
   ChannelRecord* channel =
-      one->channelGroups.get()->find("G")->channelGroups.get()->find("S")->channels.get()->front().get();
+      one->channelGroups.get()->find("G")->channelGroups.get()->find("S")->channels.get()->begin()[0];
   EXPECT_EQ(KdReportChannelGetDriverID(channel), 0x2A);
   EXPECT_EQ(KdReportChannelGetCategories(channel), 0x100);
   EXPECT_EQ(KdReportChannelGetUnitLabel(channel), "events");

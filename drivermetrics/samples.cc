@@ -10,7 +10,6 @@
 #include "drivermetrics/raw_elements.h"
 #include "drivermetrics/report_error.h"
 #include "drivermetrics/subscription.h"
-#include "platform/byte_reader.h"
 #include "platform/keyed_hash.h"
 
 namespace kdreport {
@@ -28,82 +27,107 @@ class SampleBuffer {
     Overrun,   // a channel announces more elements than are left
     NoLength,  // a channel announces none
   };
-  struct Channel {
-    ChannelType type;
-    std::span<const std::byte> elements;  // empty when they run over the end
-  };
+  static constexpr std::size_t kNone = 0xFFFFFFFF;
 
   explicit SampleBuffer(std::span<const std::byte> buffer)
-      : buffer_(buffer.first(std::min(buffer.size() / kElementSize, kMostElements) * kElementSize)) {
-    isFirst_.resize(buffer_.size() / kElementSize);
-    slots_.resize(std::bit_ceil(2 * (buffer_.size() / kElementSize) + 1), kFree);
-    end_ = walkChain([this](std::size_t element) {
-      std::uint32_t& slot = slotOf(identifiersAt(element));
-      if (slot != kFree) return;
-      slot = static_cast<std::uint32_t>(element);
-      isFirst_[element] = true;
-    });
-  }
+      : buffer_(buffer.first(std::min(buffer.size() / kElementSize, kNone) * kElementSize)),
+        slots_(std::bit_ceil(2 * (buffer_.size() / kElementSize) + 1), kFree),
+        lastSlot_(slots_.size() - 1),
+        elementBits_(static_cast<std::uint32_t>(std::bit_ceil(buffer_.size() / kElementSize + 1) - 1)) {}
 
-  // None when the chain ends before such a channel. Quickest for channels in the order of the buffer.
-  std::optional<Channel> find(const ChannelRecord& channel) {
-    const Identifiers wanted{static_cast<std::uint64_t>(KdReportChannelGetDriverID(&channel)),
-                             static_cast<std::uint64_t>(KdReportChannelGetChannelID(&channel))};
-    const bool isNext = next_ < isFirst_.size() && isFirst_[next_] && identifiersAt(next_) == wanted;
-    const std::size_t element = isNext ? next_ : slotOf(wanted);
-    if (element == kFree) return std::nullopt;
-    // Read once, then checked: the buffer may change meanwhile.
-    const ChannelType type = typeAt(element);
-    next_ = element + type.elementCount();
-    const std::size_t offset = element * kElementSize, size = type.elementCount() * kElementSize;
-    return Channel{
-        type, size <= buffer_.size() - offset ? buffer_.subspan(offset, size) : std::span<const std::byte>()};
+  // The channel's first element; kNone when the chain ends before such a channel. Goes along the chain no
+  // farther than to it, and notes the channels that it passes.
+  std::size_t find(const ChannelRecord& channel) {
+    const Identifiers wanted{static_cast<std::uint64_t>(channel.driverID()),
+                             static_cast<std::uint64_t>(channel.channelID())};
+    Place place = placeOf(wanted);
+    if (*place.slot != kFree) return *place.slot & elementBits_;
+    std::size_t element = step();
+    if (element != kNone && identifiersAt(element) != wanted) {
+      element = pass(element, wanted);
+      place = placeOf(wanted);
+    }
+    if (element != kNone) note(element, place);
+    return element;
   }
+  ChannelType typeAt(std::size_t element) const { return {fieldAt(element, element_offset::kType)}; }
+  // So many elements; none when they run over the end.
+  std::span<const std::byte> elementsAt(std::size_t element, std::size_t count) const {
+    const std::size_t offset = element * kElementSize, size = count * kElementSize;
+    return buffer_.subspan(offset, size <= buffer_.size() - offset ? size : 0);
+  }
+  // Once a search went there.
   End end() const { return end_; }
 
  private:
   using Identifiers = std::pair<std::uint64_t, std::uint64_t>;  // driver, channel
 
-  static constexpr std::size_t kMostElements = 0xFFFFFFFF;
-  static constexpr std::uint32_t kFree = 0xFFFFFFFF;
+  // Where a channel belongs in the table: the slot that holds it or is free for it, and what the slot says of
+  // the channel's hash.
+  struct Place {
+    std::uint32_t* slot;
+    std::uint32_t hash;
+  };
 
-  // Hands the first element of each channel to the step.
-  template <typename Step>
-  End walkChain(const Step& step) const {
-    const std::size_t end = buffer_.size() / kElementSize;
-    std::size_t element = 0;
-    while (element < end) {
-      const std::size_t count = typeAt(element).elementCount();
-      if (count == 0) return End::NoLength;
-      step(element);
-      element += count;
+  static constexpr std::uint32_t kFree = kNone;
+
+  // The first element of the next channel of the chain; kNone at its end.
+  std::size_t step() {
+    const std::size_t element = next_, elements = buffer_.size() / kElementSize;
+    if (element >= elements) {
+      end_ = element == elements ? End::Exact : End::Overrun;
+      return kNone;
     }
-    return element == end ? End::Exact : End::Overrun;
+    const std::size_t count = typeAt(element).elementCount();
+    if (count == 0) {
+      end_ = End::NoLength;
+      return kNone;
+    }
+    next_ += count;
+    return element;
   }
 
   std::uint64_t fieldAt(std::size_t element, std::size_t offset) const {
-    return *tbdaily::ByteReader(buffer_).at<std::uint64_t>(element * kElementSize + offset);
+    return readWord(buffer_.subspan(element * kElementSize + offset).first<kWordSize>());
   }
-  ChannelType typeAt(std::size_t element) const { return {fieldAt(element, element_offset::kType)}; }
   Identifiers identifiersAt(std::size_t element) const {
     return {fieldAt(element, element_offset::kProvider), fieldAt(element, element_offset::kChannel)};
   }
 
-  // The slot that holds the channel's first element, or the free one where it belongs.
-  std::uint32_t& slotOf(const Identifiers& wanted) {
-    std::size_t slot = tbdaily::KeyedHash::of(wanted.first, wanted.second) & (slots_.size() - 1);
-    for (std::size_t tried = 1; tried < slots_.size(); ++tried) {
-      if (slots_[slot] == kFree || identifiersAt(slots_[slot]) == wanted) break;
-      slot = (slot + 1) & (slots_.size() - 1);
+  // Goes on from a channel that is not wanted, to the one that is.
+  std::size_t pass(std::size_t element, const Identifiers& wanted) {
+    for (; element != kNone; element = step()) {
+      const Identifiers met = identifiersAt(element);
+      if (met == wanted) break;
+      const Place place = placeOf(met);
+      if (*place.slot == kFree) note(element, place);
     }
-    return slots_[slot];
+    return element;
+  }
+
+  Place placeOf(const Identifiers& wanted) {
+    const std::uint32_t hash = tbdaily::KeyedHash::of(wanted.first, wanted.second);
+    const auto holds = [&](std::uint32_t slot) {
+      return ((slot ^ hash) & ~elementBits_) == 0 && identifiersAt(slot & elementBits_) == wanted;
+    };
+    std::size_t slot = hash & lastSlot_;
+    while (slots_[slot] != kFree && !holds(slots_[slot])) slot = (slot + 1) & lastSlot_;
+    return {&slots_[slot], hash & ~elementBits_};
+  }
+
+  static void note(std::size_t element, const Place& place) {
+    *place.slot = static_cast<std::uint32_t>(element) | place.hash;
   }
 
   std::span<const std::byte> buffer_;
-  End end_;
-  std::vector<bool> isFirst_;         // elements that begin the first channel with its identifiers
-  std::size_t next_ = 0;              // behind the channel that was found last
-  std::vector<std::uint32_t> slots_;  // open addressing, a power of two long, at most half full
+  std::size_t next_ = 0;  // how far searches went along the chain
+  End end_ = End::Exact;
+  // Open addressing, a power of two long, at most half full. A slot holds the number of a channel's first
+  // element, and in the bits that no number needs some of its hash: most other channels are told apart
+  // without a look at the buffer.
+  std::vector<std::uint32_t> slots_;
+  std::size_t lastSlot_;
+  std::uint32_t elementBits_;
 };
 
 // Fills copies of the subscribed channels from a buffer.
@@ -112,11 +136,14 @@ class Sampler {
   explicit Sampler(std::span<const std::byte> buffer) : buffer_(buffer) {}
 
   std::uint32_t operator()(ChannelRecord& copy) {
-    const auto found = buffer_.find(copy);
-    if (!found) return answerForMissing();
-    if (found->elements.empty()) return leaveOut();
-    if (KdReportChannelGetFormat(&copy) == kKdReportUnknownFormat) setChannelType(&copy, found->type);
-    copy.rawElements = memory_.copy(found->elements);
+    const std::size_t first = buffer_.find(copy);
+    if (first == SampleBuffer::kNone) return answerForMissing();
+    // Read once, then checked: the buffer may change meanwhile.
+    const ChannelType type = buffer_.typeAt(first);
+    const auto elements = buffer_.elementsAt(first, type.elementCount());
+    if (elements.empty()) return leaveOut();
+    if (copy.format() == kKdReportUnknownFormat) setChannelType(&copy, type);
+    memory_.copy(elements, copy);
     return kKdReportKeep;
   }
 
