@@ -3,7 +3,7 @@
 // objects is referred to.
 #pragma once
 
-#include <algorithm>
+#include <cstring>
 #include <memory>
 #include <vector>
 
@@ -17,9 +17,7 @@ template <typename Block>
 class KeptBlocks {
  public:
   void keep(Block& block) {
-    if (last_.get() == &block) return;
-    if (last_ != nullptr) earlier_.push_back(std::move(last_));
-    last_ = block.shared_from_this();
+    if (last_.get() != &block) keepAnother(block);
   }
 
   // Lets go of blocks. The predicate is asked in the order in which they came.
@@ -34,6 +32,8 @@ class KeptBlocks {
   }
 
  private:
+  void keepAnother(Block& block);
+
   std::shared_ptr<Block> last_;
   std::vector<std::shared_ptr<Block>> earlier_;
 };
@@ -88,16 +88,15 @@ class Blocks {
   // The block for the next object, which has room for it.
   template <typename... Of>
   Block& next(const Of&... of) {
-    if (block_ == nullptr || block_->objects.size() == block_->objects.capacity()) {
-      block_ = std::make_shared<Block>(of...);
-      size_ = std::clamp<std::size_t>(std::max(expected_, 2 * size_), 1, kMostInBlock);
-      block_->objects.reserve(size_);
-    }
+    if (block_ == nullptr || block_->objects.size() == block_->objects.capacity())
+      begin(std::make_shared<Block>(of...));
     return *block_;
   }
 
  private:
   static constexpr std::size_t kMostInBlock = 256;
+
+  void begin(std::shared_ptr<Block> block);
 
   std::size_t expected_ = 0, size_ = 0;
   std::shared_ptr<Block> block_;
@@ -140,22 +139,21 @@ class ElementBlocks {
  public:
   // Gives the record a copy of the bytes.
   void copy(std::span<const std::byte> bytes, ChannelRecord& record) {
-    if (block_ == nullptr || bytes.size() > size_ - used_) {
-      size_ = std::max(std::clamp(size_ * 2, kSmallestBlock, kLargestBlock), bytes.size());
-      block_ = std::make_shared<ElementBlock>(size_);
-      used_ = 0;
-    }
-    std::byte* place = block_->bytes.get() + used_;
-    used_ += bytes.size();
-    std::ranges::copy(bytes, place);
-    record.setElements(place, bytes.size(), *block_);
+    if (block_ == nullptr || bytes.size() > free_.size()) begin(bytes.size());
+    const auto place = free_.first(bytes.size());
+    free_ = free_.subspan(bytes.size());
+    std::memcpy(place.data(), bytes.data(), bytes.size());
+    record.setElements(place.data(), place.size(), *block_);
   }
 
  private:
   static constexpr std::size_t kSmallestBlock = 1024, kLargestBlock = 65536;
 
+  void begin(std::size_t atLeast);
+
   std::shared_ptr<ElementBlock> block_;
-  std::size_t size_ = 0, used_ = 0;
+  std::size_t size_ = 0;
+  std::span<std::byte> free_;  // what is left of the block
 };
 
 }  // namespace kdreport
