@@ -72,6 +72,7 @@ SubCollections::~SubCollections() = default;
 
 void SubCollections::reserve(std::size_t n) {
   entries_.reserve(n);
+  if (n > kMostSearched) places_.reserve(n);
 }
 
 std::size_t SubCollections::size() const {
