@@ -4,6 +4,7 @@
 
 #include "drivermetrics/channel_collection.h"
 #include "drivermetrics/channel_pairing.h"
+#include "drivermetrics/load_ahead.h"
 #include "drivermetrics/object_blocks.h"
 #include "drivermetrics/raw_elements.h"
 
@@ -106,6 +107,12 @@ std::uint32_t compareChannels(const Compare& mode, const ChannelList& channels, 
     const ChannelRecord* channel = channels[i];
     if (channel == nullptr) return kKdReportWalkFailed;
     ChannelRecord& copy = mode.records.add(*channel);
+    loadAhead(channel);
+    loadAhead(channel->elements().data(), kElementSize);
+    if (i < earlier.size() && earlier[i] != nullptr) {
+      loadAhead(earlier[i]);
+      loadAhead(earlier[i]->elements().data(), kElementSize);
+    }
     const auto [isReadable, partner] = pairing.partnerOf(*channel, i);
     if (!isReadable) return kKdReportWalkFailed;
     std::uint32_t answer = kKdReportKeep;

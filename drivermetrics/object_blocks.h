@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "drivermetrics/channel_record.h"
+#include "drivermetrics/load_ahead.h"
 
 namespace kdreport {
 
@@ -142,6 +143,7 @@ class ElementBlocks {
     if (block_ == nullptr || bytes.size() > free_.size()) begin(bytes.size());
     const auto place = free_.first(bytes.size());
     free_ = free_.subspan(bytes.size());
+    loadAhead(place.data(), bytes.size());
     std::memcpy(place.data(), bytes.data(), bytes.size());
     record.setElements(place.data(), place.size(), *block_);
   }
