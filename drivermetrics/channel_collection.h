@@ -48,12 +48,13 @@ class SubCollections {
   ~SubCollections();
 
   void reserve(std::size_t n);
-  // Null when there is no such entry, or it is no dictionary.
-  const ChannelCollection* find(std::string_view name) const;
-  // The entry of the name, made when it is absent; null when it is no dictionary.
+  // Null when there is none.
+  SubCollection* find(std::string_view name);
+  // Null when the entry of the name is no dictionary.
   ChannelCollection* findOrMake(std::string_view name);
-  // A new entry, empty and a dictionary.
-  SubCollection& add(std::string_view name);
+  // A new entry, empty and a dictionary. The name is another one's, or a new one.
+  SubCollection& add(std::shared_ptr<const std::string> name);
+  SubCollection& add(std::string_view name) { return add(std::make_shared<const std::string>(name)); }
   void removeEmpty();
 
   bool empty() const { return entries_.empty(); }
@@ -62,13 +63,8 @@ class SubCollections {
   const std::vector<SubCollection>& entries() const { return entries_; }
 
  private:
-  static constexpr std::size_t kMostSearched = 8;  // more entries have an index
-
-  const SubCollection* entryOf(std::string_view name) const;
-  void rebuildIndex();
-
   std::vector<SubCollection> entries_;
-  PlistDictionary places_;  // name to its place in entries_; empty while they are few
+  PlistDictionary places_;  // name to its place, of the first entries; goes on when a name is looked for
 };
 
 // A collection or one of its sub-collections: channels filed at this level, then per driver, then per group
@@ -90,7 +86,7 @@ struct SubCollection {
   ChannelCollection* get() { return isDictionary ? &collection : nullptr; }
   const ChannelCollection* get() const { return isDictionary ? &collection : nullptr; }
 
-  std::string name;
+  std::shared_ptr<const std::string> name;
   ChannelCollection collection;
   bool isDictionary = true;
 };

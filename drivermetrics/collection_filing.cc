@@ -1,6 +1,5 @@
 // Making collections and filing channels in them.
 
-#include <algorithm>
 #include <limits>
 
 #include "drivermetrics/channel_collection.h"
@@ -72,41 +71,27 @@ SubCollections::~SubCollections() = default;
 
 void SubCollections::reserve(std::size_t n) {
   entries_.reserve(n);
-  if (n > kMostSearched) places_.reserve(n);
 }
 
 std::size_t SubCollections::size() const {
   return entries_.size();
 }
 
-const SubCollection* SubCollections::entryOf(std::string_view name) const {
-  if (entries_.size() > kMostSearched) {
-    const auto place = places_.positionOf(name);
-    return place ? &entries_[*place] : nullptr;
-  }
-  const auto found = std::ranges::find(entries_, name, &SubCollection::name);
-  return found != entries_.end() ? &*found : nullptr;
-}
-
-const ChannelCollection* SubCollections::find(std::string_view name) const {
-  const SubCollection* entry = entryOf(name);
-  return entry != nullptr ? entry->get() : nullptr;
+SubCollection* SubCollections::find(std::string_view name) {
+  while (places_.size() < entries_.size())
+    places_.set(*entries_[places_.size()].name, PlistValue::boolean(true));
+  const auto place = places_.positionOf(name);
+  return place ? &entries_[*place] : nullptr;
 }
 
 ChannelCollection* SubCollections::findOrMake(std::string_view name) {
-  const SubCollection* entry = entryOf(name);
-  return entry != nullptr ? entries_[static_cast<std::size_t>(entry - entries_.data())].get()
-                          : add(name).get();
+  SubCollection* entry = find(name);
+  return entry != nullptr ? entry->get() : add(name).get();
 }
 
-SubCollection& SubCollections::add(std::string_view name) {
+SubCollection& SubCollections::add(std::shared_ptr<const std::string> name) {
   SubCollection& entry = entries_.emplace_back();
-  entry.name = name;
-  if (entries_.size() == kMostSearched + 1) {
-    rebuildIndex();
-  } else if (entries_.size() > kMostSearched) {
-    places_.set(name, PlistValue::boolean(true));
-  }
+  entry.name = std::move(name);
   return entry;
 }
 
@@ -114,13 +99,7 @@ void SubCollections::removeEmpty() {
   const auto isEmpty = [](const SubCollection& entry) {
     return entry.isDictionary && entry.collection.empty();
   };
-  if (std::erase_if(entries_, isEmpty) != 0) rebuildIndex();
-}
-
-void SubCollections::rebuildIndex() {
-  places_ = {};
-  if (entries_.size() <= kMostSearched) return;
-  for (const SubCollection& entry : entries_) places_.set(entry.name, PlistValue::boolean(true));
+  if (std::erase_if(entries_, isEmpty) != 0) places_ = {};
 }
 
 KdReportCollection KdReportCreateAggregate(std::uint32_t options) {

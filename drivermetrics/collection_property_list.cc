@@ -72,7 +72,7 @@ PlistValue plistOfCollection(const ChannelCollection& collection);
 PlistValue plistOf(const SubCollections& nested) {
   PlistDictionary entries;
   for (const SubCollection& entry : nested.entries())
-    entries.set(entry.name, entry.isDictionary ? plistOfCollection(entry.collection) : malformed());
+    entries.set(*entry.name, entry.isDictionary ? plistOfCollection(entry.collection) : malformed());
   return PlistValue::dictionary(std::move(entries));
 }
 

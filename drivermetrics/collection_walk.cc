@@ -152,6 +152,29 @@ std::uint32_t walkChannels(const Mode& mode, Walked<Mode, ChannelCollection>& co
   }
 }
 
+// Finds the sub-collections of the same names in another collection, quickest for those at the same places.
+class NamePairing {
+ public:
+  // Null: there are none.
+  explicit NamePairing(const SubCollections* other) : other_(other) {}
+
+  // Null when there is no such dictionary.
+  const ChannelCollection* partnerOf(const std::string& name, std::size_t index) {
+    if (other_ == nullptr) return nullptr;
+    const auto& entries = other_->entries();
+    if (index < entries.size() && *entries[index].name == name) return entries[index].get();
+    if (places_.empty()) {
+      for (const SubCollection& entry : entries) places_.set(*entry.name, PlistValue::boolean(true));
+    }
+    const auto place = places_.positionOf(name);
+    return place ? entries[*place].get() : nullptr;
+  }
+
+ private:
+  const SubCollections* other_;
+  PlistDictionary places_;  // made at the first search
+};
+
 // The sub-collections under one key. The first odd status is the walk's, and ends it; pruning still goes
 // through the others.
 template <typename Mode>
@@ -164,8 +187,10 @@ std::uint32_t walkNested(const Mode& mode, Walked<Mode, CollectionField<SubColle
   SubCollections* copies = kCopies<Mode> ? &results->make() : nullptr;
   if constexpr (kCopies<Mode>) copies->reserve(nested.get()->size());
   std::uint32_t status = 0;
-  for (auto& entry : nested.get()->entries()) {
-    const ChannelCollection* other = kCompares<Mode> ? otherNested->get()->find(entry.name) : nullptr;
+  NamePairing pairing(kCompares<Mode> ? otherNested->get() : nullptr);
+  for (std::size_t i = 0; i < nested.get()->size(); ++i) {
+    auto& entry = nested.get()->entries()[i];
+    const ChannelCollection* other = pairing.partnerOf(*entry.name, i);
     ChannelCollection* copy = kCopies<Mode> ? copies->add(entry.name).get() : nullptr;
     const std::uint32_t answer = walk(mode, entry.get(), other, copy);
     if (!isOdd(status)) status = isOdd(answer) ? answer : status | answer;

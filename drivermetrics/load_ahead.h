@@ -10,7 +10,8 @@ namespace kdreport {
 // there: then nothing happens.
 inline void loadAhead(const void* object, std::size_t size) {
   constexpr std::size_t kPlaces = 8;
-  __builtin_prefetch(reinterpret_cast<const void*>(reinterpret_cast<std::uintptr_t>(object) + kPlaces * size));
+  __builtin_prefetch(
+      reinterpret_cast<const void*>(reinterpret_cast<std::uintptr_t>(object) + kPlaces * size));
 }
 template <typename T>
 void loadAhead(const T* object) {
