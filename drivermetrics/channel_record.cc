@@ -39,6 +39,12 @@ bool ChannelSource::hasTypeNumber() const {
 SourceBlock::SourceBlock(std::shared_ptr<const LegendGroup> of)
     : group(std::move(of)), driverID(integerOrInvalid(group->driverID)) {}
 
+void ChannelRecord::takeOver(const ChannelRecord& other) {
+  ElementBlock* holder = other.block->elements.find(
+      [&other](const ElementBlock& candidate) { return candidate.holds(other.elements_); });
+  if (holder != nullptr) setElements(other.elements_, other.elementsSize_, *holder);
+}
+
 void ChannelRecord::copyElements(std::span<const std::byte> bytes) {
   const auto alone = std::make_shared<ElementBlock>(bytes.size());
   std::ranges::copy(bytes, alone->bytes.get());

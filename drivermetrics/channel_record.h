@@ -125,10 +125,12 @@ class ChannelRecord {
     return type ? type->format() : std::uint8_t{kKdReportUnknownFormat};
   }
   // Of samples only. Those that share them change with each other.
-  bool hasElements() const { return elementBlock_ != nullptr; }
+  bool hasElements() const { return elements_ != nullptr; }
   std::span<std::byte> elements() const { return {elements_, elementsSize_}; }
   // Refers to the same bytes as another record, if that has some.
-  void shareElements(const ChannelRecord& other);
+  void shareElements(const ChannelRecord& other) {
+    if (other.hasElements()) takeOver(other);
+  }
   // Refers to bytes of the block.
   void setElements(std::byte* bytes, std::size_t size, ElementBlock& in);
   // Refers to a copy of the bytes.
@@ -140,8 +142,9 @@ class ChannelRecord {
   RecordBlock* block;     // where it lies
 
  private:
-  ElementBlock* elementBlock_ = nullptr;  // where they lie; none: no elements
-  std::byte* elements_ = nullptr;
+  void takeOver(const ChannelRecord& other);
+
+  std::byte* elements_ = nullptr;  // in a block that this record's block keeps; none: no elements
   std::size_t elementsSize_ = 0;
 };
 

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstring>
+#include <functional>
 #include <memory>
 #include <vector>
 
@@ -19,6 +20,16 @@ class KeptBlocks {
  public:
   void keep(Block& block) {
     if (last_.get() != &block) keepAnother(block);
+  }
+
+  // The block of which the predicate holds; null when there is none.
+  template <typename Predicate>
+  Block* find(const Predicate& isWanted) const {
+    if (last_ != nullptr && isWanted(*last_)) return last_.get();
+    for (const std::shared_ptr<Block>& block : earlier_) {
+      if (isWanted(*block)) return block.get();
+    }
+    return nullptr;
   }
 
   // Lets go of blocks. The predicate is asked in the order in which they came.
@@ -41,9 +52,15 @@ class KeptBlocks {
 
 // Elements of channels.
 struct ElementBlock : std::enable_shared_from_this<ElementBlock> {
-  explicit ElementBlock(std::size_t size) : bytes(std::make_unique_for_overwrite<std::byte[]>(size)) {}
+  explicit ElementBlock(std::size_t of) : bytes(std::make_unique_for_overwrite<std::byte[]>(of)), size(of) {}
+
+  // Empty elements may begin at the end of a block.
+  bool holds(const std::byte* place) const {
+    return !std::less<>()(place, bytes.get()) && !std::less<>()(bytes.get() + size, place);
+  }
 
   std::unique_ptr<std::byte[]> bytes;
+  std::size_t size;
 };
 
 // Records, with what they refer to and what is cached of them.
@@ -69,13 +86,8 @@ class RecordBlock : public std::enable_shared_from_this<RecordBlock> {
 
 inline void ChannelRecord::setElements(std::byte* bytes, std::size_t size, ElementBlock& in) {
   block->elements.keep(in);
-  elementBlock_ = &in;
   elements_ = bytes;
   elementsSize_ = size;
-}
-
-inline void ChannelRecord::shareElements(const ChannelRecord& other) {
-  if (other.hasElements()) setElements(other.elements_, other.elementsSize_, *other.elementBlock_);
 }
 
 // Makes blocks one after the other as objects are added to them, each larger than the one before.
