@@ -5,6 +5,8 @@
 #include <malloc.h>
 
 #include <algorithm>
+#include <optional>
+#include <vector>
 
 #include "drivermetrics/kd_report_test_support.h"
 
@@ -49,6 +51,18 @@ PlistData bufferOf(std::int64_t count) {
   return bytes;
 }
 
+// Whether these are samples of that many channels, each with the value that it should have.
+template <typename ValueOf>
+bool holds(const KdReportCollection& samples, std::int64_t count, const ValueOf& valueOf) {
+  std::int64_t right = 0;
+  KdReportIterate(samples.get(), [&](ChannelRecord& channel) -> std::uint32_t {
+    const std::int64_t expected = valueOf(KdReportChannelGetChannelID(&channel));
+    if (KdReportSimpleGetIntegerValue(&channel) == expected) ++right;
+    return kKdReportKeep;
+  });
+  return right == count && KdReportGetChannelCount(samples.get()) == count;
+}
+
 void countChannels(benchmark::State& state) {
   state.counters["per channel"] =
       benchmark::Counter(static_cast<double>(state.range(0)),
@@ -68,6 +82,8 @@ BENCHMARK(BM_PlainCopyOfTheBuffer)->ArgsProduct({kCounts});
 void BM_Sampling(benchmark::State& state) {
   const KdReportCollection channels = channelsOf(state.range(0));
   const PlistData buffer = bufferOf(state.range(0));
+  if (!holds(KdReportCreateSamplesRaw(channels.get(), buffer), state.range(0), [](auto id) { return id; }))
+    state.SkipWithError("the samples do not hold what the buffer holds");
   for (auto _ : state) benchmark::DoNotOptimize(KdReportCreateSamplesRaw(channels.get(), buffer));
   countChannels(state);
 }
@@ -78,6 +94,8 @@ void BM_Delta(benchmark::State& state) {
   const PlistData buffer = bufferOf(state.range(0));
   const KdReportCollection before = KdReportCreateSamplesRaw(channels.get(), buffer);
   const KdReportCollection after = KdReportCreateSamplesRaw(channels.get(), buffer);
+  if (!holds(KdReportCreateSamplesDelta(before.get(), after.get()), state.range(0), [](auto) { return 0; }))
+    state.SkipWithError("the difference of equal samples is not 0 for each channel");
   for (auto _ : state) benchmark::DoNotOptimize(KdReportCreateSamplesDelta(before.get(), after.get()));
   countChannels(state);
 }

@@ -87,6 +87,8 @@ std::uint32_t cloneChannels(const Clone& mode, const ChannelList& channels, Chan
   copies.reserve(channels.size());
   for (const ChannelRecord* channel : channels) {
     if (channel == nullptr) return kKdReportWalkFailed;
+    loadAhead(channel);
+    loadAhead(channel->source);
     ChannelRecord& copy = mode.records.add(*channel);
     copy.shareElements(*channel);
     const std::uint32_t answer = mode.visitor(*channel, copy);

@@ -102,6 +102,35 @@ TEST(CollectionWalk, VisitsClonesAndPrunesLikeAList) {
   }
 }
 
+TEST(CollectionWalk, KeepsAliveWhatItsChannelsReferTo) {
+  const ChannelType type = channelType(kKdReportSimple);
+  std::vector<KdReportChannel> channels;
+  PlistData buffer;
+  for (std::int64_t i = 0; i < 600; ++i) {  // several blocks
+    channels.push_back(channelOf(1 + i % 3, i, type));
+    testing::appendElement(buffer, 1 + i % 3, i, type, {.words = {i}});
+  }
+  KdReportCollection copy;
+  {
+    const KdReportCollection samples = KdReportCreateSamplesRaw(collectionOf(channels).get(), buffer);
+    (void)KdReportChannelGetChannelName(channelsIn(samples.get())[0x41]);
+    copy = cloneAggregate(samples.get(), [](const ChannelRecord&, ChannelRecord&) { return 0U; });
+  }
+  channels.clear();
+  EXPECT_EQ(KdReportPrune(copy.get(),
+                          [](ChannelRecord& channel) -> std::uint32_t {
+                            const std::int64_t id = KdReportChannelGetChannelID(&channel);
+                            return id == 0x41 || id == 599 ? kKdReportKeep : kKdReportRemove;
+                          }),
+            kKdReportRemove);
+  const KdReportChannel first = KdReportRetainChannel(*channelsIn(copy.get())[0]);
+  EXPECT_EQ(KdReportSimpleGetIntegerValue(channelsIn(copy.get())[1]), 599);
+  copy = nullptr;
+  EXPECT_EQ(KdReportSimpleGetIntegerValue(first.get()), 0x41);
+  EXPECT_EQ(KdReportChannelGetChannelName(first.get()), "A");
+  EXPECT_EQ(KdReportChannelGetDriverName(first.get()), "D3");
+}
+
 TEST(CollectionWalk, TakesNothingFromTheHeapForAChannel) {
   RandomChannels random;
   const KdReportCollection filed = collectionOf(random.make(100), 3);

@@ -5,13 +5,16 @@
 #include <vector>
 
 #include "drivermetrics/raw_elements.h"
-#include "platform/keyed_hash.h"
 
 namespace kdreport {
 
 // The channels of a sample buffer, found by their identifiers. The buffer is a chain: each channel's first
 // element says how many it has, and the next channel begins behind them. The first channel with given
-// identifiers counts. Quickest for channels in the order of the buffer.
+// identifiers counts.
+//
+// Quickest where channels are asked for in the order of the buffer and their identifiers rise: what rises
+// does not repeat, so the next channel of the chain is the first with its identifiers. From the first channel
+// on of which that does not hold, a table says where the first one is.
 class SampleBuffer {
  public:
   // How the chain ends.
@@ -25,16 +28,16 @@ class SampleBuffer {
   explicit SampleBuffer(std::span<const std::byte> buffer);
 
   // The channel's first element; kNone when the chain ends before such a channel. Goes along the chain no
-  // farther than to it, and notes the channels that it passes.
+  // farther than to it.
   std::size_t find(const ChannelRecord& channel) {
     const Identifiers wanted{static_cast<std::uint64_t>(channel.driverID()),
                              static_cast<std::uint64_t>(channel.channelID())};
-    const Place place = placeOf(wanted);
-    if (*place.slot != kFree) return *place.slot & elementBits_;
-    const std::size_t element = step();
-    if (element == kNone || identifiersAt(element) != wanted) return searchFrom(element, wanted);
-    note(element, place);
-    return element;
+    const std::size_t next = next_;
+    if (!slots_.empty() || next >= elements() || identifiersAt(next) != wanted ||
+        (next != 0 && wanted <= last_) || step() == kNone)
+      return search(wanted);
+    last_ = wanted;
+    return next;
   }
   ChannelType typeAt(std::size_t element) const { return {fieldAt(element, element_offset::kType)}; }
   // So many elements; none when they run over the end.
@@ -48,13 +51,6 @@ class SampleBuffer {
  private:
   using Identifiers = std::pair<std::uint64_t, std::uint64_t>;  // driver, channel
 
-  // Where a channel belongs in the table: the slot that holds it or is free for it, and what the slot says of
-  // the channel's hash.
-  struct Place {
-    std::uint32_t* slot;
-    std::uint32_t hash;
-  };
-
   static constexpr std::uint32_t kFree = kNone;
 
   // The first element of the next channel of the chain; kNone at its end.
@@ -66,21 +62,14 @@ class SampleBuffer {
     return element;
   }
   std::size_t endAt(std::size_t element);
-  // Goes on from a channel until one is wanted.
-  std::size_t searchFrom(std::size_t element, const Identifiers& wanted);
 
-  Place placeOf(const Identifiers& wanted) {
-    const std::uint32_t hash = tbdaily::KeyedHash::of(wanted.first, wanted.second);
-    const auto holds = [&](std::uint32_t slot) {
-      return ((slot ^ hash) & ~elementBits_) == 0 && identifiersAt(slot & elementBits_) == wanted;
-    };
-    std::size_t slot = hash & lastSlot_;
-    while (slots_[slot] != kFree && !holds(slots_[slot])) slot = (slot + 1) & lastSlot_;
-    return {&slots_[slot], hash & ~elementBits_};
-  }
-  static void note(std::size_t element, const Place& place) {
-    *place.slot = static_cast<std::uint32_t>(element) | place.hash;
-  }
+  // In the table, and from where it ends on along the chain.
+  std::size_t search(const Identifiers& wanted);
+  void makeTable();
+  // Puts the channel into the table unless it has one with these identifiers.
+  void note(const Identifiers& met, std::size_t element);
+  // The slot that holds the channel's first element, or the free one where it belongs.
+  std::uint32_t& slotOf(const Identifiers& wanted, std::uint32_t hash);
 
   std::size_t elements() const { return buffer_.size() / kElementSize; }
   std::uint64_t fieldAt(std::size_t element, std::size_t offset) const {
@@ -93,12 +82,13 @@ class SampleBuffer {
   std::span<const std::byte> buffer_;
   std::size_t next_ = 0;  // how far searches went along the chain
   End end_ = End::Exact;
-  // Open addressing, a power of two long, at most half full. A slot holds the number of a channel's first
-  // element, and in the bits that no number needs some of its hash: most other channels are told apart
-  // without a look at the buffer.
+  Identifiers last_;  // of the channel before, while they rise
+
+  // Open addressing, a power of two long, at most half full; empty until it is needed. A slot holds the
+  // number of a channel's first element, and in the bits that no number needs some of its hash: most other
+  // channels are told apart without a look at the buffer.
   std::vector<std::uint32_t> slots_;
-  std::size_t lastSlot_;
-  std::uint32_t elementBits_;
+  std::uint32_t elementBits_ = 0;
 };
 
 }  // namespace kdreport

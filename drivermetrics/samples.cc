@@ -22,6 +22,7 @@ class Sampler {
     const ChannelType type = buffer_.typeAt(first);
     const auto elements = buffer_.elementsAt(first, type.elementCount());
     if (elements.empty()) return leaveOut();
+    loadAhead(elements.data(), elements.size());
     if (copy.format() == kKdReportUnknownFormat) setChannelType(&copy, type);
     memory_.copy(elements, copy);
     return kKdReportKeep;
