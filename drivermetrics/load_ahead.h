@@ -1,6 +1,7 @@
 // Asking for memory before it is read.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 
 namespace kdreport {
@@ -10,8 +11,9 @@ namespace kdreport {
 // there: then nothing happens.
 inline void loadAhead(const void* object, std::size_t size) {
   constexpr std::size_t kPlaces = 8;
-  __builtin_prefetch(
-      reinterpret_cast<const void*>(reinterpret_cast<std::uintptr_t>(object) + kPlaces * size));
+  const std::uintptr_t place = reinterpret_cast<std::uintptr_t>(object) + kPlaces * size;
+  // NOLINTNEXTLINE(performance-no-int-to-ptr): computed as a pointer it would have to point to an object
+  __builtin_prefetch(reinterpret_cast<const void*>(place));
 }
 template <typename T>
 void loadAhead(const T* object) {
