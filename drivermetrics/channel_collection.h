@@ -4,7 +4,7 @@
 #include <utility>
 #include <vector>
 
-#include "drivermetrics/channel_record.h"
+#include "drivermetrics/channel_list.h"
 
 namespace kdreport {
 
@@ -36,39 +36,59 @@ class CollectionField {
   bool isForeign_ = false;
 };
 
-// Names to sub-collections, in the order in which they were first filed. A null one is an entry that is no
-// dictionary.
+struct SubCollection;
+
+// Names to sub-collections, in the order in which they were first filed. What is handed out stays until
+// another one is added or some are removed.
 class SubCollections {
  public:
-  using Entry = std::pair<std::string, KdReportCollection>;
+  SubCollections();
+  SubCollections(SubCollections&&) noexcept;
+  SubCollections& operator=(SubCollections&&) noexcept;
+  ~SubCollections();
 
-  ChannelCollection* find(std::string_view name) const;
-  // The entry of the name, made when it is absent; null when it is no dictionary.
+  void reserve(std::size_t n);
+  // Null when there is none.
+  SubCollection* find(std::string_view name);
+  // Null when the entry of the name is no dictionary.
   ChannelCollection* findOrMake(std::string_view name);
-  void add(std::string_view name, KdReportCollection collection);
+  // A new entry, empty and a dictionary. The name is another one's, or a new one.
+  SubCollection& add(std::shared_ptr<const std::string> name);
+  SubCollection& add(std::string_view name) { return add(std::make_shared<const std::string>(name)); }
   void removeEmpty();
 
   bool empty() const { return entries_.empty(); }
-  std::vector<Entry>::const_iterator begin() const { return entries_.begin(); }
-  std::vector<Entry>::const_iterator end() const { return entries_.end(); }
+  std::size_t size() const;
+  std::vector<SubCollection>& entries() { return entries_; }
+  const std::vector<SubCollection>& entries() const { return entries_; }
 
  private:
-  std::vector<Entry> entries_;
-  PlistDictionary places_;  // name to its place in entries_
+  std::vector<SubCollection> entries_;
+  PlistDictionary places_;  // name to its place, of the first entries; goes on when a name is looked for
 };
 
 // A collection or one of its sub-collections: channels filed at this level, then per driver, then per group
 // (and below a group per subgroup).
 class ChannelCollection {
  public:
-  PlistValue queryOptions;                                 // number, 32-bit; of the outermost level only
-  CollectionField<std::vector<KdReportChannel>> channels;  // a null one is an element that is no dictionary
+  PlistValue queryOptions;                // number, 32-bit; of the outermost level only
+  CollectionField<ChannelList> channels;  // a null one is an element that is no dictionary
   CollectionField<SubCollections> drivers, channelGroups;
 
   // Without any key, the options included.
   bool empty() const {
     return queryOptions.isNone() && channels.isAbsent() && drivers.isAbsent() && channelGroups.isAbsent();
   }
+};
+
+struct SubCollection {
+  // Null when the entry is no dictionary.
+  ChannelCollection* get() { return isDictionary ? &collection : nullptr; }
+  const ChannelCollection* get() const { return isDictionary ? &collection : nullptr; }
+
+  std::shared_ptr<const std::string> name;
+  ChannelCollection collection;
+  bool isDictionary = true;
 };
 
 // The options of the collection; 0 when it has none.

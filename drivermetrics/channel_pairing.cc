@@ -4,18 +4,12 @@
 
 namespace kdreport {
 
-std::optional<ChannelPairing::Identity> ChannelPairing::identityOf(const ChannelRecord* channel) {
-  ChannelType type;
-  if (getChannelType(channel, type) != kKdSuccess) return std::nullopt;
-  return Identity{KdReportChannelGetDriverID(channel), KdReportChannelGetChannelID(channel), type.bits};
-}
-
 ChannelPairing::Result ChannelPairing::partnerOf(const ChannelRecord& channel, std::size_t index) {
   if (index >= earlier_.size()) return {};
   const auto wanted = identityOf(&channel);
-  const auto candidate = identityOf(earlier_[index].get());
+  const auto candidate = identityOf(earlier_[index]);
   if (!wanted || !candidate) return {.isReadable = false};
-  if (candidate == wanted) return {.partner = earlier_[index].get()};
+  if (candidate == wanted) return {.partner = earlier_[index]};
   if (!resume_) resume_ = index + 1;
   return search(*wanted);
 }
@@ -29,7 +23,7 @@ ChannelPairing::Result ChannelPairing::search(const Identity& wanted) {
   if (odd != unreadable_.end() && *odd < hit) return {.isReadable = false};
   if (hit == earlier_.size()) return {};
   resume_ = hit + 1;
-  return {.partner = earlier_[hit].get()};
+  return {.partner = earlier_[hit]};
 }
 
 void ChannelPairing::buildIndex() {
@@ -37,7 +31,7 @@ void ChannelPairing::buildIndex() {
   isIndexed_ = true;
   places_.reserve(earlier_.size());
   for (std::size_t i = 0; i < earlier_.size(); ++i) {
-    if (const auto identity = identityOf(earlier_[i].get())) {
+    if (const auto identity = identityOf(earlier_[i])) {
       places_.emplace_back(*identity, i);
     } else {
       unreadable_.push_back(i);

@@ -5,7 +5,7 @@
 #include <utility>
 #include <vector>
 
-#include "drivermetrics/channel_record.h"
+#include "drivermetrics/channel_list.h"
 
 namespace kdreport {
 
@@ -16,7 +16,7 @@ namespace kdreport {
 class ChannelPairing {
  public:
   // Borrows the earlier array.
-  explicit ChannelPairing(const std::vector<KdReportChannel>& earlier) : earlier_(earlier) {}
+  explicit ChannelPairing(const ChannelList& earlier) : earlier_(earlier) {}
 
   struct Result {
     bool isReadable = true;  // false: a channel that was looked at has no readable type
@@ -28,11 +28,15 @@ class ChannelPairing {
   using Identity = std::tuple<std::int64_t, std::int64_t, std::uint64_t>;  // driver, channel, type
   using Place = std::pair<Identity, std::size_t>;                          // and its index
 
-  static std::optional<Identity> identityOf(const ChannelRecord* channel);
+  static std::optional<Identity> identityOf(const ChannelRecord* channel) {
+    const auto type = channel != nullptr ? channel->source->type() : std::nullopt;
+    if (!type) return std::nullopt;
+    return Identity{channel->driverID(), channel->channelID(), type->bits};
+  }
   Result search(const Identity& wanted);
   void buildIndex();
 
-  const std::vector<KdReportChannel>& earlier_;
+  const ChannelList& earlier_;
   std::optional<std::size_t> resume_;    // none before the first search
   bool isIndexed_ = false;               // the index is built at the first search
   std::vector<Place> places_;            // sorted

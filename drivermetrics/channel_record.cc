@@ -28,9 +28,27 @@ std::int64_t integerOrInvalid(const PlistValue& value) {
   return number ? number->toInt64() : kKdReportInvalid;
 }
 
-ElementData::ElementData(std::span<const std::byte> bytes)
-    : bytes_(std::make_shared_for_overwrite<std::byte[]>(bytes.size())), size_(bytes.size()) {
-  std::ranges::copy(bytes, bytes_.get());
+const std::optional<LegendEntry>& ChannelSource::legendChannel() const {
+  return block->entries[static_cast<std::size_t>(this - block->objects.data())];
+}
+
+bool ChannelSource::hasTypeNumber() const {
+  return legendChannel() && legendChannel()->channelType.asNumber();
+}
+
+SourceBlock::SourceBlock(std::shared_ptr<const LegendGroup> of)
+    : group(std::move(of)), driverID(integerOrInvalid(group->driverID)) {}
+
+void ChannelRecord::takeOver(const ChannelRecord& other) {
+  ElementBlock* holder = other.block->elements.find(
+      [&other](const ElementBlock& candidate) { return candidate.holds(other.elements_); });
+  if (holder != nullptr) setElements(other.elements_, other.elementsSize_, *holder);
+}
+
+void ChannelRecord::copyElements(std::span<const std::byte> bytes) {
+  const auto alone = std::make_shared<ElementBlock>(bytes.size());
+  std::ranges::copy(bytes, alone->bytes.get());
+  setElements(alone->bytes.get(), bytes.size(), *alone);
 }
 
 struct AnswerCache::Kept {
@@ -72,6 +90,30 @@ const PlistValue& AnswerCache::keep(CachedAnswer answer, PlistValue value) {
   return find(answer);
 }
 
+AnswerCache* RecordBlock::answersOf(const ChannelRecord& record) const {
+  AnswerCache* all = answers_.load(std::memory_order_acquire);
+  return all != nullptr ? all + (&record - objects.data()) : nullptr;
+}
+
+AnswerCache& RecordBlock::makeAnswersOf(const ChannelRecord& record) {
+  if (answersOf(record) == nullptr) {
+    auto made = std::make_unique<AnswerCache[]>(objects.capacity());
+    AnswerCache* none = nullptr;
+    if (answers_.compare_exchange_strong(none, made.get(), std::memory_order_acq_rel)) (void)made.release();
+  }
+  return *answersOf(record);
+}
+
+const PlistValue& ChannelRecord::cached(CachedAnswer answer) const {
+  static const PlistValue none;
+  const AnswerCache* answers = block->answersOf(*this);
+  return answers != nullptr ? answers->find(answer) : none;
+}
+
+const PlistValue& ChannelRecord::cache(CachedAnswer answer, PlistValue value) const {
+  return value.isNone() ? cached(answer) : block->makeAnswersOf(*this).keep(answer, std::move(value));
+}
+
 std::optional<LegendEntry> legendEntryOf(const PlistValue& value) {
   const PlistArray* places = value.asArray();
   if (places == nullptr) return std::nullopt;
@@ -80,22 +122,20 @@ std::optional<LegendEntry> legendEntryOf(const PlistValue& value) {
 }
 
 PlistValue legendType(const ChannelSource& source) {
-  if (!source.legendChannel) return {};
+  if (!source.legendChannel()) return {};
   const auto found = source.foundType.get();
-  return found ? PlistValue::int64(*found) : source.legendChannel->channelType;
+  return found ? PlistValue::int64(*found) : source.legendChannel()->channelType;
 }
 
 KdStatus getChannelType(const ChannelRecord* channel, ChannelType& type) {
-  if (channel == nullptr || !channel->source->legendChannel) return kKdError;
-  const auto found = channel->source->foundType.get();
-  const auto number = channel->source->legendChannel->channelType.asNumber();
-  if (!found && !number) return kKdError;
-  type.bits = static_cast<std::uint64_t>(found ? *found : number->toInt64());
+  const auto known = channel != nullptr ? channel->source->type() : std::nullopt;
+  if (!known) return kKdError;
+  type = *known;
   return kKdSuccess;
 }
 
 KdStatus setChannelType(ChannelRecord* channel, ChannelType type) {
-  if (channel == nullptr || !channel->source->legendChannel) return kKdError;
+  if (channel == nullptr || !channel->source->legendChannel()) return kKdError;
   channel->source->foundType.set(static_cast<std::int64_t>(type.bits));
   return kKdSuccess;
 }
@@ -123,17 +163,15 @@ KdReportChannel KdReportRetainChannel(ChannelRecord& channel) {
 }
 
 std::int64_t KdReportChannelGetDriverID(const ChannelRecord* channel) {
-  return channel != nullptr ? integerOrInvalid(channel->group().driverID) : kKdReportInvalid;
+  return channel != nullptr ? channel->driverID() : kKdReportInvalid;
 }
 
 std::int64_t KdReportChannelGetChannelID(const ChannelRecord* channel) {
-  if (channel == nullptr || !channel->source->legendChannel) return kKdReportInvalid;
-  return integerOrInvalid(channel->source->legendChannel->channelID);
+  return channel != nullptr ? channel->channelID() : kKdReportInvalid;
 }
 
 std::uint8_t KdReportChannelGetFormat(const ChannelRecord* channel) {
-  ChannelType type;
-  return getChannelType(channel, type) == kKdSuccess ? type.format() : std::uint8_t{kKdReportUnknownFormat};
+  return channel != nullptr ? channel->format() : std::uint8_t{kKdReportUnknownFormat};
 }
 
 std::uint16_t KdReportChannelGetCategories(const ChannelRecord* channel) {
@@ -166,7 +204,7 @@ std::optional<std::string_view> KdReportChannelGetChannelName(const ChannelRecor
   if (channel == nullptr) return std::nullopt;
   const PlistValue& cached = channel->cached(CachedAnswer::ChannelName);
   if (!cached.isNone()) return cached.asString();
-  const auto& entry = channel->source->legendChannel;
+  const auto& entry = channel->source->legendChannel();
   PlistValue name = entry ? entry->channelName : PlistValue();
   if (!name.asString()) {
     const auto text = _copyPrintableIDString(KdReportChannelGetChannelID(channel));

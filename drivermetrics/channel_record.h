@@ -3,6 +3,7 @@
 
 #include <atomic>
 #include <utility>
+#include <vector>
 
 #include "drivermetrics/kd_report.h"
 
@@ -40,12 +41,39 @@ class FoundType {
   std::atomic<std::int64_t> number_ = kKdReportInvalid;
 };
 
+struct SourceBlock;
+class RecordBlock;
+struct ElementBlock;
+
 // What a driver says of a channel. Every record that was copied from another refers to the same, so that a
-// type that is found out shows in all of them.
+// type that is found out shows in all of them. It holds the numbers alone, which are what is read of many
+// thousand channels in a row; the entry that they come from lies apart.
 struct ChannelSource {
-  std::shared_ptr<const LegendGroup> group;  // never null
-  std::optional<LegendEntry> legendChannel;  // none when it is missing or no array
-  FoundType foundType;                       // in place of the entry's
+  // None when it is missing or no array.
+  const std::optional<LegendEntry>& legendChannel() const;
+  // The type as it was found out, else the entry's. None without an entry, or when its type is no number.
+  std::optional<ChannelType> type() const {
+    const std::int64_t number = foundType.get().value_or(legendType);
+    if (number == kKdReportInvalid && !hasTypeNumber()) return std::nullopt;
+    return ChannelType{static_cast<std::uint64_t>(number)};
+  }
+
+  SourceBlock* block;                  // where it lies
+  std::int64_t channelID, legendType;  // the entry's, as integerOrInvalid reads them
+  FoundType foundType;
+
+ private:
+  bool hasTypeNumber() const;
+};
+
+// Sources of one legend group.
+struct SourceBlock : std::enable_shared_from_this<SourceBlock> {
+  explicit SourceBlock(std::shared_ptr<const LegendGroup> of);
+
+  std::shared_ptr<const LegendGroup> group;         // never null
+  std::int64_t driverID;                            // the group's, as integerOrInvalid reads it
+  std::vector<ChannelSource> objects;               // never grows beyond what it reserved: its objects stay
+  std::vector<std::optional<LegendEntry>> entries;  // of the source at the same place
 };
 
 // Answers that cost something, kept once they were asked for.
@@ -62,10 +90,12 @@ enum class CachedAnswer : std::uint8_t {
 class AnswerCache {
  public:
   AnswerCache() = default;
-  AnswerCache(const AnswerCache& other) : last_(retained(other.last_.load(std::memory_order_acquire))) {}
+  AnswerCache(const AnswerCache&) = delete;
   AnswerCache& operator=(const AnswerCache&) = delete;
   ~AnswerCache() { release(last_.load(std::memory_order_acquire)); }
 
+  // Takes over what another has; for one that is empty and that nobody else knows.
+  void share(const AnswerCache& other) { last_ = retained(other.last_.load(std::memory_order_acquire)); }
   // None when there is none. Borrowed.
   const PlistValue& find(CachedAnswer answer) const;
   // The answer that counts. A none value keeps nothing.
@@ -79,48 +109,43 @@ class AnswerCache {
   std::atomic<const Kept*> last_ = nullptr;  // a list from the last answer to the first
 };
 
-// The bytes of a sampled channel's elements. Copies refer to the same bytes.
-class ElementData {
- public:
-  ElementData() = default;
-  // A copy of the bytes.
-  explicit ElementData(std::span<const std::byte> bytes);
-  // Bytes in memory that is shared with those of other channels.
-  ElementData(std::shared_ptr<std::byte[]> bytes, std::size_t size) : bytes_(std::move(bytes)), size_(size) {}
-
-  explicit operator bool() const { return bytes_ != nullptr; }
-  std::span<std::byte> bytes() const { return {bytes_.get(), size_}; }
-
- private:
-  std::shared_ptr<std::byte[]> bytes_;  // none: no data
-  std::size_t size_ = 0;
-};
-
-template <typename T>
-struct ObjectBlock;
-
 // A record is a dictionary with a fixed set of keys, held in members; an absent value is an absent key.
-// Values that come from outside may be of any kind and are checked where they are read. Copies are small: a
-// sample of many thousand channels is made of them.
+// Values that come from outside may be of any kind and are checked where they are read. Records are small and
+// count no references: a sample of many thousand channels is made of them. The block that a record lies in
+// keeps alive what it refers to, and has its answers.
 class ChannelRecord {
  public:
-  explicit ChannelRecord(std::shared_ptr<ChannelSource> of) : source(std::move(of)) {}
-  ChannelRecord(const ChannelRecord& other)
-      : source(other.source), rawElements(other.rawElements), answers_(other.answers_) {}
-  ChannelRecord& operator=(const ChannelRecord&) = delete;
+  ChannelRecord(ChannelSource& of, RecordBlock& in) : source(&of), block(&in) {}
 
-  const LegendGroup& group() const { return *source->group; }
-  const PlistValue& cached(CachedAnswer answer) const { return answers_.find(answer); }
-  const PlistValue& cache(CachedAnswer answer, PlistValue value) const {
-    return answers_.keep(answer, std::move(value));
+  const LegendGroup& group() const { return *source->block->group; }
+  std::int64_t driverID() const { return source->block->driverID; }
+  std::int64_t channelID() const { return source->channelID; }
+  std::uint8_t format() const {
+    const auto type = source->type();
+    return type ? type->format() : std::uint8_t{kKdReportUnknownFormat};
   }
+  // Of samples only. Those that share them change with each other.
+  bool hasElements() const { return elements_ != nullptr; }
+  std::span<std::byte> elements() const { return {elements_, elementsSize_}; }
+  // Refers to the same bytes as another record, if that has some.
+  void shareElements(const ChannelRecord& other) {
+    if (other.hasElements()) takeOver(other);
+  }
+  // Refers to bytes of the block.
+  void setElements(std::byte* bytes, std::size_t size, ElementBlock& in);
+  // Refers to a copy of the bytes.
+  void copyElements(std::span<const std::byte> bytes);
+  const PlistValue& cached(CachedAnswer answer) const;
+  const PlistValue& cache(CachedAnswer answer, PlistValue value) const;
 
-  std::shared_ptr<ChannelSource> source;        // never null
-  ElementData rawElements;                      // of samples only
-  ObjectBlock<ChannelRecord>* block = nullptr;  // where it lies; a copy lies elsewhere
+  ChannelSource* source;  // never null
+  RecordBlock* block;     // where it lies
 
  private:
-  mutable AnswerCache answers_;
+  void takeOver(const ChannelRecord& other);
+
+  std::byte* elements_ = nullptr;  // in a block that this record's block keeps; none: no elements
+  std::size_t elementsSize_ = 0;
 };
 
 // None unless the value is an array.

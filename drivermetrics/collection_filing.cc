@@ -39,7 +39,7 @@ KdStatus file(ChannelCollection* collection, const KdReportChannel& channel, std
   if (level == nullptr) return kKdError;
   if (level->channels.isAbsent()) level->channels.make();
   if (level->channels.get() == nullptr) return kKdError;
-  level->channels.get()->push_back(channel);
+  level->channels.get()->add(channel.get());
   return kKdSuccess;
 }
 
@@ -49,26 +49,57 @@ PlistValue textOrNone(const KdReportOwnedText& text) {
 
 }  // namespace
 
-ChannelCollection* SubCollections::find(std::string_view name) const {
+void ChannelList::erase(std::size_t begin, std::size_t end) {
+  if (begin == end) return;
+  const auto at = [this](std::size_t place) {
+    return channels_.begin() + static_cast<std::ptrdiff_t>(place);
+  };
+  channels_.erase(at(begin), at(end));
+  // Blocks came in the order of the channels: those that stay are met in that order again.
+  std::size_t next = 0;
+  blocks_.removeIf([this, &next](const RecordBlock& block) {
+    const std::size_t first = next;
+    while (next < size() && (channels_[next] == nullptr || channels_[next]->block == &block)) ++next;
+    return next == first;
+  });
+}
+
+SubCollections::SubCollections() = default;
+SubCollections::SubCollections(SubCollections&&) noexcept = default;
+SubCollections& SubCollections::operator=(SubCollections&&) noexcept = default;
+SubCollections::~SubCollections() = default;
+
+void SubCollections::reserve(std::size_t n) {
+  entries_.reserve(n);
+}
+
+std::size_t SubCollections::size() const {
+  return entries_.size();
+}
+
+SubCollection* SubCollections::find(std::string_view name) {
+  while (places_.size() < entries_.size())
+    places_.set(*entries_[places_.size()].name, PlistValue::boolean(true));
   const auto place = places_.positionOf(name);
-  return place ? entries_[*place].second.get() : nullptr;
+  return place ? &entries_[*place] : nullptr;
 }
 
 ChannelCollection* SubCollections::findOrMake(std::string_view name) {
-  if (!places_.contains(name)) add(name, std::make_shared<ChannelCollection>());
-  return find(name);
+  SubCollection* entry = find(name);
+  return entry != nullptr ? entry->get() : add(name).get();
 }
 
-void SubCollections::add(std::string_view name, KdReportCollection collection) {
-  places_.set(name, PlistValue::boolean(true));
-  entries_.emplace_back(name, std::move(collection));
+SubCollection& SubCollections::add(std::shared_ptr<const std::string> name) {
+  SubCollection& entry = entries_.emplace_back();
+  entry.name = std::move(name);
+  return entry;
 }
 
 void SubCollections::removeEmpty() {
-  const auto isEmpty = [](const Entry& entry) { return entry.second != nullptr && entry.second->empty(); };
-  if (std::erase_if(entries_, isEmpty) == 0) return;
-  places_ = {};
-  for (const Entry& entry : entries_) places_.set(entry.first, PlistValue::boolean(true));
+  const auto isEmpty = [](const SubCollection& entry) {
+    return entry.isDictionary && entry.collection.empty();
+  };
+  if (std::erase_if(entries_, isEmpty) != 0) places_ = {};
 }
 
 KdReportCollection KdReportCreateAggregate(std::uint32_t options) {
@@ -105,8 +136,9 @@ std::optional<LegendEntry> usableLegendEntry(const PlistValue& entry, const Lege
 
 KdReportChannel makeChannelRecord(std::shared_ptr<const LegendGroup> group,
                                   std::optional<LegendEntry> entry) {
-  return ObjectBlocks<ChannelRecord>(1).add(
-      std::make_shared<ChannelSource>(ChannelSource{std::move(group), std::move(entry), {}}));
+  SourceBlocks sources(std::move(group));
+  RecordBlocks records;
+  return KdReportRetainChannel(records.add(sources.add(std::move(entry))));
 }
 
 KdStatus KdReportAddChannelDescription(ChannelCollection* collection,

@@ -33,7 +33,8 @@ constexpr std::array<std::pair<std::string_view, CachedAnswer>, 4> kAnswerKeys =
 }};
 
 PlistValue plistOfLegend(const ChannelSource& source) {
-  PlistArray places{source.legendChannel->channelID, legendType(source), source.legendChannel->channelName};
+  const auto& entry = source.legendChannel();
+  PlistArray places{entry->channelID, legendType(source), entry->channelName};
   while (!places.empty() && places.back().isNone()) places.pop_back();
   return PlistValue::array(std::move(places));
 }
@@ -42,9 +43,9 @@ PlistValue plistOfChannel(const ChannelRecord& channel) {
   PlistDictionary entries;
   for (const auto& [name, value] : kGroupKeys) entries.set(name, channel.group().*value);
   for (const auto& [name, answer] : kAnswerKeys) entries.set(name, channel.cached(answer));
-  if (channel.source->legendChannel) entries.set(kLegendChannel, plistOfLegend(*channel.source));
-  const auto elements = channel.rawElements.bytes();
-  if (channel.rawElements) entries.set(kRawElements, PlistValue::data({elements.begin(), elements.end()}));
+  if (channel.source->legendChannel()) entries.set(kLegendChannel, plistOfLegend(*channel.source));
+  const auto elements = channel.elements();
+  if (channel.hasElements()) entries.set(kRawElements, PlistValue::data({elements.begin(), elements.end()}));
   return PlistValue::dictionary(std::move(entries));
 }
 
@@ -56,7 +57,7 @@ KdReportChannel channelOfPlist(const PlistValue& value) {
   KdReportChannel channel = makeChannelRecord(std::move(group), legendEntryOf(entries->get(kLegendChannel)));
   for (const auto& [name, answer] : kAnswerKeys) channel->cache(answer, entries->get(name));
   const PlistValue elements = entries->get(kRawElements);
-  if (const auto bytes = elements.asData()) channel->rawElements = ElementData(*bytes);
+  if (const auto bytes = elements.asData()) channel->copyElements(*bytes);
   return channel;
 }
 
@@ -70,15 +71,15 @@ PlistValue plistOfCollection(const ChannelCollection& collection);
 
 PlistValue plistOf(const SubCollections& nested) {
   PlistDictionary entries;
-  for (const auto& [name, collection] : nested)
-    entries.set(name, collection != nullptr ? plistOfCollection(*collection) : malformed());
+  for (const SubCollection& entry : nested.entries())
+    entries.set(*entry.name, entry.isDictionary ? plistOfCollection(entry.collection) : malformed());
   return PlistValue::dictionary(std::move(entries));
 }
 
-PlistValue plistOf(const std::vector<KdReportChannel>& channels) {
+PlistValue plistOf(const ChannelList& channels) {
   PlistArray records;
   records.reserve(channels.size());
-  for (const KdReportChannel& channel : channels)
+  for (const ChannelRecord* channel : channels)
     records.push_back(channel != nullptr ? plistOfChannel(*channel) : malformed());
   return PlistValue::array(std::move(records));
 }
@@ -98,8 +99,9 @@ PlistValue plistOfCollection(const ChannelCollection& collection) {
   return PlistValue::dictionary(std::move(entries));
 }
 
-// Null when the value is no dictionary; `isTooDeep` is set when it is nested beyond the levels that are left.
-KdReportCollection collectionOfPlist(const PlistValue& value, int levels, bool& isTooDeep);
+// False when the value is no dictionary; `isTooDeep` is set when it is nested beyond the levels that are
+// left.
+bool readCollection(ChannelCollection& collection, const PlistValue& value, int levels, bool& isTooDeep);
 
 void readNested(CollectionField<SubCollections>& field, const PlistValue& value, int levels,
                 bool& isTooDeep) {
@@ -107,28 +109,31 @@ void readNested(CollectionField<SubCollections>& field, const PlistValue& value,
   const PlistDictionary* entries = value.asDictionary();
   if (entries == nullptr) return field.makeForeign();
   SubCollections& nested = field.make();
-  for (const auto& [name, entry] : *entries) nested.add(name, collectionOfPlist(entry, levels, isTooDeep));
+  nested.reserve(entries->size());
+  for (const auto& [name, element] : *entries) {
+    SubCollection& entry = nested.add(name);
+    entry.isDictionary = readCollection(entry.collection, element, levels, isTooDeep);
+  }
 }
 
-void readChannels(CollectionField<std::vector<KdReportChannel>>& field, const PlistValue& value) {
+void readChannels(CollectionField<ChannelList>& field, const PlistValue& value) {
   if (value.isNone()) return;
   const PlistArray* records = value.asArray();
   if (records == nullptr) return field.makeForeign();
   auto& channels = field.make();
   channels.reserve(records->size());
-  for (const PlistValue& record : *records) channels.push_back(channelOfPlist(record));
+  for (const PlistValue& record : *records) channels.add(channelOfPlist(record).get());
 }
 
-KdReportCollection collectionOfPlist(const PlistValue& value, int levels, bool& isTooDeep) {
+bool readCollection(ChannelCollection& collection, const PlistValue& value, int levels, bool& isTooDeep) {
   const PlistDictionary* entries = value.asDictionary();
   isTooDeep = isTooDeep || (entries != nullptr && levels == 0);
-  if (entries == nullptr || isTooDeep) return nullptr;
-  auto collection = std::make_shared<ChannelCollection>();
-  collection->queryOptions = entries->get(kQueryOptions);
-  readChannels(collection->channels, entries->get(kChannels));
-  readNested(collection->drivers, entries->get(kDrivers), levels - 1, isTooDeep);
-  readNested(collection->channelGroups, entries->get(kChannelGroups), levels - 1, isTooDeep);
-  return collection;
+  if (entries == nullptr || isTooDeep) return false;
+  collection.queryOptions = entries->get(kQueryOptions);
+  readChannels(collection.channels, entries->get(kChannels));
+  readNested(collection.drivers, entries->get(kDrivers), levels - 1, isTooDeep);
+  readNested(collection.channelGroups, entries->get(kChannelGroups), levels - 1, isTooDeep);
+  return true;
 }
 
 }  // namespace
@@ -139,8 +144,8 @@ PlistValue KdReportCopyPropertyList(const ChannelCollection* collection) {
 
 KdReportCollection KdReportCreateAggregateFromPropertyList(const PlistValue& value) {
   bool isTooDeep = false;
-  KdReportCollection collection = collectionOfPlist(value, kMostLevels, isTooDeep);
-  return isTooDeep ? nullptr : collection;
+  auto collection = std::make_shared<ChannelCollection>();
+  return readCollection(*collection, value, kMostLevels, isTooDeep) && !isTooDeep ? collection : nullptr;
 }
 
 }  // namespace kdreport

@@ -27,7 +27,7 @@ class RandomChannels {
       PlistData bytes;
       testing::appendElement(bytes, 0, 0, channelType(KdReportChannelGetFormat(channel.get())),
                              {.words = {1, 2, 3, 4}});
-      channel->rawElements = ElementData(bytes);
+      channel->copyElements(bytes);
     }
     return channels;
   }
@@ -90,7 +90,7 @@ TEST(CollectionWalk, VisitsClonesAndPrunesLikeAList) {
     for (std::size_t i = 0; i < copies.size(); ++i) {
       EXPECT_NE(copies[i], expected[i]);
       EXPECT_EQ(copies[i]->source, expected[i]->source);
-      EXPECT_EQ(copies[i]->rawElements.bytes().data(), expected[i]->rawElements.bytes().data());
+      EXPECT_EQ(copies[i]->elements().data(), expected[i]->elements().data());
     }
     EXPECT_TRUE(copy->queryOptions.isNone());
 
@@ -100,6 +100,35 @@ TEST(CollectionWalk, VisitsClonesAndPrunesLikeAList) {
     EXPECT_TRUE(filed->channels.isAbsent() && filed->drivers.isAbsent() && filed->channelGroups.isAbsent());
     EXPECT_EQ(_getAggregateOpts(filed.get()), 3U);
   }
+}
+
+TEST(CollectionWalk, KeepsAliveWhatItsChannelsReferTo) {
+  const ChannelType type = channelType(kKdReportSimple);
+  std::vector<KdReportChannel> channels;
+  PlistData buffer;
+  for (std::int64_t i = 0; i < 600; ++i) {  // several blocks
+    channels.push_back(channelOf(1 + i % 3, i, type));
+    testing::appendElement(buffer, 1 + i % 3, i, type, {.words = {i}});
+  }
+  KdReportCollection copy;
+  {
+    const KdReportCollection samples = KdReportCreateSamplesRaw(collectionOf(channels).get(), buffer);
+    (void)KdReportChannelGetChannelName(channelsIn(samples.get())[0x41]);
+    copy = cloneAggregate(samples.get(), [](const ChannelRecord&, ChannelRecord&) { return 0U; });
+  }
+  channels.clear();
+  EXPECT_EQ(KdReportPrune(copy.get(),
+                          [](ChannelRecord& channel) -> std::uint32_t {
+                            const std::int64_t id = KdReportChannelGetChannelID(&channel);
+                            return id == 0x41 || id == 599 ? kKdReportKeep : kKdReportRemove;
+                          }),
+            kKdReportRemove);
+  const KdReportChannel first = KdReportRetainChannel(*channelsIn(copy.get())[0]);
+  EXPECT_EQ(KdReportSimpleGetIntegerValue(channelsIn(copy.get())[1]), 599);
+  copy = nullptr;
+  EXPECT_EQ(KdReportSimpleGetIntegerValue(first.get()), 0x41);
+  EXPECT_EQ(KdReportChannelGetChannelName(first.get()), "A");
+  EXPECT_EQ(KdReportChannelGetDriverName(first.get()), "D3");
 }
 
 TEST(CollectionWalk, TakesNothingFromTheHeapForAChannel) {
@@ -139,7 +168,7 @@ TEST(CollectionWalk, PairsChannelsInTheirOrder) {
         before.get(), after.get(),
         [&](const ChannelRecord& partner, const ChannelRecord&, ChannelRecord& copy) {
           partners.push_back(&partner);
-          EXPECT_NE(copy.rawElements.bytes().data(), partner.rawElements.bytes().data());
+          EXPECT_NE(copy.elements().data(), partner.elements().data());
           EXPECT_EQ(getRawElements(&copy, KdReportChannelGetFormat(&copy))->word(0, 3), kKdReportInvalid);
           return std::uint32_t{0};
         });

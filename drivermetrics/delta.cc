@@ -127,7 +127,7 @@ KdReportChannel KdReportSampleCreateDelta(const ChannelRecord* earlier, const Ch
     return nullptr;
   };
   if (earlier == nullptr || later == nullptr) return fail(kKdBadArgument, std::nullopt);
-  KdReportChannel result = ObjectBlocks<ChannelRecord>(1).add(*earlier);
+  const KdReportChannel result = KdReportRetainChannel(RecordBlocks().add(*earlier));
   const KdStatus cloned = cloneElements(*result, *earlier, ElementValues::Keep);
   if (cloned != kKdSuccess) return fail(cloned, std::nullopt);
   const DeltaResult failure = channelDelta(*earlier, *later, *result);

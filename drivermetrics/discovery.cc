@@ -57,14 +57,16 @@ KdStatus addGroupChannels(ChannelCollection& collection, Publisher& publisher,
   described->subGroupName = stringOrNone(legendGroup.get(kd_report_key::kSubGroupName));
   described->channelInfo = dictionaryOrNone(legendGroup.get(kd_report_key::kChannelInfo));
   const auto group = std::make_shared<const LegendGroup>(std::move(*described));
-  ObjectBlocks<ChannelSource> sources(entries.size());
-  ObjectBlocks<ChannelRecord> records(entries.size());
+  SourceBlocks sources(group);
+  RecordBlocks records;
+  sources.expect(entries.size());
+  records.expect(entries.size());
   for (const PlistValue& value : entries) {
     if (value.asArray() == nullptr) break;
     auto entry = usableLegendEntry(value, *group, nullptr);
     if (!entry) return kKdError;
-    const KdReportChannel channel = records.add(sources.add(ChannelSource{group, std::move(entry), {}}));
-    if (_addChannel(&collection, channel, options) != kKdSuccess) return kKdError;
+    ChannelRecord& channel = records.add(sources.add(std::move(entry)));
+    if (_addChannel(&collection, KdReportRetainChannel(channel), options) != kKdSuccess) return kKdError;
   }
   return kKdSuccess;
 }

@@ -104,11 +104,17 @@ TEST_F(Discovery, FilesChannelsByDriverGroupAndSubgroup) {
   registry_.drivers = {publishingDriver(
       0x2A, "D", {group("G", "S", {entry(1, 0x1000001, "a")}), group(nullptr, nullptr, {entry(2, 1, "b")})})};
   const KdReportCollection filed = KdReportCopyAllChannels(registry_, 3);
-  const ChannelCollection* one = filed->drivers.get()->find("D <id 0x2a>");
-  ASSERT_NE(one, nullptr);
+  ASSERT_NE(filed->drivers.get()->find("D <id 0x2a>"), nullptr);
+  ChannelCollection* one = filed->drivers.get()->find("D <id 0x2a>")->get();
   EXPECT_EQ(one->channels.get()->size(), 1U);
-  ChannelRecord* channel =
-      one->channelGroups.get()->find("G")->channelGroups.get()->find("S")->channels.get()->front().get();
+  ChannelRecord* channel = one->channelGroups.get()
+                               ->find("G")
+                               ->get()
+                               ->channelGroups.get()
+                               ->find("S")
+                               ->get()
+                               ->channels.get()
+                               ->begin()[0];
   EXPECT_EQ(KdReportChannelGetDriverID(channel), 0x2A);
   EXPECT_EQ(KdReportChannelGetCategories(channel), 0x100);
   EXPECT_EQ(KdReportChannelGetUnitLabel(channel), "events");

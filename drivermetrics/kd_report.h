@@ -13,7 +13,7 @@
 // Ownership. What Copy and Create operations return is new and the caller's. Collections refer to records:
 // merging puts the same record into a second collection, and what is cached in it shows in both. A record
 // lives as long as a collection or a KdReportChannel refers to it (KdReportRetainChannel makes one in a
-// visitor), and keeps alive the block of memory that it lies in: at most 256 records, or 64 KiB of elements.
+// visitor), and keeps alive the block of memory that it lies in: at most 256 records with their elements.
 // The strings that Get operations return are borrowed and live as long as the record. A sample's record is a
 // copy of the subscribed one that shares the legend entry with it: a type that the first sampling finds out
 // shows in the subscribed record too.

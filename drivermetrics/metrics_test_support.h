@@ -28,7 +28,7 @@ inline KdReportChannel emptyChannel() {
 // The record's group, to be changed.
 inline LegendGroup& groupOf(ChannelRecord& channel) {
   auto group = std::make_shared<LegendGroup>(channel.group());
-  channel.source->group = group;
+  channel.source->block->group = group;
   return *group;
 }
 
@@ -55,7 +55,7 @@ inline KdReportChannel sampled(ChannelType type, const std::vector<Element>& ele
   groupOf(*channel).channelInfo = PlistValue::dictionary(std::move(info));
   PlistData bytes;
   for (const Element& element : elements) appendElement(bytes, 1, 0x4348, type, element);
-  channel->rawElements = ElementData(bytes);
+  channel->copyElements(bytes);
   return channel;
 }
 

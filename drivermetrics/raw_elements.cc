@@ -48,7 +48,7 @@ bool RawElements::copyFrom(const RawElements& other) {
 
 std::optional<RawElements> getRawElements(const ChannelRecord* channel, std::uint8_t format) {
   if (channel == nullptr) return std::nullopt;
-  const std::span<std::byte> bytes = channel->rawElements.bytes();
+  const std::span<std::byte> bytes = channel->elements();
   if (bytes.size() < kElementSize ||
       tbdaily::ByteReader(bytes).at<std::uint8_t>(element_offset::kType) != format)
     return std::nullopt;
@@ -57,11 +57,15 @@ std::optional<RawElements> getRawElements(const ChannelRecord* channel, std::uin
 
 KdStatus cloneElements(ChannelRecord& destination, const ChannelRecord& source, ElementValues values,
                        ElementBlocks* memory) {
-  if (!source.rawElements) return kKdError;
-  const auto bytes = source.rawElements.bytes();
-  destination.rawElements = memory != nullptr ? memory->copy(bytes) : ElementData(bytes);
+  if (!source.hasElements()) return kKdError;
+  const auto bytes = source.elements();
+  if (memory != nullptr) {
+    memory->copy(bytes, destination);
+  } else {
+    destination.copyElements(bytes);
+  }
   if (values == ElementValues::Keep) return kKdSuccess;
-  auto elements = getRawElements(&destination, KdReportChannelGetFormat(&destination));
+  auto elements = getRawElements(&destination, destination.format());
   if (!elements) return kKdError;
   for (std::size_t element = 0; element < elements->count(); ++element) {
     for (std::size_t word = 0; word < kElementWords; ++word)

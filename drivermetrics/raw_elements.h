@@ -1,11 +1,27 @@
 // The 64-byte elements in which the hub and every sample carry values.
 #pragma once
 
+#include <bit>
+#include <cstring>
+
 #include "drivermetrics/channel_record.h"
 
 namespace kdreport {
 
 class ElementBlocks;
+
+// A number of an element. Many thousand are read in a row, so it is one access of the processor where it
+// keeps numbers as elements do.
+inline constexpr std::size_t kWordSize = sizeof(std::uint64_t);
+inline std::uint64_t readWord(std::span<const std::byte, kWordSize> place) {
+  std::uint64_t value = 0;
+  if constexpr (std::endian::native == std::endian::little) {
+    std::memcpy(&value, place.data(), kWordSize);
+  } else {
+    for (std::size_t i = kWordSize; i-- > 0;) value = value << 8 | std::to_integer<std::uint64_t>(place[i]);
+  }
+  return value;
+}
 
 // Elements over bytes that somebody else owns; `count` of them can be read. A number outside reads as 0.
 class RawElements {

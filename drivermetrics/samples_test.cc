@@ -119,7 +119,7 @@ std::string sample(const KdReportCollection& channels, const PlistData& buffer) 
   std::string outcome;
   for (const ChannelRecord* channel : channelsIn(samples.get())) {
     outcome += std::to_string(KdReportChannelGetChannelID(channel)) + ":";
-    outcome += std::to_string(channel->rawElements.bytes().size() / kElementSize) + " ";
+    outcome += std::to_string(channel->elements().size() / kElementSize) + " ";
   }
   return outcome;
 }

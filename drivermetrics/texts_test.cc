@@ -112,7 +112,7 @@ TEST(Descriptions, OfSamples) {
   const auto nameless = testing::channelOf(1, 0x123456789A);
   PlistData bytes;
   testing::appendElement(bytes, 1, 0x123456789A, channelType(1));
-  nameless->rawElements = ElementData(bytes);
+  nameless->copyElements(bytes);
   EXPECT_EQ(describe(nameless), ">                       0x1234567 = {            0 (null) }\n");
 }
 

@@ -122,10 +122,10 @@ TEST(Values, OfElementsOfEveryLengthAndFormat) {
       for (unsigned carried = 0; carried <= 5; ++carried) {  // the format that the elements carry
         for (std::size_t length = 0; length <= 2 * kElementSize; length += 7) {
           const auto channel = sampled(channelType(format, announced), {});
-          channel->source->group = whole->source->group;
-          PlistData bytes(whole->rawElements.bytes().begin(), whole->rawElements.bytes().end());
+          channel->source->block->group = whole->source->block->group;
+          PlistData bytes(whole->elements().begin(), whole->elements().end());
           bytes[16] = static_cast<std::byte>(carried);
-          channel->rawElements = ElementData(std::span(bytes).first(length));
+          channel->copyElements(std::span(bytes).first(length));
           const std::size_t elements = length / kElementSize;
           const bool isReadable = elements > 0 && carried == format;
           const bool isComplete = isReadable && elements == announced;
