@@ -10,6 +10,17 @@
 
 namespace tbdaily {
 
+// A number that nobody outside can know. Asked of the system: asking the processor takes as long as the work of a short
+// run where that is a virtual one.
+inline std::uint64_t drawSeed() {
+#ifdef __GLIBCXX__
+  std::random_device random("getentropy");
+#else
+  std::random_device random;
+#endif
+  return std::uint64_t{random()} << 32 | random();
+}
+
 // Multiplies the halves of words with numbers that each process draws anew: which keys meet in a table cannot
 // be known beforehand, and any two meet no more often than by chance. Of the answer, each bit is as good as
 // the others. The same for equal keys throughout a process, and from any thread.
@@ -44,9 +55,9 @@ class KeyedHash {
 
   static const Numbers& numbers() {
     static const Numbers drawn = [] {
-      std::random_device random;
+      std::mt19937_64 random(drawSeed());
       Numbers numbers;
-      for (std::uint64_t& number : numbers) number = std::uint64_t{random()} << 32 | random();
+      for (std::uint64_t& number : numbers) number = random();
       return numbers;
     }();
     return drawn;

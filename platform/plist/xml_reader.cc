@@ -6,10 +6,10 @@
 #include <array>
 #include <exception>
 #include <memory>
-#include <random>
 #include <type_traits>
 #include <utility>
 
+#include "platform/keyed_hash.h"
 #include "platform/plist/base64.h"
 #include "platform/plist/builder.h"
 #include "platform/plist/limits.h"
@@ -119,10 +119,7 @@ void XmlReader::guarded(void* self, Function function) {
 XmlReader::XmlReader() : parser_(XML_ParserCreate("UTF-8")) {
   if (!parser_) throw std::bad_alloc();
   // Drawn once: else each parser asks the kernel for its own.
-  static const unsigned long salt = [] {
-    std::random_device random;
-    return std::uint64_t{random()} << 32 | random() | 1;
-  }();
+  static const unsigned long salt = drawSeed() | 1;
   XML_SetHashSalt(parser_.get(), salt);
   XML_SetUserData(parser_.get(), this);
   XML_SetElementHandler(
