@@ -1,9 +1,10 @@
-// Runs a command and says what it took: the processor's seconds, the seconds on the clock, the peak of its memory.
+// Runs a command and says what it took: the processor's seconds, the seconds on the clock, the peak of its
+// memory.
 //
 // usage: measure COMMAND [ARGUMENT...]
 //
-// Prints "<user and system seconds> <elapsed seconds> <peak in bytes>" and ends with the command's status. A program of
-// its own, since a command inherits the peak of whoever starts it, and this one is small.
+// Prints "<user and system seconds> <elapsed seconds> <peak in bytes>" and ends with the command's status. A
+// program of its own, since a command inherits the peak of whoever starts it, and this one is small.
 #include <fcntl.h>
 #include <spawn.h>
 #include <sys/resource.h>

@@ -26,7 +26,8 @@ class ByteReader {
       std::memcpy(&value, bytes_.data() + offset, sizeof value);
     } else {
       for (std::size_t i = sizeof(T); i-- > 0;)
-        value = static_cast<T>(std::uint64_t{value} << 8 | std::to_integer<std::uint64_t>(bytes_[offset + i]));
+        value =
+            static_cast<T>(std::uint64_t{value} << 8 | std::to_integer<std::uint64_t>(bytes_[offset + i]));
     }
     return value;
   }

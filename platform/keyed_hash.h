@@ -10,8 +10,8 @@
 
 namespace tbdaily {
 
-// A number that nobody outside can know. Asked of the system: asking the processor takes as long as the work of a short
-// run where that is a virtual one.
+// A number that nobody outside can know. Asked of the system: asking the processor takes as long as the work
+// of a short run where that is a virtual one.
 inline std::uint64_t drawSeed() {
 #ifdef __GLIBCXX__
   std::random_device random("getentropy");

@@ -26,7 +26,7 @@ constexpr std::int64_t kEndOfSequence = std::numeric_limits<std::int64_t>::max()
 
 const std::array<std::string_view, AnalyticsStore::QueryCount> AnalyticsStore::kQueries{
     "SELECT id FROM keys WHERE name = ?1",
-    "INSERT INTO keys (name) VALUES (?1)",
+    "INSERT INTO keys (name) VALUES (?1) ON CONFLICT (name) DO NOTHING",
     "SELECT value FROM scalars WHERE key_id = ?1 AND day = ?2",
     "INSERT INTO scalars (key_id, day, value) VALUES (?1, ?2, ?3) "
     "ON CONFLICT (key_id, day) DO UPDATE SET value = excluded.value",
@@ -233,40 +233,44 @@ SqliteStatement& AnalyticsStore::statement(Query query) {
 }
 
 int AnalyticsStore::findOrInsertKey(std::string_view key, LoadedKey& entry) {
-  SqliteStatement& find = statement(FindKey);
-  const StatementRun run(find);
-  find.bind(1, key);
-  const int found = find.step();
-  if (found == SQLITE_ROW) entry.id = find.integer(0);
-  if (found != SQLITE_DONE) return found == SQLITE_ROW ? SQLITE_OK : found;
-  SqliteStatement& insert = statement(InsertKey);
-  const StatementRun insertion(insert);
-  insert.bind(1, key);
-  const int code = insert.step();
-  if (code != SQLITE_DONE) return code;
-  entry.id = database_.lastInsertedRow();
-  entry.mayHaveScalars = false;
-  return SQLITE_OK;
+  // Behind a new key comes another one as a rule, behind an old one an old one.
+  const std::array<Query, 2> order =
+      wasKeyNew_ ? std::array{InsertKey, FindKey} : std::array{FindKey, InsertKey};
+  for (const Query query : order) {
+    SqliteStatement& attempt = statement(query);
+    const StatementRun run(attempt);
+    attempt.bind(1, key);
+    const int code = attempt.step();
+    if (code != SQLITE_ROW && code != SQLITE_DONE) return code;
+    const bool isNew = query == InsertKey && database_.changedRows() > 0;
+    if (code == SQLITE_DONE && !isNew) continue;
+    entry.id = isNew ? database_.lastInsertedRow() : attempt.integer(0);
+    entry.mayHaveScalars = !isNew;
+    wasKeyNew_ = isNew;
+    return SQLITE_OK;
+  }
+  return SQLITE_ERROR;
 }
 
 int AnalyticsStore::loadedKey(std::string_view key, LoadedKey*& entry) {
   // Most lines have the key of the line before.
-  auto place =
-      lastLoaded_ != loadedKeys_.end() && lastLoaded_->first == key ? lastLoaded_ : loadedKeys_.find(key);
-  if (place == loadedKeys_.end()) {
-    LoadedKey found;
-    if (const int code = findOrInsertKey(key, found); code != SQLITE_OK) return code;
-    if (loadedKeys_.size() == kLoadedKeysKept) forgetLoadedKeys();
-    place = loadedKeys_.emplace(key, found).first;
+  if (lastLoaded_ == nullptr || lastLoaded_->first != key) {
+    auto place = loadedKeys_.find(key);
+    if (place == loadedKeys_.end()) {
+      LoadedKey found;
+      if (const int code = findOrInsertKey(key, found); code != SQLITE_OK) return code;
+      if (loadedKeys_.size() == kLoadedKeysKept) forgetLoadedKeys();
+      place = loadedKeys_.emplace(key, found).first;
+    }
+    lastLoaded_ = &*place;
   }
-  lastLoaded_ = place;
-  entry = &place->second;
+  entry = &lastLoaded_->second;
   return SQLITE_OK;
 }
 
 void AnalyticsStore::forgetLoadedKeys() {
   loadedKeys_.clear();
-  lastLoaded_ = loadedKeys_.end();
+  lastLoaded_ = nullptr;
 }
 
 int AnalyticsStore::putScalar(LoadedKey& key, DayNumber day, std::int64_t value) {

@@ -10,13 +10,14 @@
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
-#include <map>
 #include <mutex>
 #include <span>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 
 #include "platform/analytics_client.h"
+#include "platform/keyed_hash.h"
 #include "platform/linux/store/store_file.h"
 
 namespace tbdaily {
@@ -105,9 +106,14 @@ class AnalyticsStore {
   SqliteDatabase database_;
   std::array<SqliteStatement, QueryCount> statements_;  // prepared at first use; gone before the database
   bool loading_ = false;
-  using LoadedKeys = std::map<std::string, LoadedKey, std::less<>>;
+  bool wasKeyNew_ = false;  // the last one that was looked for
+  struct KeyHash {
+    using is_transparent = void;
+    std::size_t operator()(std::string_view key) const { return KeyedHash::of(key); }
+  };
+  using LoadedKeys = std::unordered_map<std::string, LoadedKey, KeyHash, std::equal_to<>>;
   LoadedKeys loadedKeys_;  // of the load that is under way
-  LoadedKeys::iterator lastLoaded_ = loadedKeys_.end();
+  LoadedKeys::value_type* lastLoaded_ = nullptr;
 };
 
 }  // namespace tbdaily

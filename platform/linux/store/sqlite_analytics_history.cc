@@ -108,6 +108,7 @@ class DayRows {
   DayRows(Reader& reader, std::string_view sql, unsigned patience, DayNumber minimumDay, DayNumber maximumDay)
       : reader_(reader),
         rowsFrom_(reader.database().prepare(sql)),
+        mostPatience_(patience),
         patience_(patience),
         minimumDay_(minimumDay),
         maximumDay_(maximumDay) {}
@@ -162,9 +163,12 @@ class DayRows {
       }
       last = place;
       if (isAsked) add();
-      if (isAsked && patience_ != 0) {
+      if (isAsked && mostPatience_ != 0) {
+        if (stepped != 0) patience_ = mostPatience_;
         stepped = 0;
       } else if (stepped++ == patience_) {
+        if (patience_ != 0)
+          --patience_;  // it was in vain, as it will be at the next key of a store of many days
         next = behind(place);
         return true;
       }
@@ -195,7 +199,8 @@ class DayRows {
 
   Reader& reader_;
   SqliteStatement rowsFrom_;
-  const unsigned patience_;
+  const unsigned mostPatience_;
+  unsigned patience_;
   const DayNumber minimumDay_, maximumDay_;
   std::deque<Row> rows_;
 };
