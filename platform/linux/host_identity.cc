@@ -1,10 +1,10 @@
 #include "platform/linux/host_identity.h"
 
 #include <sha2.h>
-#include <stdlib.h>
 
 #include <array>
 #include <cstdint>
+#include <cstdlib>
 #include <iterator>
 #include <optional>
 #include <span>
