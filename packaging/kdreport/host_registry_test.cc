@@ -1,6 +1,6 @@
 // Two subscriptions of the host's registry in two threads: what races shows under the thread sanitizer.
 
-#include "platform/linux/replay/host_registry.h"
+#include "platform/linux/live/host_registry.h"
 
 #include <gmock/gmock.h>
 

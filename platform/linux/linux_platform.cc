@@ -16,7 +16,7 @@
 #include "platform/linux/linux_run_lock.h"
 #include "platform/linux/linux_service_listener.h"
 #include "platform/linux/linux_system_log.h"
-#include "platform/linux/replay/recorded_driver_registry.h"
+#include "platform/linux/live/host_driver_registry.h"
 #include "platform/linux/replay/recorded_stack_snapshot.h"
 #include "platform/linux/replay/recorded_usage_service.h"
 #include "platform/linux/replay/recordings.h"
@@ -51,7 +51,7 @@ struct LinuxPlatform::Families {
   LinuxSystemLog systemLog{host, kernel, deviceAnswers};
   LinuxDynamicLoader dynamicLoader{host};
   LinuxMessageDigest messageDigest;
-  RecordedDriverRegistry driverRegistry{recordings};
+  HostDriverRegistry driverRegistry{host, recordings};
   RecordedStackSnapshot stackSnapshot{recordings};
   RecordedUsageService usageService{recordings};  // last: it ends before what its replies use
 

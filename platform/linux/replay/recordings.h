@@ -56,6 +56,7 @@ inline constexpr std::string_view kLocale = "locale.plist";
 inline constexpr std::string_view kUsage = "usage.plist";
 inline constexpr std::string_view kRegistry = "registry.plist";
 inline constexpr std::string_view kHub = "hub.plist";
+inline constexpr std::string_view kNvme = "nvme.plist";
 inline constexpr std::string_view kStackSnapshot = "snapshot.kcdata";
 }  // namespace recording
 

@@ -5,7 +5,8 @@
 
 #include "platform/byte_reader.h"
 #include "platform/byte_writer.h"
-#include "platform/linux/replay/recorded_client.h"
+#include "platform/linux/registry/entry_registry.h"
+#include "platform/linux/replay/recorded_clients.h"
 
 namespace tbdaily {
 
@@ -49,7 +50,7 @@ KdStatus fill(std::span<const std::byte> data, std::size_t most, std::span<std::
   return kKdSuccess;
 }
 
-class StorageClient : public RecordedClient {
+class StorageClient : public UserClient {
  public:
   StorageClient(const PlistDictionary& client, Recordings& recordings)
       : buffers_(client.get("buffers")),
@@ -71,7 +72,7 @@ class StorageClient : public RecordedClient {
  private:
   static KdStatus answerRecommendation(const PlistDictionary& recommendation, std::span<std::byte> output,
                                        std::size_t& outputSize) {
-    if (const KdStatus status = recordedStatus(recommendation, "status"); status != kKdSuccess) return status;
+    if (const KdStatus status = statusOf(recommendation, "status"); status != kKdSuccess) return status;
     const PlistValue data = recommendation.get("data");
     return fill(data.asData().value_or(std::span<const std::byte>()), output.size(), output, outputSize);
   }
@@ -103,11 +104,11 @@ class StorageClient : public RecordedClient {
     const bool asksForSize = output.size() == kSizeAnswer && size != kSizeAnswer;
     if (!request.isSizeQuery && !(asksForSize && !request.code)) {
       if (asksForSize) return kKdBadArgument;  // its flag is clear
-      if (const KdStatus status = recordedStatus(buffer, "dataStatus"); status != kKdSuccess) return status;
+      if (const KdStatus status = statusOf(buffer, "dataStatus"); status != kKdSuccess) return status;
       const std::int64_t most = integerOf(buffer, "fill").value_or(static_cast<std::int64_t>(output.size()));
       return fill(data, static_cast<std::size_t>(std::max<std::int64_t>(most, 0)), output, outputSize);
     }
-    if (const KdStatus status = recordedStatus(buffer, "sizeStatus"); status != kKdSuccess) return status;
+    if (const KdStatus status = statusOf(buffer, "sizeStatus"); status != kKdSuccess) return status;
     if (output.size() < kSizeAnswer) return kKdBadArgument;
     writeLittleEndian(output.first(kSizeAnswer), size);
     outputSize = kSizeAnswer;
@@ -121,12 +122,7 @@ class StorageClient : public RecordedClient {
 
 }  // namespace
 
-KdStatus recordedStatus(const PlistDictionary& dictionary, std::string_view key) {
-  return static_cast<KdStatus>(static_cast<std::uint64_t>(integerOf(dictionary, key).value_or(0)) &
-                               0xFFFFFFFF);
-}
-
-std::unique_ptr<RecordedClient> makeStorageClient(const PlistDictionary& client, Recordings& recordings) {
+std::unique_ptr<UserClient> makeStorageClient(const PlistDictionary& client, Recordings& recordings) {
   return std::make_unique<StorageClient>(client, recordings);
 }
 

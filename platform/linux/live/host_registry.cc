@@ -1,9 +1,9 @@
-#include "platform/linux/replay/host_registry.h"
+#include "platform/linux/live/host_registry.h"
 
 #include <utility>
 
 #include "platform/linux/base/host.h"
-#include "platform/linux/replay/recorded_driver_registry.h"
+#include "platform/linux/live/host_driver_registry.h"
 #include "platform/linux/replay/recordings.h"
 #include "platform/plist/codec.h"
 
@@ -22,9 +22,9 @@ struct RegistryNeeds {
   Recordings recordings{host, codec};
 };
 
-class HostRegistry : private RegistryNeeds, public RecordedDriverRegistry {
+class HostRegistry : private RegistryNeeds, public HostDriverRegistry {
  public:
-  explicit HostRegistry(Host h) : RegistryNeeds(std::move(h)), RecordedDriverRegistry(recordings) {}
+  explicit HostRegistry(Host h) : RegistryNeeds(std::move(h)), HostDriverRegistry(host, recordings) {}
 };
 
 }  // namespace

@@ -9,9 +9,9 @@
 
 namespace kdreport {
 
-// What is recorded under a device root (registry.plist, hub.plist). Without a root: the one that TBDAILY_ROOT
-// names, else "/". Answers as an absent registry where nothing is recorded. Different
-// subscriptions of it may be sampled in different threads.
+// What is recorded under a device root (registry.plist, hub.plist); without a recording, and unless
+// TBDAILY_LIVE is 0, what the host's own kernel measures. Without a root: the one that TBDAILY_ROOT names,
+// else "/". Different subscriptions of it may be sampled in different threads.
 [[nodiscard]] std::unique_ptr<tbdaily::DriverRegistry> openHostRegistry(std::string_view deviceRoot = {});
 
 }  // namespace kdreport

@@ -1,0 +1,20 @@
+#include "platform/linux/live/host_driver_registry.h"
+
+namespace tbdaily {
+
+const LiveHost& HostDriverRegistry::liveHost() {
+  std::call_once(once_, [this] { liveHost_ = std::make_unique<LiveHost>(host_.livePath("/"), recordings_); });
+  return *liveHost_;
+}
+
+PlistValue HostDriverRegistry::currentEntries() {
+  if (!host_.live() || recordings_.has(recording::kRegistry)) return RecordedDriverRegistry::currentEntries();
+  return liveHost().entries();
+}
+
+std::unique_ptr<UserClient> HostDriverRegistry::makeClient(const PlistDictionary& client) {
+  if (client.get("kind").asString() != LiveHost::kHubKind) return RecordedDriverRegistry::makeClient(client);
+  return host_.live() ? makeHubClient({}, liveHost().openValues()) : nullptr;
+}
+
+}  // namespace tbdaily
