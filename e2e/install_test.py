@@ -104,10 +104,11 @@ class InstalledPackage(unittest.TestCase):
         run("cmake", "--build", self.folder / "example")
         device.mkdir()
         example = [self.folder / "example" / "sample_channels"]
-        environment = {**os.environ, "TBDAILY_ROOT": str(device)}
+        environment = {**os.environ, "TBDAILY_ROOT": str(device), "TBDAILY_LIVE": "0"}
         without = subprocess.run(example, capture_output=True, text=True, env=environment)
         self.assertEqual(without.returncode, 1)
         self.assertRegex(without.stderr, r"^sample_channels: no drivers here.*tallyctl.*\n$")
+        self.assertIn("memory.available", run(*example, env={**environment, "TBDAILY_LIVE": "1"}))
         tallyctl = [self.prefix / "bin" / "tallyctl", "--root", device]
         run(*tallyctl, "init")
         printed = run(*example, env=environment)

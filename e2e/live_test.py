@@ -75,6 +75,36 @@ class LiveDrivers(unittest.TestCase):
         self.assertTrue(any("majorFaults" in key for key in keys), keys)
         self.assertFalse([key for key in keys if ".busyTime" in key and "nvme" not in key], keys)
 
+    def test_a_captured_machine_is_replayed_as_it_was(self):
+        elsewhere = self.device.base / "elsewhere"
+        before = independent()
+        self.device.tally("capture", "--to", str(elsewhere))
+        after = independent()
+        self.assertFalse(self.device.path("System/Device/registry.plist").exists())
+        listed = self.device.tally("metrics", "list")
+        self.device.env.update(TBDAILY_ROOT=str(elsewhere), TBDAILY_LIVE="0")
+        self.assertEqual(self.device.tally("metrics", "list"), listed)
+        values = self.sample()
+        for name, least in before.items():
+            self.assertTrue(least <= values[name] <= after[name], name)
+        self.assertEqual(self.sample(), values)
+        self.device.env["TBDAILY_LIVE"] = "1"
+        self.assertIn("replay", self.device.tally("capture", "--to", str(elsewhere), "--replace"))
+
+    def test_capture_asks_the_live_host_and_says_what_it_cannot(self):
+        self.device.record("clock", {"now": NOW, "ticks": 5})
+        recorded = self.device.path("System/Device/clock.plist").read_bytes()
+        for words, status in ((["--only", "moon"], 2), ([], 2), (["--only", "clock", "--to", "x"], 2),
+                              (["--only", "locale,clock"], 1)):
+            self.device.tally("capture", *words, status=status)
+        self.assertFalse(self.device.path("System/Device/locale.plist").exists())
+        self.assertEqual(self.device.path("System/Device/clock.plist").read_bytes(), recorded)
+        files = self.device.tally_json("capture", "--only", "clock,registry", "--replace")["files"]
+        self.assertEqual(files, ["registry.plist", "hub.plist", "clock.plist"])
+        self.assertNotEqual(self.device.path("System/Device/clock.plist").read_bytes(), recorded)
+        self.device.env["TBDAILY_LIVE"] = "0"
+        self.device.tally("capture", "--only", "kernel", status=1)
+
     def test_a_recording_or_live_sources_switched_off_hide_them(self):
         self.assertTrue(self.sample())
         self.device.record("registry", {"entries": []})

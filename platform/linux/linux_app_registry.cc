@@ -53,14 +53,15 @@ bool isVisibleApplication(const fs::path& desktopEntry) {
   return isApplication;
 }
 
-void enumerateFolder(const fs::path& folder, std::string_view type,
-                     const std::function<void(std::string_view)>& bundle) {
+void addApplications(const fs::path& folder, std::string_view type,
+                     std::vector<LiveApplication>& applications) {
   std::error_code error;
   fs::recursive_directory_iterator entries(folder, fs::directory_options::skip_permission_denied, error);
   for (; !error && entries != fs::recursive_directory_iterator(); entries.increment(error)) {
     std::error_code ignored;
     if (entries->path().extension() != ".desktop" || !entries->is_regular_file(ignored)) continue;
-    if (isVisibleApplication(entries->path())) bundle(type);
+    if (isVisibleApplication(entries->path()))
+      applications.push_back({entries->path().stem().native(), type});
   }
 }
 
@@ -79,14 +80,18 @@ void LinuxAppRegistry::enumerateBundles(BundleKind kind,
     return;
   }
   if (!host_.live()) return;
-  for (const ApplicationFolder& folder : kSharedFolders) {
-    enumerateFolder(host_.livePath(folder.path), folder.bundleType, bundle);
-  }
+  for (const LiveApplication& application : liveApplications(host_)) bundle(application.type);
+}
+
+std::vector<LiveApplication> liveApplications(const Host& host) {
+  std::vector<LiveApplication> applications;
+  for (const ApplicationFolder& folder : kSharedFolders)
+    addApplications(host.livePath(folder.path), folder.bundleType, applications);
   std::error_code error;
-  fs::directory_iterator homes(host_.livePath(kHomes), error);
-  for (; !error && homes != fs::directory_iterator(); homes.increment(error)) {
-    enumerateFolder(homes->path() / kFolderInHome, "User", bundle);
-  }
+  fs::directory_iterator homes(host.livePath(kHomes), error);
+  for (; !error && homes != fs::directory_iterator(); homes.increment(error))
+    addApplications(homes->path() / kFolderInHome, "User", applications);
+  return applications;
 }
 
 }  // namespace tbdaily

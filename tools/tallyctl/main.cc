@@ -37,6 +37,7 @@ void declare(CLI::App& app, Tool& tool) {
   tbdaily::addBufferCommands(app, tool);
   tbdaily::addWearCommand(app, tool);
   tbdaily::addMetricsCommand(app, tool);
+  tbdaily::addCaptureCommand(app, tool);
 }
 
 // What CLI11 says of a command that it does not know names everything but the command.

@@ -76,5 +76,6 @@ void addBufferCommands(CLI::App& app, Tool& tool);
 void addNandCommand(CLI::App& app, Tool& tool);
 void addWearCommand(CLI::App& app, Tool& tool);
 void addMetricsCommand(CLI::App& app, Tool& tool);
+void addCaptureCommand(CLI::App& app, Tool& tool);
 
 }  // namespace tbdaily

@@ -20,6 +20,12 @@ Host Host::fromEnvironment() {
   return {std::move(path), live == nullptr || std::string_view(live) != "0"};
 }
 
+Host Host::withoutRecordings() const {
+  Host host = *this;
+  host.replays_ = false;
+  return host;
+}
+
 fs::path Host::livePath(std::string_view absolutePath) const {
   return liveRoot_ / (fs::path("/") / absolutePath).lexically_normal().relative_path();
 }

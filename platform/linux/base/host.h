@@ -20,6 +20,10 @@ class Host {
 
   const std::filesystem::path& root() const { return files_->root(); }
   bool live() const { return live_; }
+  // Whether recordings answer in place of the live host.
+  bool replays() const { return replays_; }
+  // The same host as it is without any.
+  Host withoutRecordings() const;
 
   // The door to the device's files, for as long as the host or a copy of it is there.
   const DeviceFiles& files() const { return *files_; }
@@ -29,6 +33,7 @@ class Host {
  private:
   std::shared_ptr<const DeviceFiles> files_;
   bool live_;
+  bool replays_ = true;
   std::filesystem::path liveRoot_;
 };
 

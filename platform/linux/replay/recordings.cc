@@ -26,6 +26,7 @@ const CachedPlistFile& Recordings::loaded(std::string_view file) {
 }
 
 PlistValue Recordings::load(std::string_view file) {
+  if (!host_.replays()) return PlistValue::dictionary({});
   const std::lock_guard guard(mutex_);
   return loaded(file).root();
 }
@@ -40,6 +41,7 @@ bool Recordings::readFile(std::string_view file, FileContents& contents) {
 }
 
 bool Recordings::has(std::string_view file) const {
+  if (!host_.replays()) return false;
   struct stat ignored {};
   return host_.files().status(path(file), ignored) == 0;
 }
@@ -49,6 +51,7 @@ PlistValue Recordings::entry(std::string_view file, std::string_view key) {
 }
 
 std::optional<PlistValue> Recordings::readableEntry(std::string_view file, std::string_view key) {
+  if (!host_.replays()) return PlistValue();
   const std::lock_guard guard(mutex_);
   const CachedPlistFile& recording = loaded(file);
   if (recording.state() == State::Unreadable) return std::nullopt;
