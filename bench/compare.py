@@ -139,6 +139,16 @@ def expect_equal_reports(report, script):
         raise Differs("the reports have other " + ", ".join(wrong))
 
 
+def expect_shell_figures(report, store):
+    """What the shell printed of each distribution, against the report's statistics: minimum, maximum, mean, count."""
+    shown = subprocess.run(["sqlite3", store], stdin=open(PEERS / "report.sql"), capture_output=True, text=True, check=True).stdout
+    for line in shown.splitlines()[:len(report["TBDistributions"])]:
+        key, *figures = line.split("|")
+        least, most, mean, _, count = report["TBDistributions"][key]
+        if any(abs(own / float(theirs) - 1) > 1e-9 for own, theirs in zip((least, most, mean, count), figures)):
+            raise Differs(f"the shell has {line}")
+
+
 def daily_report(shop, table):
     sizes = ["--scalars", shop.size(200_000), "--distributions", shop.size(2_000)]
     day = shop.made("day", "make_day.py", *sizes)
@@ -150,6 +160,7 @@ def daily_report(shop, table):
     (script, _), = best(1, lambda: shop.measured(sys.executable, PEERS / "report.py", day, output))
     report, size = report_of(day)
     expect_equal_reports(report, plistlib.loads(output.read_bytes()))
+    expect_shell_figures(report, day / STORE)
     table.row(2, "the same", "a script in Python that makes an equal report",
               f"{script / own:.1f} times as fast ({script:.2f} s)", "at least 10", script >= 10 * own)
     table.row(3, "peak of memory of the same", f"the report, {size / MEBIBYTE:.1f} MiB", f"{peak / MEBIBYTE:.1f} MiB",
@@ -322,6 +333,13 @@ def long_messages(shop, table):
         once, _ = device("once" + option, option, count)
         twice, copy = device("twice" + option, option, 2 * count)
         (none, _), (one, _), (two, _) = best(shop.rounds(5), bare, once, twice)
+        if option == "--records":
+            records = plistlib.loads((copy / "System/Device/usage.plist").read_bytes())["records"]
+            expected = sum(record[field] >= 1024 for record in records for field in record if field.endswith("Bytes"))
+            with sqlite3.connect(copy / STORE) as database:
+                (stored,) = database.execute("SELECT count(*) FROM keys WHERE name LIKE 'datausage.%'").fetchone()
+            if stored != expected:
+                raise Differs(f"{stored} figures of usage are stored, not {expected}")
         if option == "--settings":
             folder = copy / "var/mobile/Library/Preferences"
             stored = sum(len(plistlib.loads(file.read_bytes())) for file in folder.glob("org.example.domain*.plist"))
