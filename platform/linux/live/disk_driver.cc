@@ -35,7 +35,7 @@ bool isMultipathHead(const LiveDiscovery& discovery, const std::string& disk) {
   std::error_code ignored;
   const std::filesystem::path device =
       std::filesystem::canonical(discovery.place(pathOf({kDisks, disk, "device"})), ignored);
-  return device.native().find("/nvme-subsystem/") != std::string::npos;
+  return device.filename().native().starts_with("nvme-subsys");
 }
 
 }  // namespace

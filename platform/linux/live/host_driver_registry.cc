@@ -8,8 +8,8 @@ const LiveHost& HostDriverRegistry::liveHost() {
 }
 
 PlistValue HostDriverRegistry::currentEntries() {
-  if (!host_.live() || recordings_.has(recording::kRegistry)) return RecordedDriverRegistry::currentEntries();
-  return liveHost().entries();
+  PlistValue recorded = RecordedDriverRegistry::currentEntries();
+  return recorded.asArray() != nullptr || !host_.live() ? recorded : liveHost().entries();
 }
 
 std::unique_ptr<UserClient> HostDriverRegistry::makeClient(const PlistDictionary& client) {

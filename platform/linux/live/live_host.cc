@@ -61,18 +61,15 @@ std::uint64_t tickCount() {
 
 LiveHost::LiveHost(const std::filesystem::path& root, Recordings& recordings)
     : recordings_(recordings), discovery_(root, found_) {
-  PlistArray entries;
+  PlistDictionary hub = registryEntry(kHubIdentifier, "KdReportHub", "KdReportHub", {}).mutableDictionary();
+  hub.set("client", PlistValue::dictionary({{"kind", text(kHubKind)}}));
+  PlistArray entries{PlistValue::dictionary(std::move(hub))};
   for (const LiveDriver& driver : kTextDrivers) {
     driver.discover(discovery_);
     addDriver(driver.name, driver.identifier, entries);
   }
   controllers_ = discoverNvme(discovery_, recordings_);
   addDriver(kNvmeDriver, kNvmeIdentifier, entries);
-  if (!entries.empty()) {
-    PlistDictionary hub = registryEntry(kHubIdentifier, "KdReportHub", "KdReportHub", {}).mutableDictionary();
-    hub.set("client", PlistValue::dictionary({{"kind", text(kHubKind)}}));
-    entries.insert(entries.begin(), PlistValue::dictionary(std::move(hub)));
-  }
   entries_ = PlistValue::array(std::move(entries));
 }
 

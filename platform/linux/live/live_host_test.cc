@@ -249,8 +249,20 @@ TEST_F(LiveHostTest, ARecordingOfHealthPagesAnswersForAllControllers) {
   EXPECT_EQ(value("nvme2.busyTime"), 120);
 }
 
-TEST_F(LiveHostTest, AHostThatShowsNothingHasNoEntries) {
-  EXPECT_TRUE(open().entries().asArray()->empty());
+TEST_F(LiveHostTest, TheHeadOfAMultipathDriveIsNotCountedAgain) {
+  const auto subsystem = device.host.livePath("/sys/devices/virtual/nvme-subsystem/nvme-subsys0");
+  std::filesystem::create_directories(subsystem);
+  put("/sys/block/nvme0n1/stat", "0 0 7 0 0 0 0 0 0 0 0");
+  std::filesystem::create_directory_symlink(subsystem, device.host.livePath("/sys/block/nvme0n1/device"));
+  putDisk("nvme0c0n1", "0 0 7 0 0 0 0 0 0 0 0");
+  open();
+  EXPECT_EQ(value("disk.readBytes"), 7 * 512);
+  EXPECT_EQ(value("disk.nvme0n1.readBytes"), 7 * 512);
+}
+
+TEST_F(LiveHostTest, AHostThatShowsNothingHasTheHubAlone) {
+  EXPECT_EQ(open().entries().asArray()->size(), 1U);
+  EXPECT_TRUE(names.empty());
 }
 
 }  // namespace

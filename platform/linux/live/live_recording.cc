@@ -31,8 +31,8 @@ PlistValue recordedElement(const ByteReader& element) {
   PlistArray words;
   for (std::size_t word = 0; word < HubRoom::kWords; ++word)
     words.push_back(number(*element.at<std::uint64_t>(kWordsAt + word * sizeof(std::uint64_t))));
-  return PlistValue::dictionary(
-      {{"stamp", number(*element.at<std::uint64_t>(kStampAt))}, {"words", PlistValue::array(std::move(words))}});
+  return PlistValue::dictionary({{"stamp", number(*element.at<std::uint64_t>(kStampAt))},
+                                 {"words", PlistValue::array(std::move(words))}});
 }
 
 PlistValue recordedChannel(const ChannelKey& key, std::span<const std::byte> elements) {
@@ -72,7 +72,8 @@ LiveRecording recordLiveHost(const LiveHost& host) {
   }
   PlistArray entries;
   for (const PlistValue& entry : *host.entries().asArray()) entries.push_back(recordedEntry(entry));
-  return {{{"entries", PlistValue::array(std::move(entries))}}, {{"channels", PlistValue::array(std::move(channels))}}};
+  return {{{"entries", PlistValue::array(std::move(entries))}},
+          {{"channels", PlistValue::array(std::move(channels))}}};
 }
 
 }  // namespace tbdaily

@@ -54,8 +54,10 @@ class NvmeSource : public LiveSource {
   const NvmeController controller_;
 };
 
-NvmeController addController(LiveDiscovery& discovery, const std::string& name, const NvmeHealthPage& page) {
-  NvmeController controller{name, {}};
+NvmeController addController(LiveDiscovery& discovery, const std::string& recordedName,
+                             const NvmeHealthPage& page) {
+  NvmeController controller{recordedName, {}};
+  const std::string name = liveName(recordedName);
   for (std::size_t i = 0; i < kNvmeFigures.size(); ++i) {
     const auto value = nvmeFigure(kNvmeFigures[i], page);
     if (!value) continue;
@@ -78,7 +80,7 @@ std::vector<NvmeController> discoverNvme(LiveDiscovery& discovery, Recordings& r
     for (const std::string& name : names) {
       NvmeHealthPage page{};
       if (takeRecordedPage(entries.get(name), page))
-        controllers.push_back(addController(discovery, liveName(name), page));
+        controllers.push_back(addController(discovery, name, page));
       else
         noteOnce("the recording of the controller " + liveName(name) +
                  " is no health page of 512 bytes and is left out");

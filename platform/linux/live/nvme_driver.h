@@ -13,7 +13,7 @@ namespace tbdaily {
 
 // A controller whose page can be read, and the slot of each of its figures; none for one that it has not.
 struct NvmeController {
-  std::string name;  // "nvme0"
+  std::string name;  // "nvme0"; as it is recorded
   std::array<std::optional<Slot>, kNvmeFigures.size()> slots;
 };
 

@@ -55,8 +55,10 @@ Captured captureAnswers(Source& source) {
   Platform& services = source.platform.services();
   PlistDictionary answers;
   answers.set("DiskUsage", services.deviceAnswers.copyAnswer("DiskUsage"));
-  if (const auto build = services.deviceAnswers.currentOSBuildVersion()) answers.set("ProductBuildVersion", text(*build));
-  if (const auto multiUser = services.deviceAnswers.multiUserMode()) answers.set("MultiUser", PlistValue::boolean(*multiUser));
+  if (const auto build = services.deviceAnswers.currentOSBuildVersion())
+    answers.set("ProductBuildVersion", text(*build));
+  if (const auto multiUser = services.deviceAnswers.multiUserMode())
+    answers.set("MultiUser", PlistValue::boolean(*multiUser));
   const std::array<std::pair<std::string_view, std::string>, 4> named{
       {{"ProductVersion", services.logSubmission.currentOSVersion()},
        {"SystemIdentifier", services.logSubmission.systemIdentifier()},
@@ -82,8 +84,8 @@ Captured captureKernel(Source& source) {
 Captured captureApps(Source& source) {
   PlistArray bundles;
   for (const LiveApplication& application : liveApplications(source.host))
-    bundles.push_back(
-        PlistValue::dictionary({{"identifier", text(application.identifier)}, {"type", text(application.type)}}));
+    bundles.push_back(PlistValue::dictionary(
+        {{"identifier", text(application.identifier)}, {"type", text(application.type)}}));
   return {{{recording::kApps, {{"bundles", PlistValue::array(std::move(bundles))}}}}};
 }
 
@@ -100,7 +102,8 @@ Captured captureNvme(Source& source) {
   const NvmePages found = readNvmePages(LiveDiscovery(source.host.livePath("/"), readings));
   std::string unread;
   for (const std::string& name : found.unread) unread.append(unread.empty() ? "" : ", ").append(name);
-  if (!unread.empty()) return Failure{"the health of " + unread + " cannot be read, which takes the rights of root"};
+  if (!unread.empty())
+    return Failure{"the health of " + unread + " cannot be read, which takes the rights of root"};
   PlistDictionary controllers;
   for (const auto& [name, page] : found.pages)
     controllers.set(name, PlistValue::data(PlistData(page.begin(), page.end())));
@@ -141,10 +144,12 @@ class Capture {
     Source source(live);
     DeviceFolder folder;
     if (const int error = device_.files().makeFolder(recording::kFolder, folder); error != 0)
-      return tool_.fail(device_.files().place(recording::kFolder).native() + " cannot be made: " + errorText(error));
+      return tool_.fail(device_.files().place(recording::kFolder).native() +
+                        " cannot be made: " + errorText(error));
     std::vector<const Subject*> chosen;
     for (const Subject& subject : kSubjects) {
-      const bool isChosen = request.only.empty() || std::ranges::find(request.only, subject.name) != request.only.end();
+      const bool isChosen =
+          request.only.empty() || std::ranges::find(request.only, subject.name) != request.only.end();
       if (isChosen) chosen.push_back(&subject);
     }
     for (const Subject* subject : chosen) {
@@ -168,7 +173,8 @@ class Capture {
       const PlistWriteResult written = codec_.write(PlistValue::dictionary(root), PlistForm::Exact);
       const int error = written.ok ? folder.replaceFile(std::string(file), written.bytes) : EINVAL;
       if (error == 0) continue;
-      tool_.fail(folder.place(file).native() + " cannot be written: " + (written.ok ? errorText(error) : written.error));
+      tool_.fail(folder.place(file).native() +
+                 " cannot be written: " + (written.ok ? errorText(error) : written.error));
       return false;
     }
     // What is not known any more must not be reported as if it were of today.
@@ -195,8 +201,10 @@ class Capture {
       for (const auto& [file, recorded] : files_) json.add(file);
     };
     if (!tool_.printedAsJson(write)) {
-      for (const auto& [file, recorded] : files_) tool_.out().line(device_.files().place(Recordings::path(file)).native());
-      if (!request.to.empty() && unread_.empty()) tool_.out().line("replay it with: TBDAILY_ROOT=" + root + " tbdaily -f");
+      for (const auto& [file, recorded] : files_)
+        tool_.out().line(device_.files().place(Recordings::path(file)).native());
+      if (!request.to.empty() && unread_.empty())
+        tool_.out().line("replay it with: TBDAILY_ROOT=" + root + " tbdaily -f");
     }
     if (!reasons.empty()) tool_.fail(reasons + "; what was recorded of it is gone");
   }
@@ -211,12 +219,15 @@ class Capture {
 void runCapture(Tool& tool, const Request& request) {
   for (const std::string& name : request.only) {
     if (std::ranges::find(kSubjects, name, &Subject::name) == kSubjects.end())
-      return tool.fail("there is no recording \"" + name + "\"; there are registry, nvme, answers, kernel, apps, locale, clock",
+      return tool.fail("there is no recording \"" + name +
+                           "\"; there are registry, nvme, answers, kernel, apps, locale, clock",
                        kWrongUsage);
   }
   if (request.only.empty() == request.to.empty())
-    return tool.fail("say what to record into this device, --only NAME,..., or where to make a device of its own, --to DIR",
-                     kWrongUsage);
+    return tool.fail(
+        "say what to record into this device, --only NAME,..., or where to make a device of its own, --to "
+        "DIR",
+        kWrongUsage);
   if (!request.only.empty()) {
     if (!tool.hasUsableRoot()) return;
     const Host& device = tool.platform().host();
@@ -237,12 +248,16 @@ void addCaptureCommand(CLI::App& app, Tool& tool) {
   CLI::App* command = app.add_subcommand(
       "capture", "Record what the live host answers, so that this machine can be replayed anywhere");
   auto request = std::make_shared<Request>();
-  CLI::Option* only = command
-                          ->add_option("--only", request->only,
-                                       "Into this device: registry (with its hub), nvme, answers, kernel, apps, locale, clock")
-                          ->delimiter(',')
-                          ->type_name("NAME,...");
-  command->add_option("--to", request->to, "All of them, into a device of its own")->type_name("DIR")->excludes(only);
+  CLI::Option* only =
+      command
+          ->add_option(
+              "--only", request->only,
+              "Into this device: registry (with its hub), nvme, answers, kernel, apps, locale, clock")
+          ->delimiter(',')
+          ->type_name("NAME,...");
+  command->add_option("--to", request->to, "All of them, into a device of its own")
+      ->type_name("DIR")
+      ->excludes(only);
   command->add_flag("--replace", request->replace,
                     "Replace what is recorded; what cannot be read loses its recording");
   command->callback([&tool, request] { runCapture(tool, *request); });
