@@ -75,6 +75,12 @@ class LiveDrivers(unittest.TestCase):
         self.assertTrue(any("majorFaults" in key for key in keys), keys)
         self.assertFalse([key for key in keys if ".busyTime" in key and "nvme" not in key], keys)
 
+    def test_each_channel_has_a_sentence(self):
+        for name in self.sample():
+            self.assertRegex(self.device.tally("metrics", "--explain", name), r"^[A-Z].*\.$", name)
+        self.device.tally("metrics", "--explain", "moon", status=1)
+        self.device.tally("metrics", status=2)
+
     def test_a_captured_machine_is_replayed_as_it_was(self):
         elsewhere = self.device.base / "elsewhere"
         before = independent()

@@ -3,6 +3,7 @@
 #include <CLI/CLI.hpp>
 #include <cmath>
 
+#include "platform/linux/live/channel_meanings.h"
 #include "platform/number_text.h"
 #include "tools/tallyctl/metrics/advance.h"
 #include "tools/tallyctl/metrics/sampler.h"
@@ -55,6 +56,17 @@ void scale(Tool& tool, const std::vector<std::string>& words) {
   if (!std::isfinite(scaled)) {
     printError("the value cannot be converted: " + std::string(whyNotScaled(units[0], units[1])));
   }
+}
+
+void explain(Tool& tool, const std::string& name) {
+  const auto meaning = channelMeaning(name);
+  if (!meaning)
+    return tool.fail("nothing is known about the channel \"" + name +
+                     "\"; tallyctl metrics list shows those that there are");
+  if (tool.printedAsJson(PlistValue::dictionary(
+          {{"name", PlistValue::string(name)}, {"explanation", PlistValue::string(std::string(*meaning))}})))
+    return;
+  tool.out().line(std::string(*meaning));
 }
 
 void requireUsable(bool usable, const std::string& option, const std::string& expected) {
@@ -163,7 +175,17 @@ void addAdvance(CLI::App& metrics, Tool& tool) {
 
 void addMetricsCommand(CLI::App& app, Tool& tool) {
   CLI::App* metrics = app.add_subcommand("metrics", "Look at the channels of drivers and their values");
-  metrics->require_subcommand(1);
+  metrics->require_subcommand(0, 1);
+  auto name = std::make_shared<std::string>();
+  metrics
+      ->add_option("--explain", *name, "Say in one sentence what a channel of this machine's drivers means")
+      ->type_name("CHANNEL");
+  metrics->callback([&tool, metrics, name] {
+    if (!name->empty()) return explain(tool, *name);
+    if (metrics->get_subcommands().empty())
+      tool.fail("say what to show: list, sample, delta, watch, scale or advance (tallyctl metrics --help)",
+                kWrongUsage);
+  });
   addChannelCommand(*metrics, tool, "list", "Show the channels that drivers publish",
                     [&tool](const MetricsRequest& request) { list(tool, request); });
   addChannelCommand(*metrics, tool, "sample", "Show the values of this moment",
