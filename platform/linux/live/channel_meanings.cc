@@ -15,27 +15,36 @@ struct Meaning {
 
 constexpr std::array<Meaning, 47> kMeanings{{
     {"cpu", ".idle",
-     "How often the processor entered each idle state and how long it stayed; deeper states save more power and take longer to "
+     "How often the processor entered each idle state and how long it stayed; deeper states save more power "
+     "and take longer to "
      "leave."},
     {"cpu", ".time",
-     "How long the processor ran programs (user, nice) and the kernel (system), was idle, waited for disks (iowait), served "
+     "How long the processor ran programs (user, nice) and the kernel (system), was idle, waited for disks "
+     "(iowait), served "
      "interrupts (irq, softirq), and waited while its host ran other machines (steal)."},
     {"policy", ".frequency", "How long the processors of this policy ran at each frequency."},
-    {"pressure.cpu", ".some", "The time in which at least one task was ready to run and waited for a processor."},
-    {"pressure.cpu", ".full", "The time in which all tasks of a group that were ready to run waited for a processor."},
-    {"pressure.memory", ".some", "The time in which at least one task waited for memory to be freed or read back."},
+    {"pressure.cpu", ".some",
+     "The time in which at least one task was ready to run and waited for a processor."},
+    {"pressure.cpu", ".full",
+     "The time in which all tasks of a group that were ready to run waited for a processor."},
+    {"pressure.memory", ".some",
+     "The time in which at least one task waited for memory to be freed or read back."},
     {"pressure.memory", ".full", "The time in which no task could run because all waited for memory."},
     {"pressure.io", ".some", "The time in which at least one task waited for a disk."},
     {"pressure.io", ".full", "The time in which no task could run because all waited for disks."},
     {"memory.swappedIn", "", "Bytes that were read back from swap space since the machine was started."},
     {"memory.swappedOut", "", "Bytes that were moved out to swap space since the machine was started."},
-    {"memory.available", "", "What programs could take at this moment without swapping, as the kernel estimates it."},
+    {"memory.available", "",
+     "What programs could take at this moment without swapping, as the kernel estimates it."},
     {"memory.majorFaults", "", "How often a program waited for a page that had to be read from a disk."},
     {"memory.outOfMemoryKills", "", "How many programs the kernel ended because memory had run out."},
-    {"memory.corrected", "", "Errors of the memory that were put right; a growing number foretells others that are not."},
+    {"memory.corrected", "",
+     "Errors of the memory that were put right; a growing number foretells others that are not."},
     {"memory.uncorrected", "", "Errors of the memory that could not be put right: data were lost."},
-    {"disk.", "readBytes", "Bytes that were read from the disk, or from all disks, since the machine was started."},
-    {"disk.", "writtenBytes", "Bytes that were written to the disk, or to all disks, since the machine was started."},
+    {"disk.", "readBytes",
+     "Bytes that were read from the disk, or from all disks, since the machine was started."},
+    {"disk.", "writtenBytes",
+     "Bytes that were written to the disk, or to all disks, since the machine was started."},
     {"disk.", "reads", "Reads that the disk, or all disks, finished."},
     {"disk.", "writes", "Writes that the disk, or all disks, finished."},
     {"disk.", "discards", "How often blocks were given back to the disk as unused."},
@@ -48,10 +57,14 @@ constexpr std::array<Meaning, 47> kMeanings{{
     {"net.", "errors", "Packets that were damaged or could not be sent, in both directions."},
     {"net.", "drops", "Packets that were thrown away, in both directions, most often for want of room."},
     {"thermal.", ".temperature", "The temperature of a zone by which the kernel decides when to cool."},
-    {"sensors.", "", "What a monitoring chip measures: a temperature, voltage, current, power, energy, or the turns of a fan."},
-    {"power.", ".energy", "Energy that this part of the processor used; the count begins again at 0 when it is full."},
+    {"sensors.", "",
+     "What a monitoring chip measures: a temperature, voltage, current, power, energy, or the turns of a "
+     "fan."},
+    {"power.", ".energy",
+     "Energy that this part of the processor used; the count begins again at 0 when it is full."},
     {"nvme", ".criticalWarning",
-     "Warnings of the drive as bits: 1 spare is low, 2 too hot or too cold, 4 unreliable, 8 read only, 16 its backup of volatile "
+     "Warnings of the drive as bits: 1 spare is low, 2 too hot or too cold, 4 unreliable, 8 read only, 16 "
+     "its backup of volatile "
      "memory failed, 32 persistent memory is read only."},
     {"nvme", ".availableSpare", "Spare blocks that are left, in percent."},
     {"nvme", ".spareThreshold", "The percentage of spare below which the drive warns."},

@@ -151,7 +151,7 @@ std::optional<std::string> LiveDiscovery::name(const std::string& file) {
 }
 
 std::optional<Slot> LiveDiscovery::number(const std::string& file, NumberRange range) {
-  return cell(file, {.range = range});
+  return cell(file, {.range = range, .isAlone = true});
 }
 
 std::optional<Slot> LiveDiscovery::cell(const std::string& file, TextCell cell) {

@@ -192,6 +192,11 @@ TEST_F(LiveHostTest, WhatIsNoNumberOfItsRangeIsLeftOutAndOddNamesAreShown) {
   putDisk("bad\xFF\n", "1");
   putDisk("bad\xFE\n", "1");
   put("/proc/pressure/cpu", "some total=-5\nfull total=\n");
+  for (const auto& [zone, temperature] :
+       {std::pair{"0", "5 6"}, {"1", "5\n6"}, {"2", ""}, {"3", "5.0"}, {"4", "0x5"}}) {
+    put(std::string("/sys/class/thermal/thermal_zone") + zone + "/type", "soc");
+    put(std::string("/sys/class/thermal/thermal_zone") + zone + "/temp", temperature);
+  }
   put("/sys/class/hwmon/hwmon0/name", "\n");
   put("/sys/class/hwmon/hwmon0/in1_input", "5");
   open();

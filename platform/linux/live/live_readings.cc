@@ -102,6 +102,7 @@ std::optional<std::int64_t> liveNumber(std::string_view text, NumberRange range)
 }
 
 std::optional<std::int64_t> cellNumber(std::string_view text, const TextCell& cell) {
+  if (cell.isAlone) return liveNumber(text, cell.range);
   while (!text.empty()) {
     std::string_view line = takeLine(text);
     if (cell.line.empty() || takeWord(line) == cell.line) return liveNumber(cellText(line, cell), cell.range);
@@ -111,6 +112,11 @@ std::optional<std::int64_t> cellNumber(std::string_view text, const TextCell& ce
 
 void readCells(std::string_view text, const std::vector<TextCell>& cells, Readings& readings) {
   if (cells.empty()) return;
+  if (cells.front().isAlone) {
+    const auto number = liveNumber(text, cells.front().range);
+    if (number) readings[cells.front().slot] = *number;
+    return;
+  }
   const auto groupEnd = [&cells](std::size_t first) {
     std::size_t end = first;
     while (end < cells.size() && cells[end].line == cells[first].line) ++end;

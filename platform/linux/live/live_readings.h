@@ -40,6 +40,7 @@ struct TextCell {
   std::size_t word = 0;
   std::string_view label = {};  // "total=": what the number follows, in place of counting words
   NumberRange range = NumberRange::Counter;
+  bool isAlone = false;  // the text holds nothing else
   Slot slot = 0;
 };
 

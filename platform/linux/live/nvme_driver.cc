@@ -14,8 +14,8 @@ namespace {
 
 // The controllers of the recording; nothing without one.
 std::optional<PlistValue> recordedControllers(Recordings& recordings) {
-  if (!recordings.has(recording::kNvme)) return std::nullopt;
-  return recordings.entry(recording::kNvme, "controllers");
+  PlistValue controllers = recordings.entry(recording::kNvme, "controllers");
+  return controllers.asDictionary() != nullptr ? std::optional(std::move(controllers)) : std::nullopt;
 }
 
 bool takeRecordedPage(const PlistValue& recorded, NvmeHealthPage& page) {
