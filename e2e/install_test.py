@@ -117,6 +117,16 @@ class InstalledPackage(unittest.TestCase):
         expected = [f'{c["driver"]} {c["name"] or "?"} = {c["value"]} {c["unitLabel"] or ""}' for c in channels]
         self.assertCountEqual(printed.splitlines(), expected)
 
+    def test_example_of_a_live_machine_shows_its_idle_states_and_energy(self):
+        run("cmake", "-S", EXAMPLE.parent / "idle_and_energy", "-B", self.folder / "idle", f"-DCMAKE_PREFIX_PATH={self.prefix}")
+        run("cmake", "--build", self.folder / "idle")
+        device = self.folder / "no device"
+        device.mkdir()
+        environment = {**os.environ, "TBDAILY_ROOT": str(device), "TBDAILY_LIVE": "1"}
+        shown = subprocess.run([self.folder / "idle" / "idle_and_energy"], capture_output=True, text=True, env=environment)
+        if any(pathlib.Path("/sys/devices/system/cpu").glob("cpu0/cpuidle/state*")):
+            self.assertRegex(shown.stdout, r"(?m)^cpu0\.idle:( \S+ \d+ ms)+$")
+
     def test_project_of_cmake_3_16_links_the_core_alone_static_and_shared_without_expat(self):
         done = self.configured("core", "-DCOMPONENTS=core", "-DCMAKE_DISABLE_FIND_PACKAGE_EXPAT=ON")
         self.assertEqual(done.returncode, 0, done.stderr)
