@@ -117,6 +117,13 @@ class Seeds:
         lines = "s\tcom.velmora.a\t20000\t-5\nd\tk\t3\t86399\t1e2\r\n\nd\tk\t3\t0\tnan\ns\tk\t-1\t9223372036854775807"
         self.add("import_fuzz", "lines", lines.encode())
 
+    def machines(self):
+        files = {0: b"cpu  1 2 3 4 5 6 7 8 0 0\ncpu0 1 2 3 4 5 6 7 8 0 0\n", 1: b"pswpin 1\npgmajfault 2\n", 2: b"MemAvailable: 3 kB\n",
+                 3: b"some avg10=0.00 total=5\nfull avg10=0.00 total=4\n", 5: b"POLL\n", 6: b"7\n", 7: b"8\n",
+                 11: b"3400000 5\n800000 6\n", 13: b"", 14: b"1 0 2 0 3 0 4 0 0 5 0\n", 16: b"99\n", 19: b"soc\n", 20: b"-40000\n"}
+        written = b"".join(bytes([place, 1]) + section(text) for place, text in files.items())
+        self.add("live_fuzz", "machine", bytes([len(files)]) + written + bytes([len(files)]) + written)
+
     def days(self):
         def named(name, most):
             return section(small(self.lists[name], most))
@@ -130,7 +137,7 @@ class Seeds:
 
 def main():
     seeds = Seeds(sys.argv[1], pathlib.Path(sys.argv[2]), pathlib.Path(sys.argv[3]))
-    for make in (seeds.codecs, seeds.storage, seeds.values, seeds.channels, seeds.streams, seeds.days):
+    for make in (seeds.codecs, seeds.storage, seeds.values, seeds.channels, seeds.streams, seeds.days, seeds.machines):
         make()
 
 
