@@ -7,6 +7,7 @@
 
 #include "platform/byte_reader.h"
 #include "platform/linux/host_test_support.h"
+#include "testing/allocations.h"
 
 namespace tbdaily {
 namespace {
@@ -219,13 +220,19 @@ TEST_F(LiveHostTest, ManyProcessorsComeByTheirNumberAndNeedNoMoreFilesThanThereA
     put(state + "time", "1");
   }
   put("/proc/stat", stat);
-  const testing::ResourceLimit fewFiles(RLIMIT_NOFILE, 64);
-  open();
-  sample();
+  {
+    const testing::ResourceLimit fewFiles(RLIMIT_NOFILE, 64);
+    open();
+    put("/sys/devices/system/cpu/cpu255/cpuidle/state0/usage", "300");
+    sample();
+  }
   ASSERT_EQ(names.size(), 512U);
   EXPECT_THAT(names[2], HasSubstr("cpu2.idle"));
   EXPECT_THAT(names[10], HasSubstr("cpu10.idle"));
-  EXPECT_EQ(of("cpu255.idle").at(0).words[1], 255);
+  const std::size_t before = testing::allocations();
+  sample();
+  EXPECT_EQ(testing::allocations(), before);
+  EXPECT_EQ(of("cpu255.idle").at(0).words[1], 300);
   EXPECT_EQ(of("cpu255.time").at(0).words[2], 2550000);
 }
 

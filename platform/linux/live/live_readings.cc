@@ -52,6 +52,14 @@ void raiseFileLimit() {
   static_cast<void>(isRaised);
 }
 
+// Whether so many files are open that the rest is needed for what is opened and closed again.
+bool isNearFileLimit(int descriptor) {
+  constexpr rlim_t kSpareFiles = 32;
+  rlimit limit{};
+  return ::getrlimit(RLIMIT_NOFILE, &limit) == 0 &&
+         static_cast<rlim_t>(descriptor) + kSpareFiles >= limit.rlim_cur;
+}
+
 FileDescriptor openSource(const std::filesystem::path& file) {
   return FileDescriptor(::open(file.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
 }
@@ -62,6 +70,7 @@ class TextSource : public LiveSource {
       : file_(std::move(file)), cells_(std::move(cells)), text_(kUsualText, '\0') {
     raiseFileLimit();
     descriptor_ = openSource(file_);
+    if (descriptor_.isOpen() && isNearFileLimit(descriptor_.get())) descriptor_.reset();
     // As long as it is now, with room to grow: later reads allocate nothing.
     if (const auto now = liveText(file_)) text_.resize(std::max(kUsualText, now->size() * 2));
   }
