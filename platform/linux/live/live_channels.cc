@@ -127,7 +127,9 @@ std::vector<std::string> LiveDiscovery::numbered(std::string_view folder, std::s
     return !std::ranges::all_of(number, [](char c) { return c >= '0' && c <= '9'; });
   });
   // Shorter numbers are lower ones: the kernel writes no leading zeros.
-  std::ranges::stable_sort(found, {}, &std::string::size);
+  std::ranges::sort(found, [](const std::string& a, const std::string& b) {
+    return a.size() != b.size() ? a.size() < b.size() : a < b;
+  });
   return found;
 }
 
