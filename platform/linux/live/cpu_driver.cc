@@ -1,7 +1,6 @@
 // Idle states, time and frequencies of the processors.
 #include <unistd.h>
 
-#include <algorithm>
 #include <array>
 #include <charconv>
 #include <numeric>
@@ -91,9 +90,7 @@ std::vector<std::string> processorsWithTimes(LiveDiscovery& discovery) {
     if (word.starts_with("cpu") && liveNumber(word.substr(3), NumberRange::Counter))
       processors.emplace_back(word);
   }
-  std::ranges::sort(processors, [](const std::string& a, const std::string& b) {
-    return a.size() != b.size() ? a.size() < b.size() : a < b;
-  });
+  sortByNumber(processors);
   return processors;
 }
 

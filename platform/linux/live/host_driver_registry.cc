@@ -7,14 +7,17 @@ const LiveHost& HostDriverRegistry::liveHost() {
   return *liveHost_;
 }
 
+bool HostDriverRegistry::isLive() {
+  return host_.live() && RecordedDriverRegistry::currentEntries().asArray() == nullptr;
+}
+
 PlistValue HostDriverRegistry::currentEntries() {
-  PlistValue recorded = RecordedDriverRegistry::currentEntries();
-  return recorded.asArray() != nullptr || !host_.live() ? recorded : liveHost().entries();
+  return isLive() ? liveHost().entries() : RecordedDriverRegistry::currentEntries();
 }
 
 std::unique_ptr<UserClient> HostDriverRegistry::makeClient(const PlistDictionary& client) {
-  if (client.get("kind").asString() != LiveHost::kHubKind) return RecordedDriverRegistry::makeClient(client);
-  return host_.live() ? makeHubClient({}, liveHost().openValues()) : nullptr;
+  const bool isLiveHub = isLive() && client.get("kind").asString() == LiveHost::kHubKind;
+  return isLiveHub ? makeHubClient({}, liveHost().openValues()) : RecordedDriverRegistry::makeClient(client);
 }
 
 }  // namespace tbdaily

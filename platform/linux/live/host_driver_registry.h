@@ -21,6 +21,8 @@ class HostDriverRegistry : public RecordedDriverRegistry {
   std::unique_ptr<UserClient> makeClient(const PlistDictionary& client) override;
 
  private:
+  // Whether the host's own drivers answer: nothing is recorded, and no recording opens them.
+  bool isLive();
   // Looks through the host when it is first asked for.
   const LiveHost& liveHost();
 
