@@ -5,7 +5,7 @@
 #include <cstdint>
 #include <string_view>
 
-#include "platform/linux/live/live_channels.h"
+#include "platform/linux/live/live_discovery.h"
 
 namespace tbdaily {
 

@@ -7,7 +7,7 @@
 #include <unordered_map>
 #include <vector>
 
-#include "platform/linux/live/live_channels.h"
+#include "platform/linux/live/live_discovery.h"
 #include "platform/linux/live/nvme_driver.h"
 #include "platform/linux/registry/hub_client.h"
 #include "platform/plist_value.h"

@@ -6,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "platform/linux/live/live_discovery.h"
 #include "platform/linux/live/nvme_health.h"
 #include "platform/linux/replay/recordings.h"
 
