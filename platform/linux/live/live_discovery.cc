@@ -89,14 +89,12 @@ Slot LiveDiscovery::slot(std::int64_t value) {
 void LiveDiscovery::addSimple(std::string_view group, std::string_view subgroup, std::string name,
                               LiveUnit unit, LiveWord value, std::string_view stem) {
   // Those of the group stand together, at the end.
-  const auto isTaken = [&] {
-    for (auto other = channels_.rbegin(); other != channels_.rend(); ++other) {
-      if (other->group != group || other->subgroup != subgroup) break;
-      if (other->name == name) return true;
-    }
-    return false;
+  const auto isOfGroup = [&](const LiveChannel& other) {
+    return other.group == group && other.subgroup == subgroup;
   };
-  while (isTaken()) name.append(".").append(stem);
+  const auto hasName = [&](const LiveChannel& other) { return other.name == name; };
+  const auto end = std::find_if_not(channels_.rbegin(), channels_.rend(), isOfGroup);
+  while (std::any_of(channels_.rbegin(), end, hasName)) name.append(".").append(stem);
   LiveChannel channel{std::string(group), std::string(subgroup), std::move(name), unit, false, {}};
   channel.elements.push_back({0, std::move(value), {}});
   add(std::move(channel));
