@@ -33,10 +33,10 @@ def cases(shop):
     if not sample.exists():
         subprocess.run([shop.program("tallyctl"), "--root", sample, "init"], check=True, stdout=subprocess.DEVNULL)
     loaded = lines / "counted"
+    report = shop.folder / "counted-report.plist"
+    shop.job(day, "-d")  # once for the day, whatever ran before; what it leaves goes with what earlier runs left
     subprocess.run(["rm", "-rf", loaded, day / "var/mobile/Library/Logs", day / "var/log", day / "var/run"], check=True)
     loaded.mkdir()
-    report = shop.folder / "counted-report.plist"
-    shop.job(day, "-d")  # once for the day, whatever ran before
     yield "the report of a small day", day, ["tbdaily", "-f"]
     yield "a day already done", day, ["tbdaily", "-d"]
     (log,) = (day / "var/mobile/Library/Logs/Pending").glob("*.193")
