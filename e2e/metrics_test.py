@@ -1,12 +1,17 @@
 """tallyctl metrics on a device made by hand, against a model."""
 
+import fcntl
 import json
 import os
 import pathlib
 import plistlib
+import pty
+import re
+import select
 import signal
 import struct
 import subprocess
+import termios
 import unittest
 
 from harness import BIN, Device
@@ -70,7 +75,7 @@ class Metrics(unittest.TestCase):
         self.assertEqual(self.metrics("scale", "1500", str(NS), str(SECONDS)), "1.5e-06\n")
         for wanted in (r"\n    Rails\n +0xff +simple +ns +1 +element +categories 0x8001\n",
                        r"\ndisk\\x1b\[2J <id x <id 0x7f{15}>\n", r"\n +0xff +250 +ns\n",
-                       r"\n +OFF +3 +3 s +75\.0% +<- current\n", r"\n +0 +10 +3 +1 +9 +12 +#+\n",
+                       r"\n +OFF +3 +3000000000 +ns +3\.00 s +75\.0% +<- current\n", r"\n +0 +10 +3 +1 +9 +12 +#+\n",
                        r"\n +\[0\] +1 +2 +- +4 +5 +0 +0 +0\n"):
             self.assertRegex(text, wanted)
         self.assertNotIn("\x1b", text)
@@ -109,6 +114,52 @@ class Metrics(unittest.TestCase):
             process.stdout.readline()
             end(process)
             self.assertEqual((process.wait(timeout=60), process.stderr.read()), (0, ""))
+
+    def test_delta_for_people_has_what_changed(self):
+        rows = [row for row in CHANNELS if row[5] != 9]
+        self.registry(rows)
+        process = self.start("delta", "--interval", "2")
+        self.wait_until_between_samples(process)
+        self.hub(1)
+        output, errors = process.communicate(timeout=60)
+        self.assertEqual((process.returncode, errors), (0, ""))
+        for channel in model("delta", rows):
+            if channel["format"] == 1 and channel["name"]:
+                self.assertEqual(f" {channel['name']} " in output, bool(channel["value"]), (channel, output))
+        self.assertRegex(output, r"\n\d+ of \d+ channels changed within 2\.\d* s\n\Z")
+
+    def test_watch_on_a_screen(self):
+        master, slave = pty.openpty()
+        self.addCleanup(os.close, master)
+        watch = subprocess.Popen([BIN / "tallyctl", "metrics", "watch", "--interval", "0.1"], stdin=slave, stdout=slave,
+                                 stderr=subprocess.PIPE, env=dict(self.device.env, TERM="xterm", LC_ALL="C.UTF-8"))
+        self.addCleanup(lambda: (watch.kill(), watch.communicate()))
+        os.close(slave)
+
+        def sees(pattern, keys=b""):
+            os.write(master, keys)
+            shown = b""
+            for height in range(20, 320):
+                while select.select([master], [], [], 0.1)[0]:
+                    shown += os.read(master, 65536)
+                    if re.search(pattern, shown):
+                        return shown
+                # All of the screen is drawn anew in a window of another size.
+                fcntl.ioctl(master, termios.TIOCSWINSZ, struct.pack("HHHH", height, 120, 0, 0))
+                watch.send_signal(signal.SIGWINCH)
+            return self.fail((pattern, shown[-4000:]))
+
+        sees(rb"\x1b\[\?1049h")  # the alternate screen
+        self.assertNotIn(b"\x1b[2J <id", sees(rb"disk\\x1b\[2J <id"))
+        sees(rb"reads.*9223372036854775807 +9\.22 E")
+        sees(rb"1-2 of 2", b"/READS\r")
+        sees(rb"PAUSED", b" ")
+        self.hub(1)
+        sees(rb"reads.*-9223372036854775807", b" ")
+        os.write(master, b"q")
+        self.assertEqual(watch.wait(timeout=60), 0)
+        self.assertIn(b"\x1b[?1049l", os.read(master, 65536))
+        self.assertEqual(watch.stderr.read(), b"")
 
     def test_filters(self):
         for driver in (DISK[0], display(DISK), str(DISK[1]), hex(DISK[1])):

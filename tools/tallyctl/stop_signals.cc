@@ -59,6 +59,14 @@ bool StopSignals::haveCome() const {
 }
 
 WaitEnd StopSignals::sleepUntil(std::chrono::steady_clock::time_point time) const {
+  return sleep(time, false);
+}
+
+WaitEnd StopSignals::sleepUntilInput(std::chrono::steady_clock::time_point time) const {
+  return sleep(time, true);
+}
+
+WaitEnd StopSignals::sleep(std::chrono::steady_clock::time_point time, bool alsoInput) const {
   using std::chrono::nanoseconds, std::chrono::seconds;
   const HeldSignals held;
   while (!haveCome()) {
@@ -66,10 +74,13 @@ WaitEnd StopSignals::sleepUntil(std::chrono::steady_clock::time_point time) cons
         std::chrono::duration_cast<nanoseconds>(time - std::chrono::steady_clock::now()), nanoseconds(0));
     const auto whole = std::chrono::floor<seconds>(left);
     const timespec timeout{whole.count(), (left - whole).count()};
-    pollfd output{STDOUT_FILENO, 0, 0};  // asks for nothing: a closed pipe reports itself
-    const int ready = ::ppoll(&output, 1, &timeout, &held.before());
-    if (ready > 0) return WaitEnd::ReaderGone;
+    // Asks nothing of the output: a closed pipe reports itself.
+    std::array<pollfd, 2> files{{{STDOUT_FILENO, 0, 0}, {STDIN_FILENO, POLLIN, 0}}};
+    const int ready = ::ppoll(files.data(), alsoInput ? 2 : 1, &timeout, &held.before());
+    if (ready > 0)
+      return files[0].revents == 0 && files[1].revents == POLLIN ? WaitEnd::Input : WaitEnd::ReaderGone;
     if (ready == 0 || errno != EINTR) return WaitEnd::Done;
+    if (alsoInput && !haveCome()) return WaitEnd::Input;
   }
   return WaitEnd::Stopped;
 }

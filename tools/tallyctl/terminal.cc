@@ -86,12 +86,6 @@ ShownText Terminal::styled(const ShownText& text, Style style) const {
   return styled;
 }
 
-ShownText Terminal::clearing() {
-  ShownText clearing;
-  clearing.bytes_ = "\x1b[H\x1b[2J";
-  return clearing;
-}
-
 std::string Terminal::bar(double value, double maximum, std::size_t width) const {
   if (!(value > 0) || !(maximum > 0)) return {};
   const double share = std::min(value / maximum, 1.0) * static_cast<double>(width);
@@ -112,19 +106,25 @@ std::string sixDigits(double value) {
   return {buffer.data(), static_cast<std::size_t>(length)};
 }
 
-void Table::print(Terminal& out) const {
+std::vector<ShownText> Table::lines() const {
   std::vector<std::size_t> widths(columns_.size(), 0);
   for (const auto& row : rows_) {
     for (std::size_t i = 0; i < row.size(); ++i) widths[i] = std::max(widths[i], row[i].columns());
   }
+  std::vector<ShownText> lines;
   for (const auto& row : rows_) {
     ShownText text = "  ";
     for (std::size_t i = 0; i < row.size(); ++i) {
       const std::string padding(widths[i] - row[i].columns(), ' ');
       text += (columns_[i] == Align::Right ? padding + row[i] : row[i] + padding) + "  ";
     }
-    out.line(text.withoutTrailingSpaces());
+    lines.push_back(text.withoutTrailingSpaces());
   }
+  return lines;
+}
+
+void Table::print(Terminal& out) const {
+  for (const ShownText& text : lines()) out.line(text);
 }
 
 Progress::Progress(std::string label, std::uint64_t total)

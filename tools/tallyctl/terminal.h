@@ -46,8 +46,6 @@ class Terminal {
   void line(const ShownText& text = {});
   // The text with the style's colour, or as it is.
   ShownText styled(const ShownText& text, Style style) const;
-  // What makes a terminal forget the lines that it shows.
-  static ShownText clearing();
 
   // A bar of `value` out of `maximum` in at most `width` columns: block characters where they can be shown,
   // else '#'. A value that is not 0 shows at least one mark.
@@ -74,6 +72,7 @@ class Table {
   explicit Table(std::vector<Align> columns) : columns_(std::move(columns)) {}
   void add(std::vector<ShownText> cells) { rows_.push_back(std::move(cells)); }
   // Each row indented by two columns, cells two apart.
+  std::vector<ShownText> lines() const;
   void print(Terminal& out) const;
 
  private:

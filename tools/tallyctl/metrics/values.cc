@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cmath>
 
 namespace tbdaily {
 
@@ -118,16 +117,6 @@ std::optional<std::vector<ChannelValues>> readChannels(const ChannelCollection* 
   });
   if (status != 0) return std::nullopt;
   return channels;
-}
-
-std::optional<double> residencySeconds(const ChannelValues& channel, std::int64_t residency) {
-  if (channel.unit == kKdReportInvalid || residency == kKdReportInvalid) return std::nullopt;
-  // Scaling takes unsigned values; a residency that went back between two samples is negative.
-  const bool negative = residency < 0;
-  const auto magnitude = static_cast<std::uint64_t>(negative ? -residency : residency);
-  const double seconds = KdReportScaleValue(magnitude, channel.unit, kKdReportSeconds);
-  if (!std::isfinite(seconds)) return std::nullopt;
-  return negative ? -seconds : seconds;
 }
 
 }  // namespace tbdaily

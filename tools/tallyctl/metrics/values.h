@@ -58,7 +58,4 @@ enum class ChannelContents : std::uint8_t { Description, Values };
 std::optional<std::vector<ChannelValues>> readChannels(const kdreport::ChannelCollection* collection,
                                                        ChannelContents contents);
 
-// A residency in seconds, when the channel's unit measures time in a scale that has a number.
-std::optional<double> residencySeconds(const ChannelValues& channel, std::int64_t residency);
-
 }  // namespace tbdaily

@@ -3,9 +3,10 @@
 #include <gmock/gmock.h>
 
 #include "drivermetrics/metrics_test_support.h"
+#include "tools/tallyctl/metrics/channel_text.h"
 #include "tools/tallyctl/metrics/json.h"
 #include "tools/tallyctl/metrics/selection.h"
-#include "tools/tallyctl/metrics/view.h"
+#include "tools/tallyctl/terminal.h"
 
 namespace tbdaily::testing {
 namespace {
@@ -67,14 +68,6 @@ TEST(MetricsValuesTest, AsManyStatesAsThereCanBe) {
   EXPECT_EQ(channels[0].states[0].name, std::nullopt);
   EXPECT_EQ(channels[0].states.back().dutyCycle, 65536.0 / (65534 + 65536));
   EXPECT_EQ(channels[0].currentState, 65534U);
-}
-
-TEST(MetricsValuesTest, ResidencyInSeconds) {
-  ChannelValues channel;
-  EXPECT_EQ(residencySeconds(channel, 1), std::nullopt);
-  channel.unit = kNanoseconds;
-  EXPECT_EQ(residencySeconds(channel, 2'500'000'000), 2.5);
-  EXPECT_EQ(residencySeconds(channel, kKdReportInvalid), std::nullopt);
 }
 
 TEST(MetricsValuesTest, NamesThatAreNotAloneAreWrittenWhole) {
