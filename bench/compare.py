@@ -10,15 +10,19 @@ say nothing.
 """
 
 import argparse
+import fcntl
 import json
 import os
 import pathlib
 import plistlib
+import pty
 import re
 import shutil
 import sqlite3
+import struct
 import subprocess
 import sys
+import termios
 import time
 
 PEERS = pathlib.Path(__file__).resolve().parent / "peers"
@@ -353,8 +357,45 @@ def long_messages(shop, table):
             table.row(17, "the reply", "", f"{one:.2f} s", "at most 1 s", one <= 1)
 
 
+def live_host(shop, table):
+    processors = [8, 64, 256]
+    times = shop.bench("live_bench", "")
+    own = [times[f"sampling/{count}"] for count in processors]
+    ratios = ", ".join(f"{time / times[f'readingTheFiles/{count}']:.2f}" for time, count in zip(own, processors))
+    table.row(19, "a sampling of a live host with 8, 64, 256 processors", "reading the same files",
+              f"{ratios} times ({', '.join(f'{time / 1e6:.2f}' for time in own)} ms)", "8: at most 3 ms", own[0] <= 3e6)
+    flat = spread(times, "sampling", processors[1:])
+    table.row(19, "a sampling with 64 and 256", "each other, a processor", f"within {flat:.2f}", "within 1.5", flat <= 1.5)
+    each = sample_of_a_watch(shop)
+    table.row(19, "a second of `tallyctl metrics watch --interval 1` on a screen, this machine", "a second of one core",
+              f"{each * 100:.2f} %", "at most 0.5 %", each <= 0.005)
+
+
+def sample_of_a_watch(shop):
+    """Processor seconds that each sample of a watch on a terminal takes."""
+    def seconds(samples):
+        master, slave = pty.openpty()
+        fcntl.ioctl(slave, termios.TIOCSWINSZ, struct.pack("HHHH", 50, 120, 0, 0))
+        watch = subprocess.Popen([shop.program("tallyctl"), "metrics", "watch", "--interval", "0.05", "--count", str(samples)],
+                                 stdin=slave, stdout=slave, env=dict(os.environ, TERM="xterm", TBDAILY_ROOT=str(shop.folder)))
+        os.close(slave)
+        try:
+            while os.read(master, 65536):
+                pass
+        except OSError:  # how a terminal says that nobody is there any more
+            pass
+        os.close(master)
+        _, status, used = os.wait4(watch.pid, 0)
+        watch.returncode = status
+        if status != 0:
+            raise Differs("a watch ended with another status than 0")
+        return used.ru_utime + used.ru_stime
+    samples = shop.size(200)
+    return (seconds(samples + 1) - seconds(1)) / samples
+
+
 ROWS = [daily_report, many_days, property_lists, statistics_buffers, snapshots, channels, kernel_chunks, prefixes, starts, load,
-        preferences, long_messages]
+        preferences, long_messages, live_host]
 
 
 def main():

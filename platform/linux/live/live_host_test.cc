@@ -185,6 +185,11 @@ TEST_F(LiveHostTest, WhatVanishesOrFailsKeepsItsLastValueAndStatesShowWhoMoved) 
   EXPECT_EQ(of("cpu0.time").at(0).words[2], 10000);
   EXPECT_EQ(of("cpu0.time").at(3).words[2], 40000);
   EXPECT_EQ(value("disk.readBytes"), 11 * 512);
+  // A text that outgrew its room ends within a number.
+  put("/proc/stat", "cpu0 1 2 3 4 5 6 7 5" + std::string(4067, '\n') + "cpu1 9999999 2 3 4 5 6 7 8\n");
+  sample();
+  EXPECT_EQ(of("cpu0.time").at(7).words[2], 50000);
+  EXPECT_EQ(of("cpu1.time").at(0).words[2], 10000);
 }
 
 TEST_F(LiveHostTest, WhatIsNoNumberOfItsRangeIsLeftOutAndOddNamesAreShown) {

@@ -15,6 +15,7 @@ namespace tbdaily {
 namespace {
 
 constexpr std::size_t kUsualText = 4096, kLongestText = std::size_t{4} << 20;
+constexpr ssize_t kShortText = kUsualText / 2;
 
 bool isSpace(char c) {
   return c == ' ' || c == '\t' || c == '\n' || c == '\r';
@@ -84,10 +85,14 @@ class TextSource : public LiveSource {
           ::pread(file, text_.data() + filled, text_.size() - filled, static_cast<off_t>(filled));
       if (count < 0 && errno == EINTR) continue;
       if (count < 0) return;
-      if (count == 0) break;
       filled += static_cast<std::size_t>(count);
+      // The kernel hands out whole lines until a page is full: what ends before its half is all.
+      if (count <= kShortText) break;
     }
-    readCells({text_.data(), filled}, cells_, readings);
+    std::string_view text(text_.data(), filled);
+    // Longer than there is room for: the line that was cut says nothing.
+    if (filled == text_.size()) text = text.substr(0, text.rfind('\n') + 1);
+    readCells(text, cells_, readings);
   }
 
  private:
