@@ -188,8 +188,9 @@ class CursesScreen : public WatchScreen {
     const int numbers = widths_.figure + widths_.human + widths_.rate + 4 * kGap;
     const int name = std::min(widths_.name, std::max(COLS - numbers, 16));
     drawTitle(name);
-    for (int i = 0; i < room() && top_ + i < static_cast<int>(rows_.size()); ++i)
-      drawRow(kTitleLines + i, rows_[static_cast<std::size_t>(top_ + i)], name);
+    int line = kTitleLines;
+    for (auto i = static_cast<std::size_t>(top_); i < rows_.size() && line < kTitleLines + room(); ++i)
+      drawRow(line++, rows_[i], name);
     drawKeys();
     ::refresh();
   }
