@@ -5,12 +5,15 @@
 
 #include <algorithm>
 #include <array>
+#include <clocale>
 #include <cmath>
 #include <cstdio>
 #include <cstdlib>
+#include <cwchar>
 #include <utility>
 
 #include "platform/utf8.h"
+#include "tools/tallyctl/sizes.h"
 
 namespace tbdaily {
 
@@ -42,6 +45,8 @@ constexpr auto kRedraw = std::chrono::milliseconds(100);
 }  // namespace
 
 Terminal::Terminal() {
+  // How wide characters are; texts are UTF-8 wherever they are shown.
+  if (std::setlocale(LC_CTYPE, "C.UTF-8") == nullptr) std::setlocale(LC_CTYPE, "");
   if (::isatty(STDOUT_FILENO) == 0) return;
   const bool capable = environment("TERM") != "dumb" && !environment("TERM").empty();
   colour_ = capable && environment("NO_COLOR").empty();
@@ -59,8 +64,26 @@ ShownText ShownText::lines(std::string_view text) {
 }
 
 std::size_t ShownText::columns() const {
-  return static_cast<std::size_t>(
-      std::count_if(bytes_.begin(), bytes_.end(), [](char c) { return !continuesCharacter(c); }));
+  std::size_t columns = 0;
+  std::string_view rest = bytes_;
+  std::mbstate_t state{};
+  while (!rest.empty()) {
+    // What the locale does not have takes a column a character.
+    wchar_t character = 0;
+    std::size_t length = static_cast<unsigned char>(rest[0]) < 0x80
+                             ? 1
+                             : std::mbrtowc(&character, rest.data(), rest.size(), &state);
+    const bool isKnown = length != 0 && length <= rest.size();
+    const int width = isKnown && character != 0 ? ::wcwidth(character) : 1;
+    if (!isKnown) {
+      state = {};
+      length = 1;
+      while (length < rest.size() && continuesCharacter(rest[length])) ++length;
+    }
+    columns += width > 0 ? static_cast<std::size_t>(width) : 0;
+    rest.remove_prefix(length);
+  }
+  return columns;
 }
 
 ShownText ShownText::withoutTrailingSpaces() const {
@@ -158,29 +181,39 @@ void Table::print(Terminal& out) const {
   for (const ShownText& text : lines()) out.line(text);
 }
 
-Progress::Progress(std::string label, std::uint64_t total)
+Progress::Progress(std::string label, Of what, std::uint64_t total)
     : label_(std::move(label)),
+      what_(what),
       total_(total),
       shown_(::isatty(STDERR_FILENO) != 0),
-      nextDraw_(std::chrono::steady_clock::now() + kFirstDraw) {}
+      begin_(std::chrono::steady_clock::now()),
+      nextDraw_(begin_ + kFirstDraw) {}
 
 Progress::~Progress() {
   if (drawn_) std::fputs("\r\x1b[K", stderr);
 }
 
 void Progress::at(std::uint64_t done) {
-  if (!shown_ || std::chrono::steady_clock::now() < nextDraw_) return;
-  nextDraw_ = std::chrono::steady_clock::now() + kRedraw;
+  const auto now = std::chrono::steady_clock::now();
+  if (!shown_ || now < nextDraw_) return;
+  nextDraw_ = now + kRedraw;
   drawn_ = true;
-  if (total_ == 0) {
-    std::fprintf(stderr, "\r%s: %llu MiB", label_.c_str(), static_cast<unsigned long long>(done >> 20));
-    return;
+  std::string line = label_;
+  if (total_ != 0) {
+    constexpr std::size_t kBarWidth = 30;
+    const std::uint64_t bounded = std::min(done, total_);
+    const auto filled = static_cast<std::size_t>(bounded * kBarWidth / total_);
+    line += " [" + std::string(filled, '#') + std::string(kBarWidth - filled, '.') + "] " +
+            std::to_string(bounded * 100 / total_) + " %";
   }
-  constexpr std::size_t kBarWidth = 30;
-  const auto filled = static_cast<std::size_t>(std::min(done, total_) * kBarWidth / total_);
-  std::fprintf(stderr, "\r%s [%s%s] %3llu %%", label_.c_str(), std::string(filled, '#').c_str(),
-               std::string(kBarWidth - filled, '.').c_str(),
-               static_cast<unsigned long long>(std::min(done, total_) * 100 / total_));
+  if (what_ == Of::Bytes) {
+    const double rate = static_cast<double>(done) / std::chrono::duration<double>(now - begin_).count();
+    line +=
+        (total_ == 0 ? ": " + sizeText(done) : "") + ", " + sizeText(static_cast<std::uint64_t>(rate)) + "/s";
+    if (total_ > done && rate > 0)
+      line += ", " + std::to_string(std::lround(static_cast<double>(total_ - done) / rate)) + " s left";
+  }
+  std::fprintf(stderr, "\r%s\x1b[K", line.c_str());
 }
 
 }  // namespace tbdaily

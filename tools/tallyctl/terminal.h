@@ -97,8 +97,10 @@ class Table {
 // at the end.
 class Progress {
  public:
+  // What is counted; of bytes the rate is shown, and how long the rest takes at it.
+  enum class Of : std::uint8_t { Bytes, Time };
   // `total` may be 0 when it is not known.
-  Progress(std::string label, std::uint64_t total);
+  Progress(std::string label, Of what, std::uint64_t total);
   ~Progress();
   Progress(const Progress&) = delete;
   Progress& operator=(const Progress&) = delete;
@@ -106,9 +108,11 @@ class Progress {
 
  private:
   const std::string label_;
+  const Of what_;
   const std::uint64_t total_;
   const bool shown_;
   bool drawn_ = false;
+  const std::chrono::steady_clock::time_point begin_;
   std::chrono::steady_clock::time_point nextDraw_;
 };
 

@@ -69,7 +69,8 @@ void runImport(Tool& tool, const std::string& path) {
   ImportedRows imported;
   std::optional<std::string> error;
   {
-    Progress progress("importing", sized ? static_cast<std::uint64_t>(status.st_size) : 0);
+    Progress progress("importing", Progress::Of::Bytes,
+                      sized ? static_cast<std::uint64_t>(status.st_size) : 0);
     error = recordImport(
         *store, file ? file.get() : stdin, [&progress](std::uint64_t read) { progress.at(read); }, imported);
   }

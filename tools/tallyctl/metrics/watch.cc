@@ -39,7 +39,7 @@ constexpr auto kProgressStep = std::chrono::milliseconds(100);
 WaitEnd waitBetween(const StopSignals& signals, Clock::duration interval) {
   const Clock::time_point begin = Clock::now(), end = begin + interval;
   const auto step = ::isatty(STDERR_FILENO) != 0 ? Clock::duration(kProgressStep) : interval;
-  Progress progress("measuring", static_cast<std::uint64_t>(interval.count()));
+  Progress progress("measuring", Progress::Of::Time, static_cast<std::uint64_t>(interval.count()));
   WaitEnd woken = WaitEnd::Done;
   for (Clock::time_point next = begin; woken == WaitEnd::Done && next < end;) {
     next = std::min(next + step, end);

@@ -63,6 +63,8 @@ constexpr KnownStat kKnownStats[] = {
     {22, 3},              // numPfail
     {23, 1},              // numEfail
     {28, 40'112},         // numSleepOps
+    {34, 12'480},         // powerOnHours
+    {36, 0},              // smartCritWarnings
     {45, 611},            // maxHighEnduranceBlockErases
     {48, 208},            // numFreeVirtualBlocks
     {49, 16'384},         // bytesPerPage
@@ -80,6 +82,7 @@ constexpr KnownStat kKnownStats[] = {
     {125, 611},           // hottestCycle of the user's partition
     {125, 1'304, 1},      // and of the intermediate one
     {129, 32},            // pagesPerVirtualBlockSlc
+    {204, 44'928'540},    // powerOnSeconds
     {367, 37},            // lhotSkipPercent
     {427, 0x4582},        // nandDesc
     {428, 1},             // fwUpdatesPercentUsed

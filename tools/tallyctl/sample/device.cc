@@ -1,5 +1,8 @@
 #include "tools/tallyctl/sample/device.h"
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include <cerrno>
 #include <filesystem>
 #include <vector>
@@ -156,21 +159,51 @@ class SampleDevice {
       return Failure{
           taken + " is already there; a sample device is never made over another one: choose an empty root"};
     }
-    for (const SampleFile& file : files) {
-      if (auto written = writePlist(file); !written) return written;
-    }
-    if (auto written = writeStackSnapshot(); !written) return written;
-    if (auto placed = placeSupportLibrary(); !placed) return placed;
-    AnalyticsStore analytics(store);
-    if (auto reason = addSampleHistory(analytics, dayBefore(today))) return Failure{std::move(*reason)};
-    return Nothing{};
+    auto library = supportLibrary();
+    if (!library) return Failure{library.reason()};
+    auto made = fill(files, *library, store, dayBefore(today));
+    if (!made) undo();
+    return made;
   }
 
  private:
-  int makeRoot() const {
+  int makeRoot() {
     std::error_code error;
-    fs::create_directories(host_.root(), error);
+    madeRoot_ = fs::create_directories(host_.root(), error);
     return error.value();
+  }
+
+  Outcome<Nothing> fill(const std::vector<SampleFile>& files, const std::vector<std::byte>& library,
+                        const StorePlace& store, DayNumber yesterday) {
+    for (const SampleFile& file : files) {
+      if (auto written = writePlist(file); !written) return written;
+    }
+    if (auto written = writeBytes(recordingPath(recording::kStackSnapshot), sampleStackSnapshot()); !written)
+      return written;
+    if (auto placed = writeBytes(kSupportLibraryPath, library); !placed) return placed;
+    for (const std::string& name : {store.name, storeLogOf(store.name), store.name + "-shm"})
+      written_.push_back(store.folder + "/" + name);
+    AnalyticsStore analytics(store);
+    if (auto reason = addSampleHistory(analytics, yesterday)) return Failure{std::move(*reason)};
+    return Nothing{};
+  }
+
+  // Takes away what was written, and the folders that are empty then.
+  void undo() const {
+    for (const std::string& path : written_) {
+      const fs::path whole(path);
+      DeviceFolder folder;
+      if (host_.files().openFolder(whole.parent_path().native(), folder) == 0)
+        folder.remove(whole.filename());
+      for (fs::path step = whole.parent_path(); step != step.root_path(); step = step.parent_path()) {
+        DeviceFolder above;
+        if (host_.files().openFolder(step.parent_path().native(), above) != 0 ||
+            ::unlinkat(above.descriptor(), step.filename().c_str(), AT_REMOVEDIR) != 0)
+          break;
+      }
+    }
+    std::error_code ignored;
+    if (madeRoot_) fs::remove(host_.root(), ignored);
   }
 
   std::string firstTaken(const std::vector<SampleFile>& files) const {
@@ -187,41 +220,40 @@ class SampleDevice {
     return {};
   }
 
-  Outcome<Nothing> writePlist(const SampleFile& file) const {
+  Outcome<Nothing> writePlist(const SampleFile& file) {
     const PlistWriteResult written =
         platform_.services().propertyListCodec.write(PlistValue::dictionary(file.root));
     if (!written.ok) return Failure{file.path + ": " + written.error};
-    return writeBytes(file.path, written.bytes);
+    return writeText(file.path, written.bytes);
   }
 
-  Outcome<Nothing> writeBytes(std::string_view path, std::string_view bytes) const {
+  Outcome<Nothing> writeBytes(std::string_view path, const std::vector<std::byte>& bytes) {
+    return writeText(path, {reinterpret_cast<const char*>(bytes.data()), bytes.size()});
+  }
+
+  Outcome<Nothing> writeText(std::string_view path, std::string_view text) {
+    written_.emplace_back(path);
     const fs::path whole(path);
     DeviceFolder folder;
     int error = host_.files().makeFolder(whole.parent_path().native(), folder);
-    if (error == 0) error = folder.replaceFile(whole.filename(), bytes);
+    if (error == 0) error = folder.replaceFile(whole.filename(), text);
     if (error != 0) return Failure{host_.files().place(path).native() + ": " + errorText(error)};
     return Nothing{};
   }
 
-  Outcome<Nothing> writeStackSnapshot() const {
-    const PlistData snapshot = sampleStackSnapshot();
-    return writeBytes(recordingPath(recording::kStackSnapshot),
-                      {reinterpret_cast<const char*>(snapshot.data()), snapshot.size()});
-  }
-
-  Outcome<Nothing> placeSupportLibrary() const {
+  static Outcome<std::vector<std::byte>> supportLibrary() {
     const fs::path built = builtSupportLibrary();
     if (built.empty())
       return Failure{
           "the support library FaultdeskSupport is missing beside tallyctl; build or install it again"};
-    const auto library = readInput(built, kLargestBufferInput);
-    if (!library) return Failure{library.reason()};
-    return writeBytes(kSupportLibraryPath, {reinterpret_cast<const char*>(library->data()), library->size()});
+    return readInput(built, kLargestBufferInput);
   }
 
   LinuxPlatform& platform_;
   const SampleProfile& profile_;
   const Host& host_;
+  std::vector<std::string> written_;  // paths of the device
+  bool madeRoot_ = false;
 };
 
 }  // namespace

@@ -158,10 +158,10 @@ PlistArray sampleUsageRecords(DayNumber day) {
          {"wwanInBytes", bytes(0, 9e7)},
          {"wwanOutBytes", bytes(0, 6e6)}}));
   };
-  // Apps restart now and then; daemons have counted since the device was started.
+  // Apps restart now and then, none of them today; daemons have counted since the device was started.
   for (const SampleApp& app : sampleApps()) {
     if (app.isUserApp)
-      add("bundleName", app.identifier, 1, day - static_cast<DayNumber>(noise.between(0, 2)));
+      add("bundleName", app.identifier, 1, day - 1 - static_cast<DayNumber>(noise.between(0, 2)));
   }
   for (const char* daemon : kDaemons) add("procName", daemon, 0.2, day - kDaysSinceBoot);
   return records;
