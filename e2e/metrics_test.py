@@ -72,7 +72,10 @@ class Metrics(unittest.TestCase):
         self.assertEqual(answer, model(0))
         self.assertEqual(list(answer[0]), list(model(0)[0]))  # the order of the keys
         text = self.metrics("list") + self.metrics("sample")
-        self.assertEqual(self.metrics("scale", "1500", str(NS), str(SECONDS)), "1.5e-06\n")
+        for words in ((str(NS), str(SECONDS)), ("ns", "s"), (hex(NS), "s")):
+            self.assertEqual(self.metrics("scale", "1500", *words), "1.5e-06\n")
+        self.assertEqual(self.metrics("scale", "3", "MiB", "B"), "3145728.0\n")
+        self.metrics("scale", "3", "parsecs", "B", status=2)
         for wanted in (r"\n    Rails\n +0xff +simple +ns +1 +element +categories 0x8001\n",
                        r"\ndisk\\x1b\[2J <id x <id 0x7f{15}>\n", r"\n +0xff +250 +ns\n",
                        r"\n +OFF +3 +3000000000 +ns +3\.00 s +75\.0% +<- current\n", r"\n +0 +10 +3 +1 +9 +12 +#+\n",

@@ -7,6 +7,7 @@
 #include "platform/number_text.h"
 #include "tools/tallyctl/metrics/advance.h"
 #include "tools/tallyctl/metrics/sampler.h"
+#include "tools/tallyctl/metrics/unit_argument.h"
 #include "tools/tallyctl/metrics/watch.h"
 #include "tools/tallyctl/tool.h"
 
@@ -44,11 +45,11 @@ void scale(Tool& tool, const std::vector<std::string>& words) {
   }
   std::array<std::int64_t, 2> units{};
   for (std::size_t i = 0; i < units.size(); ++i) {
-    const auto code = parseCode(words[i + 1]);
-    if (!code)
-      return tool.fail("\"" + words[i + 1] + "\" is no unit code, a 64-bit number, decimal or 0x...",
+    const auto unit = parseUnit(words[i + 1]);
+    if (!unit)
+      return tool.fail("\"" + words[i + 1] + "\" is no unit: a label such as ns, or a code, decimal or 0x...",
                        kWrongUsage);
-    units[i] = static_cast<std::int64_t>(*code);
+    units[i] = *unit;
   }
   const double scaled = KdReportScaleValue(*value, units[0], units[1]);
   if (tool.printedAsJson(PlistValue::dictionary({{"value", PlistValue::float64(scaled)}}))) return;
@@ -158,8 +159,9 @@ void addScale(CLI::App& metrics, Tool& tool) {
   CLI::App* command = metrics.add_subcommand("scale", "Convert a value from one unit to another");
   auto words = std::make_shared<std::vector<std::string>>(3);
   command->add_option("VALUE", (*words)[0], "An unsigned number, decimal or 0x...")->required();
-  command->add_option("FROM", (*words)[1], "Its unit code, decimal or 0x...")->required();
-  command->add_option("TO", (*words)[2], "The unit code to convert to")->required();
+  command->add_option("FROM", (*words)[1], "Its unit: a label such as ns or MiB, or a code, decimal or 0x...")
+      ->required();
+  command->add_option("TO", (*words)[2], "The unit to convert to")->required();
   command->callback([&tool, words] { scale(tool, *words); });
 }
 
