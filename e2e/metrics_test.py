@@ -74,7 +74,7 @@ class Metrics(unittest.TestCase):
         text = self.metrics("list") + self.metrics("sample")
         for words in ((str(NS), str(SECONDS)), ("ns", "s"), (hex(NS), "s")):
             self.assertEqual(self.metrics("scale", "1500", *words), "1.5e-06\n")
-        self.assertEqual(self.metrics("scale", "3", "MiB", "B"), "3145728.0\n")
+        self.assertEqual(self.metrics("scale", "3", "MiB", "B"), "3145728\n")
         self.metrics("scale", "3", "parsecs", "B", status=2)
         for wanted in (r"\n    Rails\n +0xff +simple +ns +1 +element +categories 0x8001\n",
                        r"\ndisk\\x1b\[2J <id x <id 0x7f{15}>\n", r"\n +0xff +250 +ns\n",
@@ -192,7 +192,7 @@ class Metrics(unittest.TestCase):
                                ("configureStatus", "ConfigureInterests failed"), ("updateStatus", "sampled")):
             self.registry(hubs=({status: -536870206},))
             failure = self.metrics("watch", "--interval", "1", status=1)
-            self.assertRegex(failure, reason + r".*\(0xe00002c2\)\n")
+            self.assertRegex(failure, reason + r".*\(0xe00002c2\) \(device root .*\)\n")
         self.registry(hubs=())
         self.assertIn("no metrics hub", self.metrics("sample", status=1))
         for rows, said in ((CHANNELS, "no channels match\n"), ([], "no driver publishes channels\n")):
