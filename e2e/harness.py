@@ -111,6 +111,11 @@ class Device:
             assert time.monotonic() < deadline, "waited in vain"
             time.sleep(0.02)
 
+    def wait_until_watching(self, process):
+        """Until `tallyctl wait` sees every post from now on."""
+        files = pathlib.Path(f"/proc/{process.pid}/fd")
+        self.wait_for(lambda: any("inotify" in os.readlink(file) for file in files.iterdir()))
+
     @property
     def socket_path(self):
         return self.path("var/run", JOB + ".sock")

@@ -1,7 +1,6 @@
 """What each command prints with --json holds its schema, and each schema is that of a command."""
 
 import json
-import os
 import pathlib
 import subprocess
 import unittest
@@ -37,8 +36,7 @@ class Schemas(unittest.TestCase):
         files["tasking"].write_text(json.dumps(TASKING))
         waiting = subprocess.Popen([BIN / "tallyctl", "--json", "wait", LOGGING, "--timeout", "60"], env=device.env,
                                    stdout=subprocess.PIPE, text=True)
-        files_of_it = pathlib.Path(f"/proc/{waiting.pid}/fd")
-        device.wait_for(lambda: any("inotify" in os.readlink(file) for file in files_of_it.iterdir()))
+        device.wait_until_watching(waiting)
         job = device.start()
         answers = {"send-logging-status": device.tally_json("send", "logging-status"), "send-run": device.tally_json("send", "run", "0"),
                    "send-app-info": json.loads(device.tally("--json", "send", "app-info", "-", stdin="[]"))}
