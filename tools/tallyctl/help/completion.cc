@@ -92,8 +92,8 @@ std::vector<Line> linesOf(const CLI::App& program) {
     line.path = place.path;
     for (const OptionDeclaration& option : namedOptions(*place.command)) {
       for (const std::string& name : option.names) {
-        const std::string kind(completionKindOf(option.value));
-        add(line.options, option.value.empty() ? name : name + "=" + kind);
+        add(line.options, name);
+        if (!option.value.empty()) line.options.append("=").append(completionKindOf(option.value));
       }
     }
     for (const std::string& kind : positionalKinds(*place.command))

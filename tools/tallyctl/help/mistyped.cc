@@ -92,13 +92,11 @@ std::string unknownWord(const CLI::App& program, const std::vector<std::string>&
     if (commands.empty()) continue;
     const CLI::App* below = commandNamed(*command, word);
     if (below == nullptr) {
-      std::vector<std::string> names;
-      for (const CLI::App* known : commands) names.push_back(known->get_name());
       const std::string path = command == &program ? "" : command->get_name() + " ";
-      return said("command", path + word, [&] {
-        for (std::string& name : names) name.insert(0, path);
-        return names;
-      }());
+      std::vector<std::string> names(commands.size());
+      std::ranges::transform(commands, names.begin(),
+                             [&path](const CLI::App* known) { return path + known->get_name(); });
+      return said("command", path + word, names);
     }
     command = below;
   }
