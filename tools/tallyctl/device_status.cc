@@ -105,7 +105,7 @@ class Examination {
       if (bytes || platform_.fileSystem.status(kWhitelistPath))
         return need("the whitelist " + place + " cannot be used (" + why +
                     "): correct it; tallyctl whitelist check tries it");
-      found_.whitelist.problems.push_back("there is no whitelist");
+      found_.whitelist.problems.emplace_back("there is no whitelist");
       if (found_.lastDay)
         need("there is no whitelist at " + place + ": put one in place, since nothing is reported without");
       return;
@@ -164,12 +164,16 @@ class Examination {
     if (!database.isOpen()) return {};  // new and empty
     for (const std::string table : {"scalars", "distribution_values"}) {
       for (const bool isFirst : {true, false}) {
-        const std::string most = isFirst ? "min" : "max";
+        std::string query =
+            "SELECT coalesce(MOST((SELECT MOST(day) FROM TABLE WHERE key_id = id)), NONE) FROM keys";
+        for (const auto& [word, instead] :
+             {std::pair<std::string_view, std::string>{"MOST", isFirst ? "min" : "max"},
+              {"MOST", isFirst ? "min" : "max"},
+              {"TABLE", table},
+              {"NONE", std::to_string(kNoDay)}})
+          query.replace(query.find(word), word.size(), instead);
         std::int64_t found = 0;
-        const int error =
-            database.queryInteger("SELECT coalesce(" + most + "((SELECT " + most + "(day) FROM " + table +
-                                      " WHERE key_id = id)), " + std::to_string(kNoDay) + ") FROM keys",
-                                  found);
+        const int error = database.queryInteger(query, found);
         if (error != 0) return storeFailure(database, place);
         if (found == kNoDay) continue;
         const auto day = static_cast<DayNumber>(found);

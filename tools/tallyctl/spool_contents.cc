@@ -34,10 +34,12 @@ Failure unreadable(const DeviceFiles& files, const std::string& path, int error)
   return Failure{files.place(path).native() + " cannot be read: " + errorText(error)};
 }
 
-std::optional<PlistDate> creationOf(const DeviceFiles& files, PropertyListCodec& codec,
+std::optional<PlistDate> creationOf(const DeviceFolder& folder, PropertyListCodec& codec,
                                     const std::string& description) {
+  FileDescriptor file;
   FileContents contents;
-  if (files.readFile(description, contents) != 0) return std::nullopt;
+  if (folder.openForReading(description, file) != 0 || readOpenFile(file.get(), contents) != 0)
+    return std::nullopt;
   const auto created = codec.parse(contents.bytes).value.get("created").asDate();
   return created && std::isfinite(created->secondsSinceReference) ? created : std::nullopt;
 }
@@ -67,7 +69,7 @@ std::optional<Failure> readFolder(const Host& host, PropertyListCodec& codec, co
     const std::string meta = name + std::string(kMetaSuffix);
     if (all.contains(meta) && opened.status(meta, description) == 0) {
       log.bytes += static_cast<std::uint64_t>(description.st_size);
-      log.created = creationOf(files, codec, below(folder) + "/" + meta).value_or(log.created);
+      log.created = creationOf(opened, codec, meta).value_or(log.created);
     }
     logs.push_back(std::move(log));
   }

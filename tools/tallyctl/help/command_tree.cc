@@ -58,7 +58,8 @@ std::vector<OptionDeclaration> optionsOf(const CLI::App& command) {
 std::vector<OptionDeclaration> commonOptionsOf(const CLI::App& program) {
   std::vector<OptionDeclaration> options = declarationsOf(program);
   // As the last of them.
-  std::ranges::stable_partition(options, [](const OptionDeclaration& option) { return !isHelp(option); });
+  const auto help = std::find_if(options.begin(), options.end(), isHelp);
+  if (help != options.end()) std::rotate(help, help + 1, options.end());
   return options;
 }
 
