@@ -80,7 +80,8 @@ step "a root elsewhere"
 mkdir -p /srv
 cp -a $root /srv/device
 rm /srv/device/var/run/*.sock "/srv/device/${remembered#"$root"/}"
-sed -n '/^```$/,/^```$/{/^```$/!p}' /usr/share/doc/tbdaily/operations.md | sed -n '/^root=\/srv\/device$/,/^systemctl restart/p' >/tmp/elsewhere
+# As the page says.
+sed -n '/^root=\/srv\/device$/,/^systemctl restart/p' /usr/share/doc/tbdaily/operations.md >/tmp/elsewhere
 grep -q ReadWritePaths /tmp/elsewhere || fail "the page has no drop-in"
 sh -eu /tmp/elsewhere
 before=$(reports /srv/device/var/mobile/Library/Logs)
