@@ -13,10 +13,6 @@
 
 namespace tbdaily {
 
-namespace {
-constexpr std::string_view kLastProcessedDay = "LastCrashLogSerializationDateInDaysSince1970";
-}
-
 DayNumber dayBefore(DayNumber day) {
   return static_cast<DayNumber>(static_cast<std::uint32_t>(day) - 1);
 }

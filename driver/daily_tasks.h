@@ -1,6 +1,8 @@
 // A day's work, in its fixed order.
 #pragma once
 
+#include <string_view>
+
 #include "platform/analytics_client.h"
 #include "platform/platform.h"
 #include "platform/plist_value.h"
@@ -19,6 +21,9 @@ void RunDailyTasks(Platform& platform, DayNumber day, const PlistValue& appInfo)
 // the day afterwards, when all that was written is durable: a run that dies inside the tasks is repeated at
 // the next start.
 void RunDailyTasksIfNewDay(Platform& platform, const PlistValue& appInfo);
+
+// The last day that was processed, a number in the job's preferences; missing before the first.
+inline constexpr std::string_view kLastProcessedDay = "LastCrashLogSerializationDateInDaysSince1970";
 
 // In 32-bit arithmetic.
 DayNumber dayBefore(DayNumber day);

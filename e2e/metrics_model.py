@@ -53,7 +53,8 @@ def described(row, sampled):
         form, categories, count = FOUND_OUT
     return {"driver": display(driver), "driverID": driver[1], "group": group, "subgroup": subgroup,
             "name": name or printable(channel), "channelID": channel, "format": form, "categories": categories,
-            "elements": count, "unit": unit, "unitLabel": LABELS[unit]}
+            "elements": count, "unit": unit, "unitCode": None if unit is None else f"0x{unit % 2**64:016x}",
+            "unitLabel": LABELS[unit]}
 
 
 def with_values(row, stamps, elements):

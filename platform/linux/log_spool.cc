@@ -24,7 +24,6 @@ constexpr unsigned kMaximumNumber = 100000;  // of logs with one name and second
 constexpr int kCarewellGenerations = 5;
 constexpr const char* kStructured = "Structured";
 constexpr const char* kCarewell = "Carewell";
-constexpr const char* kLock = ".lock";
 constexpr double kLockPatience = 5.0;  // seconds
 
 std::string dayText(PlistDate now) {
@@ -110,7 +109,7 @@ void LogSpool::noteFailure(std::string_view folder, int error) const {
 
 int LogSpool::lockSpool(DeviceFolder& folder, FileLock& lock) const {
   const int error = host_.files().makeFolder(kFolder, folder);
-  return error == 0 ? lock.acquire(folder, kLock) : error;
+  return error == 0 ? lock.acquire(folder, kLockFile) : error;
 }
 
 bool LogSpool::writeLog(Consent consent, std::string_view type, std::string_view name,
@@ -160,7 +159,7 @@ int LogSpool::openStructured(int type, const std::string& day) {
   if (error == 0) error = spool.makeFolder(kStructured, structured);
   if (error == 0) error = structured.makeFolder(std::to_string(type), folder);
   if (error == 0) error = folder.openForAppending(day + ".jsonl", open.file);
-  if (error == 0 && !lockFile_.isOpen()) error = spool.openForLocking(kLock, lockFile_);
+  if (error == 0 && !lockFile_.isOpen()) error = spool.openForLocking(kLockFile, lockFile_);
   if (error != 0) structured_.erase(type);
   return error;
 }

@@ -2,57 +2,18 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
-#include <cstdio>
 #include <exception>
 #include <string>
 #include <vector>
 
 #include "platform/linux/base/process_start.h"
-#include "tools/tallyctl/tool.h"
+#include "tools/tallyctl/commands/declare.h"
+#include "tools/tallyctl/help/help_text.h"
+#include "tools/tallyctl/help/mistyped.h"
 
 namespace {
 
 using tbdaily::Tool;
-
-void declare(CLI::App& app, Tool& tool) {
-  app.description(
-      "The companion of tbdaily: makes a sample device, records values, drives the job and shows what it "
-      "wrote.");
-  app.require_subcommand(1);
-  app.fallthrough();
-  app.add_option("--root", tool.options.root, "The device root (default: $TBDAILY_ROOT, else /)")
-      ->type_name("DIR");
-  app.set_version_flag("--version", std::string(TBDAILY_VERSION), "Print the version");
-  app.add_flag("--json", tool.options.json, "Print data as JSON");
-  tbdaily::addInitCommand(app, tool);
-  tbdaily::addRecordCommand(app, tool);
-  tbdaily::addSendCommand(app, tool);
-  tbdaily::addWaitCommand(app, tool);
-  tbdaily::addReportCommand(app, tool);
-  tbdaily::addWhitelistCommand(app, tool);
-  tbdaily::addPlistCommand(app, tool);
-  tbdaily::addTaskingCommand(app, tool);
-  tbdaily::addUsageCommand(app, tool);
-  tbdaily::addNandCommand(app, tool);
-  tbdaily::addBufferCommands(app, tool);
-  tbdaily::addWearCommand(app, tool);
-  tbdaily::addMetricsCommand(app, tool);
-  tbdaily::addCaptureCommand(app, tool);
-}
-
-// What CLI11 says of a command that it does not know names everything but the command.
-std::string reasonOf(const CLI::App& app, const CLI::ParseError& error, int argc, char** argv) {
-  for (int i = 1; i < argc && error.get_exit_code() == static_cast<int>(CLI::ExitCodes::RequiredError); ++i) {
-    const std::string word = argv[i];
-    if (word == "--root") ++i;
-    if (word.empty() || word[0] == '-') continue;
-    const bool isKnown =
-        !app.get_subcommands([&word](const CLI::App* command) { return command->get_name() == word; })
-             .empty();
-    return isKnown ? std::string(error.what()) : "there is no command \"" + word + "\"";
-  }
-  return error.what();
-}
 
 // The words of the command line in the reverse order that the parser takes. It would take the word behind an
 // empty value, as in "--unit=", for that value: the two are handed over apart.
@@ -78,17 +39,21 @@ int main(int argc, char** argv) {
   Tool tool;
   CLI::App app;
   try {
-    declare(app, tool);
-    app.name("tallyctl");
+    app.formatter(
+        std::make_shared<tbdaily::HelpFormatter>(tool.out().width()));  // also of the commands below
+    tbdaily::declareCommands(app, tool);
+    app.parse_complete_callback([&tool] { tool.mayPage(); });
     app.parse(reversedWords(argc, argv));
   } catch (const CLI::Success& asked) {  // --help
     return app.exit(asked);
   } catch (const CLI::ParseError& error) {
-    tool.fail(reasonOf(app, error, argc, argv) + " (try --help)", tbdaily::kWrongUsage);
+    // What the parser says of a command that it does not know names everything but the command.
+    const std::string unknown = tbdaily::unknownWord(app, {argv + 1, argv + argc});
+    tool.fail((unknown.empty() ? error.what() : unknown) + " (try --help)", tbdaily::kWrongUsage);
   } catch (const std::exception& failure) {
     tool.fail(failure.what());
   }
-  if (std::fflush(stdout) != 0 && tool.exitStatus == tbdaily::kDone)
+  if (!tool.out().finish() && tool.exitStatus == tbdaily::kDone)
     tool.fail("standard output cannot be written");
   return tool.exitStatus;
 }

@@ -30,7 +30,7 @@ constexpr NandGlossaryRow kGlossary[] = {
     {"NumFreeVirtualBlocks", "Device", Count, "Virtual blocks that hold no data and wait to be written."},
     {"IntermediatePartitionSize", "Device", Count, "Size of the intermediate partition, where data is written before it moves on."},
     {"StaticDataSizeInMB", "Device", MiB, "Data that is seldom rewritten."},
-    {"formatDaysSince", "Device", Weeks, "Weeks from the year 2000 to the last formatting, despite the name."},
+    {"formatDaysSince2000", "Device", Weeks, "Weeks from the year 2000 to the last formatting, despite the name."},
     {"DemoMode", "Device", Code, "Whether the device is a demonstration unit."},
     {"lhotFullLap", "Device", Count, "Full laps of the search for rarely used data."},
     {"lhotSkipPercent", "Device", Percent, "Share of blocks that the search for rarely used data passed over."},
@@ -196,6 +196,12 @@ const NandGlossaryRow* findNandGlossary(std::string_view key) {
     if (name.starts_with(row.base) && (best == nullptr || row.base.size() > best->base.size())) best = &row;
   }
   return best;
+}
+
+std::vector<std::string> nandGlossaryKeys() {
+  std::vector<std::string> keys;
+  for (const NandGlossaryRow& row : kGlossary) keys.emplace_back(row.base);
+  return keys;
 }
 
 std::optional<std::string> explainNandKey(std::string_view key) {

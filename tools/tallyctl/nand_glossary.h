@@ -5,6 +5,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace tbdaily {
 
@@ -21,6 +22,9 @@ struct NandGlossaryRow {
 // The row for a key, with or without "com.velmora.NANDInfo." in front; nothing for a key that the dictionary
 // cannot hold.
 const NandGlossaryRow* findNandGlossary(std::string_view key);
+
+// What findNandGlossary knows, without the numbers at their ends.
+std::vector<std::string> nandGlossaryKeys();
 
 // One sentence, with the place in the series where the key is one of several.
 std::optional<std::string> explainNandKey(std::string_view key);

@@ -40,6 +40,11 @@ int replaceWhole(const std::string& path, std::span<const std::byte> bytes) {
 }  // namespace
 
 Outcome<Nothing> writeOutputFile(const std::string& path, std::span<const std::byte> bytes) {
+  if (path == "-") {
+    const int error = writeAll(STDOUT_FILENO, bytes);
+    return error == 0 ? Outcome<Nothing>(Nothing{})
+                      : Failure{"standard output cannot be written: " + errorText(error)};
+  }
   struct stat there {};
   const bool isOther = ::lstat(path.c_str(), &there) == 0 && !S_ISREG(there.st_mode);
   if (const int error = isOther ? writeInPlace(path, bytes) : replaceWhole(path, bytes); error != 0)

@@ -10,7 +10,7 @@
 namespace tbdaily {
 
 // A regular file appears whole or stays as it was, with the mode that the user's umask gives it; what else
-// the path names (a pipe, a device) is written to.
+// the path names (a pipe, a device) is written to, and "-" is standard output.
 Outcome<Nothing> writeOutputFile(const std::string& path, std::span<const std::byte> bytes);
 
 }  // namespace tbdaily

@@ -8,6 +8,7 @@
 #include <cmath>
 #include <cstdio>
 #include <cstdlib>
+#include <utility>
 
 #include "platform/utf8.h"
 
@@ -68,13 +69,43 @@ ShownText ShownText::withoutTrailingSpaces() const {
   return shown;
 }
 
+void Terminal::usePager() {
+  winsize size{};
+  const std::string_view type = environment("TERM");
+  if (::isatty(STDOUT_FILENO) == 0 || ::isatty(STDIN_FILENO) == 0 || type.empty() || type == "dumb" ||
+      !Pager::isWanted())
+    return;
+  if (::ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_row > 1) height_ = size.ws_row - 1U;
+}
+
+void Terminal::write(std::string_view bytes) {
+  if (pager_.isRunning()) return pager_.write(bytes);
+  if (height_ == 0) {
+    if (!bytes.empty()) std::fwrite(bytes.data(), 1, bytes.size(), stdout);
+    return;
+  }
+  keptBack_ += bytes;
+  lines_ += static_cast<std::size_t>(std::ranges::count(bytes, '\n'));
+  if (lines_ <= height_) return;
+  height_ = 0;
+  pager_.start();
+  write(std::exchange(keptBack_, {}));
+}
+
+bool Terminal::finish() {
+  height_ = 0;
+  write(std::exchange(keptBack_, {}));
+  pager_.finish();
+  return std::fflush(stdout) == 0;
+}
+
 void Terminal::print(const ShownText& text) {
-  if (!text.bytes().empty()) std::fwrite(text.bytes().data(), 1, text.bytes().size(), stdout);
+  write(text.bytes());
 }
 
 void Terminal::line(const ShownText& text) {
-  print(text);
-  std::fputc('\n', stdout);
+  write(text.bytes());
+  write("\n");
 }
 
 ShownText Terminal::styled(const ShownText& text, Style style) const {

@@ -8,6 +8,8 @@
 #include <string_view>
 #include <vector>
 
+#include "tools/tallyctl/pager.h"
+
 namespace tbdaily {
 
 enum class Style { Plain, Heading, Dim, Good, Bad };
@@ -42,6 +44,11 @@ class Terminal {
  public:
   Terminal();  // looks at standard output, NO_COLOR, TERM and the locale variables
 
+  // Text that is longer than the screen goes to a pager from now on, where standard output is a terminal.
+  void usePager();
+  // Shows what is kept back, and waits for the pager. Whether all was written.
+  bool finish();
+
   void print(const ShownText& text);
   void line(const ShownText& text = {});
   // The text with the style's colour, or as it is.
@@ -54,9 +61,15 @@ class Terminal {
   std::size_t width() const { return width_; }
 
  private:
+  void write(std::string_view bytes);
+
   bool colour_ = false;
   bool drawing_ = false;
   std::size_t width_ = 80;
+  std::size_t height_ = 0;  // lines that may be kept back until it is known whether all fits; 0: none
+  std::size_t lines_ = 0;   // of what is kept back
+  std::string keptBack_;
+  Pager pager_;
 };
 
 // One line on standard error, behind the program's name.

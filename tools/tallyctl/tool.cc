@@ -4,12 +4,15 @@
 
 #include "platform/linux/base/host_notes.h"
 #include "tools/tallyctl/day_argument.h"
+#include "tools/tallyctl/default_root.h"
 
 namespace tbdaily {
 
 LinuxPlatform& Tool::platform() {
   if (!platform_) {
-    if (!options.root.empty()) ::setenv("TBDAILY_ROOT", options.root.c_str(), 1);
+    std::string root = options.root;
+    if (!namesRoot()) root = rootFromDefaults(kDefaultsFile).value_or("");
+    if (!root.empty()) ::setenv("TBDAILY_ROOT", root.c_str(), 1);
     platform_ = std::make_unique<LinuxPlatform>(Host::fromEnvironment());
   }
   return *platform_;
@@ -55,8 +58,17 @@ std::optional<DayNumber> Tool::dayOf(const std::string& text) {
   return std::nullopt;
 }
 
+void Tool::mayPage() {
+  if (!options.json && !options.noPager) out_.usePager();
+}
+
 void Tool::fail(std::string_view reason, int status) {
-  printError(reason);
+  std::string line(reason);
+  if (status == kFailed && platform_) {
+    const std::string& root = platform_->host().root().native();
+    if (line.find(root) == std::string::npos || root == "/") line += " (device root " + root + ")";
+  }
+  printError(line);
   exitStatus = status;
 }
 

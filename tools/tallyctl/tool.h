@@ -25,16 +25,17 @@ enum ExitStatus : int { kDone = 0, kFailed = 1, kWrongUsage = 2 };
 
 class Tool {
  public:
-  // What the common options say. An empty root means TBDAILY_ROOT, else "/".
+  // What the common options say. An empty root means TBDAILY_ROOT, else that of kDefaultsFile, else "/".
   struct Options {
     std::string root;
     bool json = false;
+    bool noPager = false;
   };
 
   Options options;
   int exitStatus = kDone;
 
-  // Made at the first call, when the options are known; `--root` then also stands in TBDAILY_ROOT, where the
+  // Made at the first call, when the options are known; the root then stands in TBDAILY_ROOT, where the
   // support library looks.
   LinuxPlatform& platform();
   // Whether the root is a folder that is there; says so when it is not.
@@ -46,6 +47,9 @@ class Tool {
   bool namesRoot() const;
 
   Terminal& out() { return out_; }
+  // Shows on a pager what is longer than the screen: for commands that show something and end. Not for JSON,
+  // which other programs read.
+  void mayPage();
 
   // Prints the value, or what the function writes, as JSON when --json was given; answers whether it did.
   bool printedAsJson(const PlistValue& value);
@@ -54,7 +58,7 @@ class Tool {
   // The day that the text names, or nothing, with the reason said: wrong usage.
   std::optional<DayNumber> dayOf(const std::string& text);
 
-  // One line on standard error with the reason.
+  // One line on standard error with the reason; it names the root where the command looked at one.
   void fail(std::string_view reason, int status = kFailed);
 
  private:
@@ -63,6 +67,10 @@ class Tool {
 };
 
 // One function for each subcommand, in a file of its own; it declares the options and what runs.
+void addStatusCommand(CLI::App& app, Tool& tool);
+void addConsentCommand(CLI::App& app, Tool& tool);
+void addGroupCommand(CLI::App& app, Tool& tool);
+void addSpoolCommand(CLI::App& app, Tool& tool);
 void addInitCommand(CLI::App& app, Tool& tool);
 void addRecordCommand(CLI::App& app, Tool& tool);
 void addSendCommand(CLI::App& app, Tool& tool);
@@ -77,5 +85,7 @@ void addNandCommand(CLI::App& app, Tool& tool);
 void addWearCommand(CLI::App& app, Tool& tool);
 void addMetricsCommand(CLI::App& app, Tool& tool);
 void addCaptureCommand(CLI::App& app, Tool& tool);
+void addHelpCommand(CLI::App& app, Tool& tool);
+void addCompleteCommand(CLI::App& app, Tool& tool);
 
 }  // namespace tbdaily

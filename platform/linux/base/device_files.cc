@@ -256,6 +256,15 @@ int DeviceFiles::openJudged(std::string_view path, const Judge& judge, FileDescr
 void DeviceFiles::noteUnread(const std::string& line) const {
   hasUnread_ = true;
   noteOnce(line);
+  constexpr std::size_t kMostLines = 100;
+  const std::lock_guard lock(mutex_);
+  if (unread_.size() < kMostLines && std::ranges::find(unread_, line) == unread_.end())
+    unread_.push_back(line);
+}
+
+std::vector<std::string> DeviceFiles::unread() const {
+  const std::lock_guard lock(mutex_);
+  return unread_;
 }
 
 void DeviceFiles::rememberToSync(const std::string& path, bool isFolder) const {

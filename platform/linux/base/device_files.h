@@ -20,6 +20,7 @@
 #include <set>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "platform/linux/base/device_folder.h"
 #include "platform/linux/base/file_io.h"
@@ -60,9 +61,10 @@ class DeviceFiles {
                  std::string& complaint) const;
 
   // For what is there and cannot be read, or not be used once it was read: such a thing is not missing. One
-  // line on standard error, once, as noteOnce; and whether there was any.
+  // line on standard error, once, as noteOnce; whether there was any, and the first of them.
   void noteUnread(const std::string& line) const;
   bool hasUnread() const { return hasUnread_; }
+  std::vector<std::string> unread() const;
 
   // Forces to storage all that was written through this door, and the folders that name it. What fails is
   // named; false then.
@@ -87,6 +89,7 @@ class DeviceFiles {
   mutable std::mutex mutex_;  // over what follows
   mutable FileDescriptor rootDescriptor_;
   mutable std::set<std::string> touchedFolders_, touchedFiles_;
+  mutable std::vector<std::string> unread_;  // each once, and not too many
 };
 
 }  // namespace tbdaily

@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 #include <array>
+#include <functional>
 
 #include "storage/snapshot_renderer.h"
 #include "storage/stats_context.h"
@@ -36,6 +37,7 @@ void saveBuffer(Tool& tool, const std::string& kind, std::uint16_t list, const s
   if (!tool.hasReadAll()) return;
   if (!buffer) return tool.fail(kind + ": " + buffer.reason());
   if (const auto written = writeOutputFile(file, *buffer); !written) return tool.fail(written.reason());
+  if (file == "-") return;
   if (tool.printedAsJson(PlistValue::dictionary(
           {{"file", PlistValue::string(file)},
            {"bytes", PlistValue::int64(static_cast<std::int64_t>(buffer->size()))}}))) {
@@ -112,30 +114,40 @@ void showStats(Tool& tool, const std::string& file) {
 constexpr std::size_t kRenderedAtOnce = std::size_t{64} << 10;
 constexpr std::size_t kTextPerByte = 8;  // a record of the fixed layout takes less, whatever its values
 
-// Nothing but the rendered text goes to standard output.
-void renderFixed(Tool& tool, const std::vector<std::byte>& records) {
+// Nothing but the rendered text goes to standard output; each answers false when it failed, which is said
+// then.
+using PutText = std::function<void(std::string_view piece)>;
+
+bool renderFixed(Tool& tool, const PutText& put, const std::vector<std::byte>& records) {
   std::vector<char> text(kRenderedAtOnce + records.size() * kTextPerByte);
   std::size_t size = text.size();
-  if (!STXParseSnapshotBuffer(records, text.data(), size))
-    return tool.fail("the snapshots do not fit the renderer's buffer");
-  tool.out().print(ShownText::lines({text.data(), size}));
+  if (!STXParseSnapshotBuffer(records, text.data(), size)) {
+    tool.fail("the snapshots do not fit the renderer's buffer");
+    return false;
+  }
+  put({text.data(), size});
+  return true;
 }
 
-void renderDescribed(Tool& tool, const std::vector<std::byte>& records,
+bool renderDescribed(Tool& tool, const PutText& put, const std::vector<std::byte>& records,
                      const std::vector<std::byte>& header) {
+  const auto failed = [&tool](std::string_view why) {
+    tool.fail(why);
+    return false;
+  };
   std::vector<char> text(kRenderedAtOnce);
   std::uint32_t cursor = 0;
   while (true) {
     const std::uint32_t before = cursor;
     std::size_t size = text.size();
     const bool finished = STXParseSnapshotBufferWithInplaceParser(records, text.data(), size, header, cursor);
-    tool.out().print(ShownText::lines({text.data(), size > 0 ? size - 1 : 0}));
-    if (finished) return;
-    if (cursor == before) return tool.fail("the snapshot header cannot be used");
+    put({text.data(), size > 0 ? size - 1 : 0});
+    if (finished) return true;
+    if (cursor == before) return failed("the snapshot header cannot be used");
     // The record that did not fit was passed: it comes first in the next piece.
     --cursor;
     if (size <= 1) text.resize(text.size() * 2);
-    if (text.size() > kRenderedAtOnce * 1024) return tool.fail("a snapshot is too long to be rendered");
+    if (text.size() > kRenderedAtOnce * 1024) return failed("a snapshot is too long to be rendered");
   }
 }
 
@@ -144,21 +156,32 @@ struct SnapshotArguments {
   bool fixed = false;
 };
 
-void showSnapshots(Tool& tool, const SnapshotArguments& arguments) {
+// The header that describes the records: the one that is named, or that of the controller with its own
+// records, where it has one. Without one they are of the fixed layout.
+bool render(Tool& tool, const PutText& put, const SnapshotArguments& arguments) {
   const auto records = bufferOf(tool, arguments.records, "snapshot");
-  if (!records) return;
-  if (arguments.fixed) return renderFixed(tool, *records);
+  if (!records) return false;
+  if (arguments.fixed) return renderFixed(tool, put, *records);
   if (!arguments.header.empty()) {
     const auto header = bufferOf(tool, arguments.header, "snapshot-header");
-    if (header) renderDescribed(tool, *records, *header);
+    return header && renderDescribed(tool, put, *records, *header);
+  }
+  if (!arguments.records.empty()) return renderFixed(tool, put, *records);
+  const auto own = fetchControllerBuffer(tool.platform().services().driverRegistry, "snapshot-header");
+  if (!tool.hasReadAll()) return false;
+  return own && !own->empty() ? renderDescribed(tool, put, *records, *own) : renderFixed(tool, put, *records);
+}
+
+void showSnapshots(Tool& tool, const SnapshotArguments& arguments) {
+  if (!tool.options.json) {
+    render(
+        tool, [&tool](std::string_view piece) { tool.out().print(ShownText::lines(piece)); }, arguments);
     return;
   }
-  // Records of a file go with the header that is named; those of the controller with its own, where it has
-  // one.
-  if (!arguments.records.empty()) return renderFixed(tool, *records);
-  const auto own = fetchControllerBuffer(tool.platform().services().driverRegistry, "snapshot-header");
-  if (!tool.hasReadAll()) return;
-  own && !own->empty() ? renderDescribed(tool, *records, *own) : renderFixed(tool, *records);
+  std::string text;
+  if (render(
+          tool, [&text](std::string_view piece) { text += piece; }, arguments))
+    tool.printedAsJson(PlistValue::dictionary({{"text", PlistValue::string(std::move(text))}}));
 }
 
 }  // namespace
@@ -168,13 +191,19 @@ void addBufferCommands(CLI::App& app, Tool& tool) {
   auto list = std::make_shared<std::uint16_t>(std::uint16_t{0});
   auto output = std::make_shared<std::string>();
   std::vector<std::string> kinds;
-  for (const BufferKind& known : kBufferKinds) kinds.emplace_back(known.name);
+  std::string choices;
+  for (const BufferKind& known : kBufferKinds) {
+    kinds.emplace_back(known.name);
+    choices.append(choices.empty() ? "" : ", ").append(known.name);
+  }
   CLI::App* buffer = app.add_subcommand("buffer", "Fetch a raw buffer of the storage controller");
-  buffer->add_option("KIND", *kind, "What to fetch")->required()->check(CLI::IsMember(kinds));
+  buffer->add_option("KIND", *kind, "What to fetch: " + choices)->required()->check(CLI::IsMember(kinds));
   buffer->add_option("--list", *list, "Sub-list, for telemetry 0 to 2")
       ->type_name("N")
       ->check(CLI::Range(0, 255));
-  buffer->add_option("-o,--output", *output, "Where to write it")->required()->type_name("FILE");
+  buffer->add_option("-o,--output", *output, "Where to write it; - is standard output")
+      ->required()
+      ->type_name("FILE");
   buffer->callback([&tool, kind, list, output] { saveBuffer(tool, *kind, *list, *output); });
 
   auto statsFile = std::make_shared<std::string>();

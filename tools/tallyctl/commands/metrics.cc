@@ -80,9 +80,10 @@ CLI::App* addChannelCommand(CLI::App& metrics, Tool& tool, const std::string& na
   CLI::App* command = metrics.add_subcommand(name, says);
   auto request = std::make_shared<MetricsRequest>();
   ChannelFilter& filter = request->filter;
-  command->add_option("--driver", filter.driver, "Channels of the driver with this display name, name or id");
-  command->add_option("--group", filter.group, "Channels of this group");
-  command->add_option("--subgroup", filter.subGroup, "Channels of this subgroup");
+  command->add_option("--driver", filter.driver, "Channels of the driver with this display name, name or id")
+      ->type_name("DRIVER");
+  command->add_option("--group", filter.group, "Channels of this group")->type_name("GROUP");
+  command->add_option("--subgroup", filter.subGroup, "Channels of this subgroup")->type_name("SUBGROUP");
   command
       ->add_option_function<std::string>(
           "--category",

@@ -72,7 +72,7 @@ void addNandCommand(CLI::App& app, Tool& tool) {
   CLI::App* command =
       app.add_subcommand("nand", "Show the NAND info of this moment, as a run would record it");
   auto key = std::make_shared<std::string>();
-  command->add_option("--explain", *key, "Say in one sentence what a figure means")->type_name("KEY");
+  command->add_option("--explain", *key, "Say in one sentence what a figure means")->type_name("FIGURE");
   command->callback([&tool, key] { key->empty() ? showNand(tool) : explain(tool, *key); });
 }
 

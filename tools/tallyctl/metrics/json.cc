@@ -1,5 +1,8 @@
 #include "tools/tallyctl/metrics/json.h"
 
+#include <array>
+#include <cstdio>
+
 namespace tbdaily {
 
 using namespace kdreport;
@@ -9,6 +12,14 @@ namespace {
 // Null for the invalid number.
 std::optional<std::int64_t> number(std::int64_t value) {
   return value != kKdReportInvalid ? std::optional(value) : std::nullopt;
+}
+
+// A code as text, since readers that hold numbers as doubles round it; nothing for the invalid number.
+std::optional<std::string> unitCode(std::int64_t unit) {
+  if (unit == kKdReportInvalid) return std::nullopt;
+  std::array<char, 24> text;
+  std::snprintf(text.data(), text.size(), "0x%016llx", static_cast<unsigned long long>(unit));
+  return text.data();
 }
 
 void writeStates(JsonWriter& json, const ChannelValues& channel) {
@@ -80,6 +91,7 @@ void writeChannel(JsonWriter& json, const ChannelValues& channel, ChannelContent
   json.add("categories", channel.categories);
   json.add("elements", channel.elementCount);
   json.add("unit", number(channel.unit));
+  json.add("unitCode", unitCode(channel.unit));
   json.add("unitLabel", channel.unitLabel);
   if (contents == ChannelContents::Values) writeValues(json, channel);
 }
