@@ -87,7 +87,8 @@ std::optional<Failure> readBatches(const Host& host, PropertyListCodec& codec, c
   for (const std::string& name : names) {
     struct stat status {};
     if (opened.status(name, status) != 0 || !S_ISDIR(status.st_mode)) continue;
-    if (auto failure = readFolder(host, codec, std::string(folder).append("/").append(name), logs)) return failure;
+    if (auto failure = readFolder(host, codec, std::string(folder).append("/").append(name), logs))
+      return failure;
   }
   return std::nullopt;
 }
