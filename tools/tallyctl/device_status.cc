@@ -14,14 +14,11 @@
 #include "platform/linux/store/store_locator.h"
 #include "platform/platform.h"
 #include "platform/preferences_store.h"
-#include "platform/property_list_codec.h"
-#include "report/tb_config.h"
-#include "tools/tallyctl/captured_log.h"
 #include "tools/tallyctl/day_argument.h"
 #include "tools/tallyctl/report_preview.h"
 #include "tools/tallyctl/sizes.h"
 #include "tools/tallyctl/store_copy.h"
-#include "tools/tallyctl/whitelist_lint.h"
+#include "tools/tallyctl/whitelist_review.h"
 
 namespace tbdaily {
 
@@ -95,33 +92,22 @@ class Examination {
   }
 
   void examineWhitelist() {
-    CapturedLog log;
-    Platform platform = platformWith(platform_, log);
-    const auto config = TBConfig::init(platform);
-    const auto bytes = platform_.fileSystem.readFile(kWhitelistPath);
+    const auto review = reviewWhitelist(platform_);
     const std::string place = linux_.host().files().place(kWhitelistPath).native();
-    if (!config) {
-      const std::string why = log.errors().empty() ? "cannot be loaded" : log.errors().front();
-      if (bytes || platform_.fileSystem.status(kWhitelistPath))
-        return need("the whitelist " + place + " cannot be used (" + why +
+    if (!review->config) {
+      if (platform_.fileSystem.status(kWhitelistPath)) {
+        const std::vector<std::string> errors = review->log.errors();
+        return need("the whitelist " + place + " cannot be used (" +
+                    (errors.empty() ? "cannot be loaded" : errors.front()) +
                     "): correct it; tallyctl whitelist check tries it");
+      }
       found_.whitelist.problems.emplace_back("there is no whitelist");
       if (found_.lastDay)
         need("there is no whitelist at " + place + ": put one in place, since nothing is reported without");
       return;
     }
-    found_.whitelist.digest = config->configFileDigest();
-    std::vector<std::string>& problems = found_.whitelist.problems;
-    for (const std::string& error : log.errors()) problems.push_back(error);
-    bool isFault = !problems.empty();
-    const PlistValue root = bytes ? platform_.propertyListCodec.parse(*bytes).value : PlistValue();
-    if (root.asDictionary() != nullptr) {
-      for (WhitelistOddity& oddity : whitelistOddities(*root.asDictionary())) {
-        isFault |= oddity.isUnknownOption;
-        problems.push_back(std::move(oddity.text));
-      }
-    }
-    if (isFault)
+    found_.whitelist = {review->config->configFileDigest(), review->problems};
+    if (review->isFault)
       need("the whitelist " + place +
            " has rules that cannot be read or options that are unknown: tallyctl whitelist "
            "check names them");

@@ -4,18 +4,15 @@
 #include <array>
 #include <set>
 
-#include "platform/file_system.h"
 #include "platform/linux/base/host.h"
 #include "platform/linux/linux_notifications.h"
-#include "platform/platform.h"
-#include "platform/property_list_codec.h"
-#include "report/tb_config.h"
 #include "tools/tallyctl/controller_buffer.h"
 #include "tools/tallyctl/help/command_tree.h"
 #include "tools/tallyctl/metrics/selection.h"
 #include "tools/tallyctl/metrics/values.h"
 #include "tools/tallyctl/nand_glossary.h"
 #include "tools/tallyctl/tool.h"
+#include "tools/tallyctl/whitelist_review.h"
 
 namespace tbdaily {
 
@@ -68,9 +65,7 @@ const PlistDictionary noEntries;
 // Calls with each group of the whitelist.
 template <typename Visit>
 void visitWhitelist(Tool& tool, const Visit& visit) {
-  Platform& platform = tool.platform().services();
-  const auto bytes = platform.fileSystem.readFile(kWhitelistPath);
-  const PlistValue root = bytes ? platform.propertyListCodec.parse(*bytes).value : PlistValue();
+  const PlistValue root = whitelistRoot(tool.platform().services());
   const PlistDictionary* groups = root.asDictionary();
   if (groups == nullptr) return;
   for (const auto& [name, entries] : *groups) visit(name, entries);

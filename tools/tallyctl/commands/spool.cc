@@ -1,7 +1,6 @@
 // tallyctl spool: the logs that wait, and making room.
 
 #include <CLI/CLI.hpp>
-#include <charconv>
 
 #include "platform/calendar.h"
 #include "platform/kernel.h"

@@ -2,14 +2,10 @@
 
 #include <CLI/CLI.hpp>
 
-#include "platform/file_system.h"
 #include "platform/platform.h"
 #include "platform/plist_text.h"
-#include "platform/property_list_codec.h"
-#include "report/tb_config.h"
-#include "tools/tallyctl/captured_log.h"
 #include "tools/tallyctl/tool.h"
-#include "tools/tallyctl/whitelist_lint.h"
+#include "tools/tallyctl/whitelist_review.h"
 
 namespace tbdaily {
 
@@ -77,26 +73,17 @@ void printAnswer(Terminal& out, const KeyAnswer& answer) {
 
 void check(Tool& tool, const std::vector<std::string>& keys, bool strict) {
   if (!tool.hasUsableRoot()) return;
-  CapturedLog log;
-  Platform platform = platformWith(tool.platform().services(), log);
-  const auto config = TBConfig::init(platform);
+  const auto review = reviewWhitelist(tool.platform().services());
   if (!tool.hasReadAll()) return;
-  if (!config)
-    return tool.fail(log.errors().empty() ? "the whitelist cannot be loaded" : log.errors().front());
-
-  std::vector<std::string> problems;
-  std::vector<std::string> disabled;  // groups that a tasking switched off: nothing odd, but good to know
-  for (const CapturedLog::Message& message : log.messages) {
-    (message.level == LogLevel::Error ? problems : disabled).push_back(message.text);
+  const auto& config = review->config;
+  const std::vector<std::string>& problems = review->problems;
+  if (!config) {
+    const std::vector<std::string> errors = review->log.errors();
+    return tool.fail(errors.empty() ? "the whitelist cannot be loaded" : errors.front());
   }
-  bool isFault = !problems.empty();  // what the job itself complains about
-  const auto bytes = platform.fileSystem.readFile(kWhitelistPath);
-  const PlistValue root = bytes ? platform.propertyListCodec.parse(*bytes).value : PlistValue();
-  if (root.asDictionary() != nullptr) {
-    for (WhitelistOddity& oddity : whitelistOddities(*root.asDictionary())) {
-      isFault |= oddity.isUnknownOption;
-      problems.push_back(std::move(oddity.text));
-    }
+  std::vector<std::string> disabled;  // groups that a tasking switched off: nothing odd, but good to know
+  for (const CapturedLog::Message& message : review->log.messages) {
+    if (message.level != LogLevel::Error) disabled.push_back(message.text);
   }
   std::vector<KeyAnswer> answers;
   for (const std::string& key : keys) {
@@ -105,10 +92,10 @@ void check(Tool& tool, const std::vector<std::string>& keys, bool strict) {
     }
   }
 
-  if (isFault || (strict && !problems.empty())) {
+  if (review->isFault || (strict && !problems.empty())) {
     tool.fail(std::string(kWhitelistPath) +
-              (isFault ? " has rules that cannot be read or options that are unknown"
-                       : " has something odd in it"));
+              (review->isFault ? " has rules that cannot be read or options that are unknown"
+                               : " has something odd in it"));
   }
   if (tool.printedAsJson([&](JsonWriter& json) { writeCheck(json, *config, problems, answers); })) return;
   Terminal& out = tool.out();

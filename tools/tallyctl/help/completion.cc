@@ -1,13 +1,22 @@
 #include "tools/tallyctl/help/completion.h"
 
 #include <algorithm>
+#include <array>
+#include <string_view>
 #include <vector>
 
 #include "tools/tallyctl/help/command_tree.h"
 
 namespace tbdaily {
 
-constinit const std::array<ValueKind, 16> kValueKinds{{
+namespace {
+
+// What completes the value of an option or argument, by the name that stands for it in the help.
+struct ValueKind {
+  std::string_view value;  // "DRIVER"
+  std::string_view kind;   // as "complete" takes it; "files" and "folders" are the shell's own
+};
+constexpr std::array<ValueKind, 16> kValueKinds{{
     {"FILE", "files"},
     {"DIR", "folders"},
     {"DRIVER", "drivers"},
@@ -26,12 +35,11 @@ constinit const std::array<ValueKind, 16> kValueKinds{{
     {"COMMAND", "commands"},
 }};
 
+// Empty when there is none.
 std::string_view completionKindOf(std::string_view value) {
   const auto* found = std::ranges::find(kValueKinds, value, &ValueKind::value);
   return found != kValueKinds.end() ? found->kind : std::string_view();
 }
-
-namespace {
 
 // One command with what it completes.
 struct Place {
