@@ -30,9 +30,13 @@ include(CheckLinkerFlag)
 check_linker_flag(CXX -Wl,-z,pack-relative-relocs TBDAILY_PACKS_RELOCATIONS)
 set(TBDAILY_PACKED_RELOCATIONS $<$<BOOL:${TBDAILY_PACKS_RELOCATIONS}>:-Wl,-z,pack-relative-relocs>)
 
-# tbdaily_library(NAME SOURCES ... DEPENDS ...): one folder, one library. DEPENDS says which other folders it may include.
+# tbdaily_library(NAME SOURCES ... DEPENDS ... [PRECOMPILES ... | READS_AS NAME]): one folder, one library. DEPENDS says which other
+# folders it may include. What nearly every file includes is read once for all libraries; PRECOMPILES adds headers of this
+# library's files, READS_AS takes what another library precompiles. Not for clang, which finds the files that forget to include it.
+set(tbdaily_read_once <algorithm> <array> <cmath> <functional> <limits> <memory> <optional> <span> <string> <string_view> <utility>
+  <vector> ${PROJECT_SOURCE_DIR}/platform/plist_value.h)
 function(tbdaily_library name)
-  cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
+  cmake_parse_arguments(ARG "" "READS_AS" "SOURCES;DEPENDS;PRECOMPILES" ${ARGN})
   list(TRANSFORM ARG_DEPENDS PREPEND tbdaily_)
   add_library(tbdaily_${name} STATIC ${ARG_SOURCES})
   # A library of somebody else that links these objects shows none of their names.
@@ -40,14 +44,15 @@ function(tbdaily_library name)
   target_link_libraries(tbdaily_${name} PUBLIC ${ARG_DEPENDS} PRIVATE tbdaily_options)
   # Before the folders that a surrounding project gives to all its targets.
   target_include_directories(tbdaily_${name} BEFORE PUBLIC ${PROJECT_SOURCE_DIR})
-  # What nearly every file includes is read once. Not by clang, which finds the files that forget to include it.
-  if(CMAKE_CXX_COMPILER_ID STREQUAL GNU)
-    if(name STREQUAL platform)
-      target_precompile_headers(tbdaily_platform PRIVATE <algorithm> <array> <cmath> <functional> <limits> <memory> <optional> <span>
-        <string> <string_view> <utility> <vector> ${PROJECT_SOURCE_DIR}/platform/plist_value.h)
-    else()
-      target_precompile_headers(tbdaily_${name} REUSE_FROM tbdaily_platform)
-    endif()
+  if(NOT CMAKE_CXX_COMPILER_ID STREQUAL GNU)
+    return()
+  endif()
+  if(ARG_PRECOMPILES OR name STREQUAL platform)
+    target_precompile_headers(tbdaily_${name} PRIVATE ${tbdaily_read_once} ${ARG_PRECOMPILES})
+  elseif(ARG_READS_AS)
+    target_precompile_headers(tbdaily_${name} REUSE_FROM tbdaily_${ARG_READS_AS})
+  else()
+    target_precompile_headers(tbdaily_${name} REUSE_FROM tbdaily_platform)
   endif()
 endfunction()
 

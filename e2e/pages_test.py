@@ -57,6 +57,20 @@ class Pages(DeviceTest):
             if job:
                 job.wait(timeout=60)
 
+    def test_the_messages_that_are_explained_are_those_of_the_programs(self):
+        listed = subprocess.run([TREE / "scripts/sources"], cwd=TREE, capture_output=True, text=True, check=True).stdout.split()
+        code = " ".join((TREE / file).read_text() for file in listed if not file.endswith("_test.cc"))
+        code = re.sub(r'"\s*"', "", code).replace('\\"', '"')
+        explained = 0
+        for line in (TREE / "docs/operations.md").read_text().split("\n## Messages\n")[1].split("\n## ")[0].splitlines():
+            row = re.match(r"\| (?:\w+ \| )?(.*?) \|", line)
+            for message in re.findall(r"`([^`]+)`", row[1] if row else ""):
+                # What stands between the placeholders; the longest of it, since the rest may be put together.
+                fixed = max(re.split(r"\b[A-Z]{2,}\b|\b[NM]\b|\.\.\.|@\{\}|[\":,()]|requested|\w*\d+", message), key=len).strip()
+                explained += 1
+                self.assertTrue(fixed in code, message)
+        self.assertGreater(explained, 60)
+
 
 if __name__ == "__main__":
     unittest.main()

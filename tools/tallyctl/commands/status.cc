@@ -3,8 +3,8 @@
 #include <CLI/CLI.hpp>
 
 #include "tools/tallyctl/day_argument.h"
-#include "tools/tallyctl/device_status.h"
 #include "tools/tallyctl/sizes.h"
+#include "tools/tallyctl/status/device_status.h"
 #include "tools/tallyctl/tool.h"
 
 namespace tbdaily {

@@ -1,4 +1,4 @@
-#include "tools/tallyctl/report_preview.h"
+#include "tools/tallyctl/report/preview.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>

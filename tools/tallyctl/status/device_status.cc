@@ -1,4 +1,4 @@
-#include "tools/tallyctl/device_status.h"
+#include "tools/tallyctl/status/device_status.h"
 
 #include <fcntl.h>
 #include <sys/statvfs.h>
@@ -15,7 +15,7 @@
 #include "platform/platform.h"
 #include "platform/preferences_store.h"
 #include "tools/tallyctl/day_argument.h"
-#include "tools/tallyctl/report_preview.h"
+#include "tools/tallyctl/report/preview.h"
 #include "tools/tallyctl/sizes.h"
 #include "tools/tallyctl/store_copy.h"
 #include "tools/tallyctl/whitelist_review.h"

@@ -1,4 +1,4 @@
-#include "tools/tallyctl/report_view.h"
+#include "tools/tallyctl/report/view.h"
 
 #include <algorithm>
 #include <array>
@@ -13,14 +13,6 @@
 namespace tbdaily {
 
 namespace {
-
-const PlistDictionary kEmpty;
-
-const PlistDictionary& dictionaryOf(const PlistDictionary& root, std::string_view key) {
-  const PlistValue* value = root.find(key);
-  const PlistDictionary* dictionary = value != nullptr ? value->asDictionary() : nullptr;
-  return dictionary != nullptr ? *dictionary : kEmpty;
-}
 
 std::string text(const PlistValue& value) {
   return value.isNone() ? "-" : plistText(value);
@@ -120,17 +112,16 @@ void printAppInfo(Terminal& out, const PlistDictionary& root) {
 
 }  // namespace
 
-void printReport(Terminal& out, const PlistDictionary& root) {
-  printHead(out, root);
-  printEntries(out, "Metadata", dictionaryOf(root, "TBMetadata"), Table::Align::Left);
-  printEntries(out, "Scalars", dictionaryOf(root, "TBScalars"), Table::Align::Right);
-  printDistributions(out, dictionaryOf(root, "TBDistributions"));
-  const PlistDictionary& histograms = dictionaryOf(root, "TBDistributionsHistogram");
-  if (!histograms.empty()) printHeading(out, "Histograms", histograms.size());
-  for (const auto& [key, buckets] : histograms) {
+void printReport(Terminal& out, const DailyReport& report) {
+  printHead(out, report.root());
+  printEntries(out, "Metadata", report.metadata(), Table::Align::Left);
+  printEntries(out, "Scalars", report.scalars(), Table::Align::Right);
+  printDistributions(out, report.distributions());
+  if (!report.histograms().empty()) printHeading(out, "Histograms", report.histograms().size());
+  for (const auto& [key, buckets] : report.histograms()) {
     if (buckets.asDictionary() != nullptr) printHistogram(out, key, *buckets.asDictionary());
   }
-  printAppInfo(out, root);
+  printAppInfo(out, report.root());
 }
 
 }  // namespace tbdaily
