@@ -26,6 +26,7 @@ CASES = [
     ("buffer ", ["band-stats", "telemetry"], []),
     ("plist {root}/System/Device/cl", ["clock.plist"], []),
     ("record scalar k 3 --d", ["--day"], []),
+    ("export --format ndjson --table h", ["histograms"], ["scalars"]),
     ("help sp", ["spool"], [])]
 
 BASH = """source {script}

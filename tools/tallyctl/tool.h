@@ -76,6 +76,7 @@ void addRecordCommand(CLI::App& app, Tool& tool);
 void addSendCommand(CLI::App& app, Tool& tool);
 void addWaitCommand(CLI::App& app, Tool& tool);
 void addReportCommand(CLI::App& app, Tool& tool);
+void addExportCommand(CLI::App& app, Tool& tool);
 void addWhitelistCommand(CLI::App& app, Tool& tool);
 void addPlistCommand(CLI::App& app, Tool& tool);
 void addTaskingCommand(CLI::App& app, Tool& tool);

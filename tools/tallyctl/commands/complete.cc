@@ -7,6 +7,7 @@
 #include "platform/linux/base/host.h"
 #include "platform/linux/linux_notifications.h"
 #include "tools/tallyctl/controller_buffer.h"
+#include "tools/tallyctl/export/report_rows.h"
 #include "tools/tallyctl/help/command_tree.h"
 #include "tools/tallyctl/metrics/selection.h"
 #include "tools/tallyctl/metrics/values.h"
@@ -57,6 +58,15 @@ Words units(Tool& tool) {
 Words formats(Tool&) {
   Words words;
   for (std::uint8_t format = 0; format < 5; ++format) words.push_back(formatName(format));
+  return words;
+}
+
+Words exportFormats(Tool&) {
+  return {"tsv", "ndjson", "prometheus"};
+}
+Words exportTables(Tool&) {
+  Words words;
+  for (const ExportTableDescription& table : kExportTables) words.emplace_back(table.name);
   return words;
 }
 
@@ -117,12 +127,14 @@ struct Kind {
   std::string_view name;
   Words (*words)(Tool& tool);
 };
-constexpr std::array<Kind, 13> kKinds{{{"drivers", drivers},
+constexpr std::array<Kind, 15> kKinds{{{"drivers", drivers},
                                        {"groups", groups},
                                        {"subgroups", subGroups},
                                        {"channels", channels},
                                        {"units", units},
                                        {"formats", formats},
+                                       {"exports", exportFormats},
+                                       {"tables", exportTables},
                                        {"switches", switches},
                                        {"keys", keys},
                                        {"figures", figures},

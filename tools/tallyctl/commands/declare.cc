@@ -21,7 +21,7 @@ constexpr std::array<CommandGroup, 4> kGroups{{
      {addConsentCommand, addWhitelistCommand, addGroupCommand, addTaskingCommand, addSpoolCommand}},
     {"A device to try",
      {addInitCommand, addCaptureCommand, addRecordCommand, addSendCommand, addWaitCommand}},
-    {"Files and buffers", {addPlistCommand, addBufferCommands}},
+    {"Files and buffers", {addExportCommand, addPlistCommand, addBufferCommands}},
 }};
 
 }  // namespace

@@ -16,7 +16,7 @@ struct ValueKind {
   std::string_view value;  // "DRIVER"
   std::string_view kind;   // as "complete" takes it; "files" and "folders" are the shell's own
 };
-constexpr std::array<ValueKind, 16> kValueKinds{{
+constexpr std::array<ValueKind, 18> kValueKinds{{
     {"FILE", "files"},
     {"DIR", "folders"},
     {"DRIVER", "drivers"},
@@ -25,6 +25,8 @@ constexpr std::array<ValueKind, 16> kValueKinds{{
     {"CHANNEL", "channels"},
     {"UNIT", "units"},
     {"FORMAT", "formats"},
+    {"ROWS", "exports"},
+    {"TABLE", "tables"},
     {"KEY", "keys"},
     {"FIGURE", "figures"},
     {"SWITCH", "switches"},
