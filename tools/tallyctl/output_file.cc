@@ -6,6 +6,7 @@
 
 #include <cerrno>
 #include <cstdlib>
+#include <filesystem>
 
 #include "platform/linux/base/file_io.h"
 #include "platform/linux/base/file_judgement.h"
@@ -40,10 +41,9 @@ Outcome<Nothing> OutputFile::open(const std::string& path, OutputMode mode) {
   struct stat there {};
   if (::stat(path.c_str(), &there) == 0) {
     if (!S_ISREG(there.st_mode)) return outcomeOf(openInPlace(path, file_));
-    if (char* target = ::realpath(path.c_str(), nullptr); target != nullptr) {
-      place_ = target;
-      std::free(target);
-    }
+    std::error_code error;
+    const std::filesystem::path target = std::filesystem::canonical(path, error);
+    if (!error) place_ = target.native();
   }
   std::string passing = place_ + ".XXXXXX";
   file_ = FileDescriptor(::mkostemp(passing.data(), O_CLOEXEC));

@@ -59,6 +59,7 @@ class ReportFiles {
   const std::optional<std::string> device_;
   const std::string folder_;  // where relative paths begin
   std::size_t bytes_ = 0;
+  FileContents contents_, description_;  // of the file at hand: its memory serves the next one
 };
 
 }  // namespace tbdaily

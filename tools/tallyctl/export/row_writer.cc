@@ -14,18 +14,14 @@ namespace tbdaily {
 namespace {
 
 constexpr std::size_t kPiece = std::size_t{64} << 10;
+constexpr double kWholeBelow = 1e15;  // whole numbers are written without an exponent
 
-// What either format takes as it is: no control, nothing but ASCII, no quotation mark and backslash.
-constexpr std::array<bool, 256> kIsPlain = [] {
-  std::array<bool, 256> plain{};
-  for (std::size_t c = 0x20; c < 0x7F; ++c) plain[c] = c != '"' && c != '\\';
-  return plain;
-}();
-
+// Whether either format takes the text as it is: no control, nothing but ASCII, no quotation mark and
+// backslash. Without a branch for a character, so that many are looked at together.
 bool isPlain(std::string_view text) {
-  bool plain = true;
-  for (const char c : text) plain = plain && kIsPlain[static_cast<unsigned char>(c)];
-  return plain;
+  bool isOther = false;
+  for (const char c : text) isOther |= c < 0x20 || c >= 0x7F || c == '"' || c == '\\';
+  return !isOther;
 }
 
 // Well-formed, without U+0000.
@@ -37,6 +33,11 @@ std::string takenByEngines(std::string_view text) {
     text.remove_prefix(std::max<std::size_t>(length, 1));
   }
   return taken;
+}
+
+void appendDigits(std::string& out, std::int64_t value) {
+  std::array<char, 24> digits;
+  out.append(digits.data(), std::to_chars(digits.data(), digits.data() + digits.size(), value).ptr);
 }
 
 void appendEscapedForTsv(std::string& out, std::string_view text) {
@@ -99,12 +100,14 @@ void RowWriter::text(std::string_view text) {
 
 void RowWriter::integer(std::int64_t value) {
   lead();
-  std::array<char, 24> digits;
-  out_.append(digits.data(), std::to_chars(digits.data(), digits.data() + digits.size(), value).ptr);
+  appendDigits(out_, value);
 }
 
 void RowWriter::real(double value) {
   lead();
+  // The text is the same, and comes sooner: bounds of buckets are whole numbers for the most part.
+  if (std::fabs(value) < kWholeBelow && value == std::trunc(value) && !(value == 0 && std::signbit(value)))
+    return appendDigits(out_, static_cast<std::int64_t>(value));
   const std::string_view mark = format_ == RowFormat::Tsv || std::isfinite(value) ? "" : "\"";
   out_.append(mark).append(realText(value)).append(mark);
 }
