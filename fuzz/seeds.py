@@ -4,6 +4,7 @@
 Usage: fuzz/seeds.py TALLYCTL DEVICE FOLDER
 """
 
+import datetime
 import pathlib
 import plistlib
 import re
@@ -68,6 +69,14 @@ class Seeds:
             self.add("json_fuzz", path.stem + ".json", json)
         for name, value in self.lists.items():
             self.add("plist_fuzz", name + ".binary", small(value, MOST))
+
+    def reports(self):
+        report = {"TBCrashLogVersion": 1, "TBStartDate": datetime.datetime(2026, 11, 23), "TBLogCreationDate": datetime.datetime(2026, 11, 24),
+                  "TBMetadata": {"TBUserSetRegionFormat": "AT"}, "TBTaskID": "t", "TBWhitelistDigest": "d", "TBScalars": {"a\t\"": -5},
+                  "TBDistributions": {"k": [1.5, 60.0, 20.25, 1e100, 4]},
+                  "TBDistributionsHistogram": {"k": {"(-inf, 2.5]": 3, "(50, inf)": 1}}}
+        for form in (plistlib.FMT_XML, plistlib.FMT_BINARY):
+            self.add("export_fuzz", form.name, plistlib.dumps(report, fmt=form, sort_keys=False))
 
     def storage(self):
         stats = self.buffer("stats")
@@ -137,7 +146,7 @@ class Seeds:
 
 def main():
     seeds = Seeds(sys.argv[1], pathlib.Path(sys.argv[2]), pathlib.Path(sys.argv[3]))
-    for make in (seeds.codecs, seeds.storage, seeds.values, seeds.channels, seeds.streams, seeds.days, seeds.machines):
+    for make in (seeds.codecs, seeds.reports, seeds.storage, seeds.values, seeds.channels, seeds.streams, seeds.days, seeds.machines):
         make()
 
 
