@@ -133,6 +133,13 @@ class Rows(DeviceTest):
         device.tally("export", "--table", "scalars", "-o", str(out), report)
         self.assertEqual(len(out.read_text().splitlines()), 2)
         self.assertEqual([file.name for file in device.base.glob("rows*")], ["rows"])
+        told = subprocess.Popen([BIN / "tallyctl", "export", "--table", "scalars", "-o", out, "--files-from", "-"], env=device.env,
+                                stdin=subprocess.PIPE, stderr=subprocess.PIPE, text=True)
+        device.wait_for(lambda: len(list(device.base.glob("rows*"))) == 2)
+        told.terminate()
+        said = told.communicate(timeout=60)[1]
+        self.assertEqual((told.returncode, [file.name for file in device.base.glob("rows*")]), (1, ["rows"]))
+        self.assertIn("interrupted", said)
         for words in ((), ("--table", "x"), ("--format", "x", "--table", "scalars"), ("--table", "scalars", "--files-from", "x", report),
                       ("--format", "prometheus", report), ("--json", "--table", "scalars")):
             self.assertEqual(len(device.tally("export", *words, status=2).splitlines()), 1)

@@ -61,13 +61,14 @@ class ExportOutput {
     tool_.out().print(ShownText::lines(text));
     return true;
   }
-  bool finish() { return isTerminal_ || (!isStopped() && holds(file_.finish())); }
-
-  bool isStopped() {
-    if (!signals_ || !signals_->haveCome()) return false;
+  bool finish() {
+    if (!isStopped()) return isTerminal_ || holds(file_.finish());
     tool_.fail("interrupted; " + path_ + " is as it was");
-    return true;
+    return false;
   }
+
+  // Whether the program was told to end.
+  bool isStopped() const { return signals_ && signals_->haveCome(); }
 
  private:
   bool holds(const Outcome<Nothing>& outcome) {
@@ -120,7 +121,7 @@ void exportRows(Tool& tool, const ExportArguments& arguments, RowFormat format,
       read = files.visitListed(arguments.list, visitor);
     else
       files.visit(arguments.files, visitor);
-    if (!read) return tool.fail(read.reason());
+    if (!read && !output.isStopped()) return tool.fail(read.reason());
   }
   if (rows.finish()) output.finish();
 }

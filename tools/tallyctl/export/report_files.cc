@@ -137,19 +137,20 @@ void ReportFiles::visit(std::span<const std::string> paths, const ReportVisitor&
 }
 
 Outcome<Nothing> ReportFiles::visitListed(const std::string& list, const ReportVisitor& visitor) {
+  const std::string name = list == "-" ? "standard input" : list;
   FileDescriptor file(list == "-" ? ::dup(STDIN_FILENO) : -1);
   const int error = list != "-" ? openHostFile(list, file) : file.isOpen() ? 0 : errno;
-  if (error != 0) return Failure{list + ": " + errorText(error)};
+  if (error != 0) return Failure{name + ": " + errorText(error)};
   LineReader lines(file.get());
   file.release();
   while (const auto line = lines.next(kLongestName)) {
     if (line->empty()) continue;
     const bool isName = line->size() <= kLongestName && line->find('\0') == std::string::npos;
-    if (!visitor(isName ? readFromHost(*line) : Failure{list + ": a line of it is no name of a file"},
+    if (!visitor(isName ? readFromHost(*line) : Failure{name + ": a line of it is no name of a file"},
                  bytes_))
       return Nothing{};
   }
-  if (lines.hasFailed()) return Failure{list + ": " + errorText(errno)};
+  if (lines.hasFailed()) return Failure{name + ": " + errorText(errno)};
   return Nothing{};
 }
 
