@@ -9,6 +9,7 @@
 #include "platform/platform.h"
 #include "tools/tallyctl/day_argument.h"
 #include "tools/tallyctl/input_file.h"
+#include "tools/tallyctl/key_selection.h"
 #include "tools/tallyctl/report/daily_report.h"
 #include "tools/tallyctl/report/kept_reports.h"
 #include "tools/tallyctl/report/key_views.h"
