@@ -14,8 +14,8 @@ namespace tbdaily {
 namespace {
 
 // In the drawing's own units. Labels have room for the size that they take on a narrow screen.
-constexpr double kWidth = 720, kHeight = 330;
-constexpr double kLeft = 92, kRight = 704, kTop = 16, kBottom = 284;
+constexpr double kWidth = 720, kHeight = 390;
+constexpr double kLeft = 92, kRight = 704, kTop = 16, kBottom = 344;
 constexpr double kDotRadius = 3.5;
 constexpr std::size_t kMostDots = 31;  // of a line on which each point has one
 constexpr std::int64_t kMostDayLabels = 3;

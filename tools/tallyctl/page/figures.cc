@@ -1,5 +1,6 @@
 #include "tools/tallyctl/page/figures.h"
 
+#include <algorithm>
 #include <array>
 #include <cmath>
 #include <cstdio>
@@ -15,6 +16,17 @@ void writeData(HtmlWriter& page, std::string_view whole, std::string_view shown)
   page.markup("<data value=\"").text(whole).markup("\">").text(shown).markup("</data>");
 }
 
+// The digits before the point in groups of three.
+std::string grouped(std::string number) {
+  const std::size_t first = number.starts_with('-') ? 1 : 0;
+  for (std::size_t i = std::min(number.find_first_not_of("0123456789", first), number.size());
+       i > first + 3;) {
+    i -= 3;
+    number.insert(i, 1, ',');
+  }
+  return number;
+}
+
 // With so many digits behind the point that there are three.
 std::string threeDigits(double value) {
   std::array<char, 512> text;  // the longest double has 309 digits before its point
@@ -27,13 +39,7 @@ std::string threeDigits(double value) {
 }  // namespace
 
 std::string groupedDigits(std::int64_t value) {
-  std::string text = std::to_string(value);
-  const std::size_t first = value < 0 ? 1 : 0;
-  for (std::size_t i = text.size(); i > first + 3;) {
-    i -= 3;
-    text.insert(i, 1, ',');
-  }
-  return text;
+  return grouped(std::to_string(value));
 }
 
 std::string scaleText(double value, std::string_view unit) {
@@ -53,7 +59,7 @@ void writeFigure(HtmlWriter& page, std::int64_t value) {
 void writeFigure(HtmlWriter& page, double value) {
   const std::string whole = realText(value);
   if (std::isinf(value)) return writeData(page, whole, value < 0 ? "-\u221e" : "\u221e");
-  const std::string shown = std::isnan(value) ? "not a number" : sixDigits(value);
+  const std::string shown = std::isnan(value) ? "not a number" : grouped(sixDigits(value));
   whole == shown ? static_cast<void>(page.text(shown)) : writeData(page, whole, shown);
 }
 

@@ -16,8 +16,8 @@ std::string scaleText(double value, std::string_view unit);
 
 // Digits in groups; <data value="1234567"> holds those without.
 void writeFigure(HtmlWriter& page, std::int64_t value);
-// Six significant digits; where these are not all, or the value is not finite, <data> holds the shortest text
-// that reads back to it.
+// Six significant digits, in groups; where these are not all, or the value is not finite, <data> holds the
+// shortest text that reads back to it.
 void writeFigure(HtmlWriter& page, double value);
 // The figure under another text of it: "4.20 TB".
 void writeFigureAs(HtmlWriter& page, double value, std::string_view text);

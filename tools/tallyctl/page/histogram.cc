@@ -14,10 +14,11 @@ namespace tbdaily {
 
 namespace {
 
-// In the drawing's own units.
-constexpr double kWidth = 460, kHeight = 210;
-constexpr double kLeft = 46, kRight = 452, kTop = 12, kBottom = 182;
-constexpr double kLabelHeight = 13, kDigitWidth = 8.2, kLabelGap = 12;
+// In the drawing's own units. Labels have room for the size that they take on a narrow screen.
+constexpr double kWidth = 460, kHeight = 200;
+constexpr double kLeft = 44, kRight = 436, kTop = 10, kBottom = 170;
+constexpr double kWidestSlot = 84;
+constexpr double kLabelHeight = 13, kDigitWidth = 9.5, kLabelGap = 12;
 constexpr std::size_t kLongTable = 12;  // buckets from which on the table scrolls
 
 std::string edgeText(double bound) {
@@ -29,11 +30,11 @@ double heightOf(const ChartScale& scale, double value) {
   return scale.share(value) * (kBottom - kTop);
 }
 
-void writeScale(HtmlWriter& page, const ChartScale& scale) {
+void writeScale(HtmlWriter& page, const ChartScale& scale, double right) {
   for (int i = 0; i <= scale.steps; ++i) {
     const double y = kBottom - heightOf(scale, scale.at(i));
     page.markup("<path class=\"grid\" d=\"M").coordinate(kLeft).markup(" ").coordinate(y).markup("H");
-    page.coordinate(kRight)
+    page.coordinate(right)
         .markup("\"/><text text-anchor=\"end\" x=\"")
         .coordinate(kLeft - 6)
         .markup("\" y=\"");
@@ -51,8 +52,10 @@ void writeEdges(HtmlWriter& page, std::span<const HistogramBucket> buckets, doub
   const auto every = std::max<std::size_t>(1, static_cast<std::size_t>(std::ceil(room / slot)));
   for (std::size_t i = 0; i < edges.size(); i += every) {
     const double x = kLeft + slot * static_cast<double>(i);
-    page.markup("<text text-anchor=\"middle\" x=\"").coordinate(x).markup("\" y=\"").coordinate(kBottom + 19);
-    page.markup("\">").text(edges[i]).markup("</text>\n");
+    const bool isCut = x + static_cast<double>(edges[i].size()) * kDigitWidth / 2 > kWidth;
+    page.markup("<text text-anchor=\"").markup(isCut ? Markup("end") : Markup("middle")).markup("\" x=\"");
+    page.coordinate(isCut ? kWidth : x).markup("\" y=\"").coordinate(kBottom + 21).markup("\">");
+    page.text(edges[i]).markup("</text>\n");
   }
 }
 
@@ -77,13 +80,15 @@ void writeHistogramDrawing(HtmlWriter& page, std::string_view key, std::span<con
   std::int64_t largest = 0;
   for (const HistogramBucket& bucket : buckets) largest = std::max(largest, bucket.count);
   const ChartScale scale = chartScale(0, static_cast<double>(largest), true);
-  const double slot = (kRight - kLeft) / static_cast<double>(buckets.size());
+  const auto slots = static_cast<double>(buckets.size());
+  const double slot = std::min((kRight - kLeft) / slots, kWidestSlot);
+  const double right = kLeft + slot * slots;
   page.markup("<svg role=\"img\" viewBox=\"0 0 ").coordinate(kWidth).markup(" ").coordinate(kHeight);
   page.markup("\" aria-label=\"Histogram of ").text(key).markup("\">\n");
-  writeScale(page, scale);
+  writeScale(page, scale, right);
   writeBars(page, buckets, scale, slot);
   page.markup("<path class=\"axis\" d=\"M").coordinate(kLeft).markup(" ").coordinate(kBottom).markup("H");
-  page.coordinate(kRight).markup("\"/>\n");
+  page.coordinate(right).markup("\"/>\n");
   writeEdges(page, buckets, slot);
   page.markup("</svg>\n");
 }
@@ -91,7 +96,7 @@ void writeHistogramDrawing(HtmlWriter& page, std::string_view key, std::span<con
 void writeHistogramTable(HtmlWriter& page, std::string_view key, std::span<const HistogramBucket> buckets) {
   const bool isLong = buckets.size() > kLongTable;
   if (isLong) beginScroll(page, Scroll::Tall, "Buckets of " + std::string(key));
-  page.markup("<table><caption>Values above the lower bound, up to the upper one</caption>\n")
+  page.markup("<table><caption>Above the lower bound, up to the upper</caption>\n")
       .markup("<thead><tr><th scope=\"col\" class=\"n\">Lower</th><th scope=\"col\" class=\"n\">Upper</th>")
       .markup("<th scope=\"col\" class=\"n\">Count</th></tr></thead>\n<tbody>\n");
   for (const HistogramBucket& bucket : buckets) {

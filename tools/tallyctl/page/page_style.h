@@ -52,21 +52,25 @@ nav a { display: inline-block; padding-block: .6rem; }
 .facts > div { display: contents; }
 .facts dt { color: var(--quiet); }
 .facts dd { overflow-wrap: anywhere; min-width: 0; }
+.facts dd.key { align-self: center; }
 
+.sheet.narrow { max-width: 48rem; }
 .sheet { background: var(--sheet); border: 1px solid var(--line); border-radius: .5rem; overflow: hidden; }
 table { border-collapse: collapse; width: 100%; background: var(--sheet); }
 caption { text-align: start; color: var(--quiet); font-size: .875rem; padding: .65rem 1rem; }
-th, td { padding: .4rem 1rem; border-block-start: 1px solid var(--line); text-align: start; vertical-align: top; }
+th, td { padding: .3rem 1rem; border-block-start: 1px solid var(--line); text-align: start; vertical-align: top; }
 thead th { color: var(--quiet); font-size: .875rem; font-weight: 600; vertical-align: bottom; background: var(--soft); }
 tbody th { font-weight: 400; }
+th.key { padding-block: .4rem; }
 tbody tr:hover > * { background: var(--soft); }
 .n { text-align: end; white-space: nowrap; }
 td small { display: block; color: var(--quiet); font-size: .8125rem; }
 td.wrap { overflow-wrap: anywhere; min-width: 8rem; }
+.day { white-space: nowrap; }
 .gone { color: var(--quiet); font-style: italic; }
 .back { color: var(--warn); font-weight: 600; }
 .scroll { overflow: auto; max-width: 100%; }
-.scroll.tall { max-height: 22rem; }
+.scroll.tall { max-height: 20rem; }
 .scroll.tall thead th { position: sticky; inset-block-start: 0; }
 
 .card { background: var(--sheet); border: 1px solid var(--line); border-radius: .5rem; margin-block-end: 1rem; padding: 1rem; }
@@ -76,9 +80,10 @@ td.wrap { overflow-wrap: anywhere; min-width: 8rem; }
 .pair { display: grid; grid-template-columns: minmax(0, 1fr); gap: 1rem 1.5rem; margin-block-start: 1rem; align-items: start; }
 @media (min-width: 50rem) {
   .pair { grid-template-columns: minmax(0, 3fr) minmax(0, 2fr); }
-  .pair.wide { grid-template-columns: minmax(0, 8fr) minmax(0, 7fr); }
+  .pair.wide { grid-template-columns: minmax(0, 5fr) minmax(0, 3fr); }
 }
 .pair > * { min-width: 0; }
+.card > .pair:first-child { margin-block-start: 0; }
 .pair table, .pair .scroll { font-size: .875rem; }
 .pair caption { padding: 0 0 .5rem; }
 .pair th, .pair td { padding: .25rem .6rem; }
@@ -88,7 +93,8 @@ details { margin-block-end: .5rem; }
 summary { cursor: pointer; padding: .6rem 1rem; overflow-wrap: anywhere; }
 details > .card:first-of-type { margin-block-start: .5rem; }
 
-svg { display: block; width: 100%; height: auto; }
+svg { display: block; width: 100%; max-width: 32rem; height: auto; }
+svg.days { max-width: none; }
 svg text { fill: var(--quiet); font-size: 13px; font-family: inherit; }
 svg .bar { fill: var(--first); }
 svg .grid { stroke: var(--line); stroke-width: 1; fill: none; }
@@ -111,6 +117,7 @@ svg text.mark { fill: var(--warn); stroke: none; }
   .tiles > div { padding: .6rem .75rem; }
   .tiles dd { font-size: 1.25rem; }
   th, td { padding-inline: .75rem; }
+  svg text { font-size: 16px; }
   .days text { font-size: 23px; }
 }
 @media (forced-colors: active) {

@@ -142,7 +142,7 @@ class ReportPage {
     writeInParts(page_, scalars.size(), kRowsInPart, keyOf, [&](std::size_t first, std::size_t behind) {
       page_
           .markup(
-              "<div class=\"sheet\"><table><caption>As they leave this device: made as coarse as the "
+              "<div class=\"sheet narrow\"><table><caption>As they leave this device: made as coarse as the "
               "whitelist ")
           .markup(
               "says</caption>\n<thead><tr><th scope=\"col\">Key</th><th scope=\"col\" class=\"n\">Value</th>")
@@ -204,7 +204,8 @@ class ReportPage {
     if (metadata.empty()) return writeNothing("The report has no metadata.");
     page_
         .markup(
-            "<div class=\"sheet\"><table><caption>What the report says of the device's languages and region")
+            "<div class=\"sheet narrow\"><table><caption>What the report says of the device's languages and "
+            "region")
         .markup(
             "</caption>\n<thead><tr><th scope=\"col\">Name</th><th "
             "scope=\"col\">Value</th></tr></thead>\n<tbody>\n");

@@ -96,7 +96,7 @@ class WearPage {
                                countOf(pace.hottestCycle, "time", "times") + " until " +
                                dayText(pace.lastDay);
     if (!subject_.enduranceCycles)
-      return erased + ", " + sixDigits(pace.cyclesPerDay) + " times a day over the last " +
+      return erased + ", " + sixDigits(pace.cyclesPerDay) + " a day over the last " +
              countOf(pace.days, "day", "days") + ".";
     const std::string made = countOf(*subject_.enduranceCycles, "time", "times");
     if (pace.hottestCycle >= *subject_.enduranceCycles)
@@ -115,9 +115,7 @@ class WearPage {
     writeFact(page_, "Days shown",
               first() == last() ? dayText(first()) : dayText(first()) + " to " + dayText(last()));
     writeFact(page_, "With a record",
-              groupedDigits(recorded) + (totals_.daysMissing > 0
-                                             ? ", " + groupedDigits(totals_.daysMissing) + " without"
-                                             : std::string()));
+              groupedDigits(recorded) + " of " + groupedDigits(recorded + totals_.daysMissing));
     if (!daysBack_.empty()) {
       std::string days;
       for (const DayNumber day : daysBack_) days += (days.empty() ? "" : ", ") + dayText(day);
@@ -153,9 +151,9 @@ class WearPage {
       endTile("flash over host");
     }
     if (pace) {
-      beginTile("Erases of the most worn block");
+      beginTile("Most worn block");
       writeFigure(page_, pace->hottestCycle);
-      endTile(sixDigits(pace->cyclesPerDay) + " a day lately");
+      endTile("erases; " + sixDigits(pace->cyclesPerDay) + " a day lately");
     }
     if (pace && subject_.enduranceCycles) {
       const double share =
@@ -180,7 +178,7 @@ class WearPage {
     page_.markup("</tr></thead>\n<tbody>\n");
     for (const WearDay& day : history_.days) {
       if (day.daysMissing > 0) writeMissing(day, columns);
-      page_.markup("<tr><th scope=\"row\" class=\"n\">").text(dayText(day.day)).markup("</th>");
+      page_.markup("<tr><th scope=\"row\" class=\"day\">").text(dayText(day.day)).markup("</th>");
       if (day.wentBack && isComparison) {
         page_.markup("<td class=\"n back\" colspan=\"").markup(columns).markup("\">counters went back</td>");
       } else {
