@@ -8,6 +8,7 @@
 namespace tbdaily {
 
 void beginPage(HtmlWriter& page, std::string_view title, std::string_view over) {
+  const std::size_t lastWord = title.rfind(' ') + 1;
   page.markup("<!DOCTYPE html>\n<html lang=\"en\">\n<head>\n<meta charset=\"utf-8\">\n")
       .markup("<meta http-equiv=\"Content-Security-Policy\" content=\"default-src 'none'; ")
       .markup("style-src 'unsafe-inline'; img-src data:\">\n")
@@ -23,8 +24,10 @@ void beginPage(HtmlWriter& page, std::string_view title, std::string_view over) 
       .markup("<p class=\"over\">")
       .text(over)
       .markup("</p>\n<h1>")
-      .text(title)
-      .markup("</h1>\n");
+      .text(title.substr(0, lastWord))
+      .markup("<span class=\"day\">")
+      .text(title.substr(lastWord))
+      .markup("</span></h1>\n");
 }
 
 void endPage(HtmlWriter& page) {

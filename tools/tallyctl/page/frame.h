@@ -10,7 +10,8 @@
 
 namespace tbdaily {
 
-// Up to the body's first content; the title is also the page's first heading. `over` stands above it, small.
+// Up to the body's first content; the title is also the page's first heading, in which its last word is kept
+// on one line: a day, for example. `over` stands above it, small.
 void beginPage(HtmlWriter& page, std::string_view title, std::string_view over);
 void endPage(HtmlWriter& page);
 

@@ -57,13 +57,14 @@ nav a { display: inline-block; padding-block: .6rem; }
 .sheet.narrow { max-width: 48rem; }
 .sheet { background: var(--sheet); border: 1px solid var(--line); border-radius: .5rem; overflow: hidden; }
 table { border-collapse: collapse; width: 100%; background: var(--sheet); }
-caption { text-align: start; color: var(--quiet); font-size: .875rem; padding: .65rem 1rem; }
+caption { background: var(--sheet); text-align: start; color: var(--quiet); font-size: .875rem; padding: .65rem 1rem; }
 th, td { padding: .3rem 1rem; border-block-start: 1px solid var(--line); text-align: start; vertical-align: top; }
 thead th { color: var(--quiet); font-size: .875rem; font-weight: 600; vertical-align: bottom; background: var(--soft); }
 tbody th { font-weight: 400; }
 th.key { padding-block: .4rem; }
 tbody tr:hover > * { background: var(--soft); }
 .n { text-align: end; white-space: nowrap; }
+.sheet .n { width: 1%; }
 td small { display: block; color: var(--quiet); font-size: .8125rem; }
 td.wrap { overflow-wrap: anywhere; min-width: 8rem; }
 .day { white-space: nowrap; }
@@ -116,6 +117,7 @@ svg text.mark { fill: var(--warn); stroke: none; }
   .tiles { grid-template-columns: repeat(2, minmax(0, 1fr)); }
   .tiles > div { padding: .6rem .75rem; }
   .tiles dd { font-size: 1.25rem; }
+  .stats { display: grid; grid-template-columns: repeat(auto-fill, minmax(6.25rem, 1fr)); gap: .5rem; }
   th, td { padding-inline: .75rem; }
   svg text { font-size: 16px; }
   .days text { font-size: 23px; }

@@ -151,9 +151,9 @@ class WearPage {
       endTile("flash over host");
     }
     if (pace) {
-      beginTile("Most worn block");
+      beginTile("Most erases of a block");
       writeFigure(page_, pace->hottestCycle);
-      endTile("erases; " + sixDigits(pace->cyclesPerDay) + " a day lately");
+      endTile(sixDigits(pace->cyclesPerDay) + " a day lately");
     }
     if (pace && subject_.enduranceCycles) {
       const double share =
@@ -174,10 +174,13 @@ class WearPage {
     writeDayChart(page_, chart, first(), last());
     page_.markup("</figure>\n");
     beginScroll(page_, Scroll::Tall, std::string(chart.name.bytes()) + ", day by day");
-    page_.markup("<table><caption>Day by day</caption>\n<thead><tr><th scope=\"col\">Day</th>").markup(head);
+    page_
+        .markup(
+            "<table><caption>Day by day, the last one first</caption>\n<thead><tr><th scope=\"col\">Day</th>")
+        .markup(head);
     page_.markup("</tr></thead>\n<tbody>\n");
-    for (const WearDay& day : history_.days) {
-      if (day.daysMissing > 0) writeMissing(day, columns);
+    for (auto at = history_.days.rbegin(); at != history_.days.rend(); ++at) {
+      const WearDay& day = *at;
       page_.markup("<tr><th scope=\"row\" class=\"day\">").text(dayText(day.day)).markup("</th>");
       if (day.wentBack && isComparison) {
         page_.markup("<td class=\"n back\" colspan=\"").markup(columns).markup("\">counters went back</td>");
@@ -185,6 +188,7 @@ class WearPage {
         writeCells(day);
       }
       page_.markup("</tr>\n");
+      if (day.daysMissing > 0) writeMissing(day, columns);
     }
     page_.markup("</tbody></table>\n");
     endScroll(page_);
@@ -213,15 +217,14 @@ class WearPage {
     DayChart chart{"Written per day", "B"};
     chart.lines = {lineOf("by the host", history_, host), lineOf("to the flash", history_, flash)};
     chart.marks = daysBack_;
-    writeSection(
-        chart,
-        "Behind days without a record stands what was written since, spread over them. Dotted upright lines "
-        "mark days on which the counters went back.",
-        "<th scope=\"col\" class=\"n\">Host</th><th scope=\"col\" class=\"n\">Flash</th>", "2", true,
-        [&](const WearDay& day) {
-          writeBytesCell(host(day));
-          writeBytesCell(flash(day));
-        });
+    writeSection(chart,
+                 "What was written over days without a record is spread over them. Dotted upright lines "
+                 "mark days on which the counters went back.",
+                 "<th scope=\"col\" class=\"n\">Host</th><th scope=\"col\" class=\"n\">Flash</th>", "2", true,
+                 [&](const WearDay& day) {
+                   writeBytesCell(host(day));
+                   writeBytesCell(flash(day));
+                 });
   }
 
   void writeAmplification() {
