@@ -150,6 +150,23 @@ std::string Terminal::bar(double value, double maximum, std::size_t width) const
   return repeated("█", eighths / 8).append(kEighths[eighths % 8]);
 }
 
+std::string Terminal::sparkline(const std::vector<std::optional<double>>& values, double lowest,
+                                double highest) const {
+  static constexpr std::array<std::string_view, 8> kBlocks = {"▁", "▂", "▃", "▄", "▅", "▆", "▇", "█"};
+  static constexpr std::array<std::string_view, 8> kPlain = {".", ":", "-", "=", "+", "*", "#", "@"};
+  const auto& marks = drawing_ ? kBlocks : kPlain;
+  std::string line;
+  for (const std::optional<double>& value : values) {
+    if (!value || !std::isfinite(*value)) {
+      line += ' ';
+      continue;
+    }
+    const double share = highest > lowest ? (*value - lowest) / (highest - lowest) : 0;
+    line += marks[static_cast<std::size_t>(std::lround(std::clamp(share, 0.0, 1.0) * 7))];
+  }
+  return line;
+}
+
 void printError(const ShownText& reason) {
   std::fprintf(stderr, "tallyctl: %s\n", reason.bytes().c_str());
 }

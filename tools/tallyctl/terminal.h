@@ -4,6 +4,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -57,6 +58,11 @@ class Terminal {
   // A bar of `value` out of `maximum` in at most `width` columns: block characters where they can be shown,
   // else '#'. A value that is not 0 shows at least one mark.
   std::string bar(double value, double maximum, std::size_t width) const;
+
+  // One column for each value between the two bounds; a space where there is none. Eighths of blocks where
+  // they can be shown, else characters that grow darker.
+  std::string sparkline(const std::vector<std::optional<double>>& values, double lowest,
+                        double highest) const;
 
   std::size_t width() const { return width_; }
 
