@@ -7,7 +7,7 @@ inline constexpr char kPageStyle[] = R"css(
 :root {
   color-scheme: light dark;
   --ground: #f5f6f7; --sheet: #fff; --text: #15181c; --quiet: #434b54; --line: #d5dadf; --soft: #eceff2;
-  --first: #0b5aa9; --second: #a8430b; --warn: #8a1c1c;
+  --first: #0a4f96; --second: #a8430b; --warn: #8a1c1c;
   --mono: ui-monospace, SFMono-Regular, Menlo, Consolas, "DejaVu Sans Mono", monospace;
 }
 @media (prefers-color-scheme: dark) {
