@@ -106,9 +106,11 @@ class Pages(unittest.TestCase):
         cls.addClassCleanup(sample.close)
         sample.run("-f")
         sample.tally("report", "--html", str(cls.pages["report"]))
-        sample.tally("record", "import", stdin="\n".join(wear_lines()) + "\n")
+        worn = Device()
+        cls.addClassCleanup(worn.close)
+        worn.tally("record", "import", stdin="\n".join(wear_lines()) + "\n")
         for name, first in (("wear", TODAY - 90), ("wear-nothing", TODAY + 1)):
-            page = subprocess.run([BIN / "wear_page_sample", sample.root, str(first), str(TODAY + 1), "3000"], env=sample.env,
+            page = subprocess.run([BIN / "wear_page_sample", worn.root, str(first), str(TODAY + 1), "3000"], env=worn.env,
                                   capture_output=True, check=True)
             cls.pages[name].write_bytes(page.stdout)
 

@@ -27,6 +27,7 @@ header, nav, main, footer { max-width: 66rem; margin-inline: auto; padding-inlin
 header { padding-block: 2.5rem 1rem; }
 main { padding-block-end: 3rem; }
 footer { padding-block: 1rem 2.5rem; color: var(--quiet); font-size: .875rem; }
+footer p { max-width: 40rem; }
 h1, h2, h3, p, dl, dd, figure, table, ul { margin: 0; padding: 0; }
 h1 { font-size: clamp(1.6rem, 5vw, 2.1rem); line-height: 1.2; letter-spacing: -.015em; }
 h2 { font-size: 1.3rem; line-height: 1.3; margin-block: 2.75rem .75rem; letter-spacing: -.01em; }
@@ -67,6 +68,7 @@ tbody tr:hover > * { background: var(--soft); }
 .sheet .n { width: 1%; }
 td small { display: block; color: var(--quiet); font-size: .8125rem; }
 td.wrap { overflow-wrap: anywhere; min-width: 8rem; }
+.scroll .key { min-width: 12rem; }
 .day { white-space: nowrap; }
 .gone { color: var(--quiet); font-style: italic; }
 .back { color: var(--warn); font-weight: 600; }
@@ -130,15 +132,15 @@ svg text.mark { fill: var(--warn); stroke: none; }
   :root {
     color-scheme: light;
     --ground: #fff; --sheet: #fff; --text: #000; --quiet: #333; --line: #bbb; --soft: #fff;
-    --first: #0b5aa9; --second: #a8430b; --warn: #8a1c1c;
+    --first: #0a4f96; --second: #a8430b; --warn: #8a1c1c;
   }
   @page { margin: 16mm 14mm; }
   body { font-size: 9.5pt; }
-  header, main, footer { max-width: none; padding-inline: 0; }
+  header, main, footer { max-width: none; padding-inline: 1px; }
   nav, .skip { display: none; }
-  h2, h3, caption, summary { break-after: avoid; }
-  tr, .tiles > div, svg { break-inside: avoid; }
-  .card, .sheet { break-inside: auto; }
+  h2, h3, .note, caption, summary { break-after: avoid; }
+  tr, figure, .tiles > div, article { break-inside: avoid; }
+  .pair, .pair.wide { grid-template-columns: minmax(0, 3fr) minmax(0, 2fr); }
   .scroll, .scroll.tall { overflow: visible; max-height: none; }
   details::details-content { content-visibility: visible; display: block; height: auto; }
   .bar { print-color-adjust: exact; -webkit-print-color-adjust: exact; }

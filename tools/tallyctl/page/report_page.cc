@@ -168,7 +168,7 @@ class ReportPage {
       writeStatistic("Minimum", statistics->minimum);
       writeStatistic("Mean", statistics->mean);
       writeStatistic("Maximum", statistics->maximum);
-      writeStatistic("Standard deviation", statistics->standardDeviation());
+      writeStatistic("Std. deviation", statistics->standardDeviation());
       page_.markup("</dl>\n");
     } else {
       page_.markup("<p class=\"note\">No statistics that can be read.</p>\n");

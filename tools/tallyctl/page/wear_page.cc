@@ -151,9 +151,9 @@ class WearPage {
       endTile("flash over host");
     }
     if (pace) {
-      beginTile("Most erases of a block");
+      beginTile("Most worn block");
       writeFigure(page_, pace->hottestCycle);
-      endTile(sixDigits(pace->cyclesPerDay) + " a day lately");
+      endTile("erases, " + sixDigits(pace->cyclesPerDay) + " a day");
     }
     if (pace && subject_.enduranceCycles) {
       const double share =
