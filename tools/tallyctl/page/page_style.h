@@ -136,11 +136,15 @@ svg text.mark { fill: var(--warn); stroke: none; }
   }
   @page { margin: 16mm 14mm; }
   body { font-size: 9.5pt; }
-  header, main, footer { max-width: none; padding-inline: 1px; }
+  header, main, footer { max-width: none; padding-inline: 0 .25rem; }
   nav, .skip { display: none; }
   h2, h3, .note, caption, summary { break-after: avoid; }
   tr, figure, .tiles > div, article { break-inside: avoid; }
   .pair, .pair.wide { grid-template-columns: minmax(0, 3fr) minmax(0, 2fr); }
+  .pair th, .pair td { padding-block: .1rem; }
+  .tiles { grid-template-columns: repeat(auto-fit, minmax(6.25rem, 1fr)); }
+  .tiles dd { font-size: 1.2rem; }
+  .days text { font-size: 21px; }
   .scroll, .scroll.tall { overflow: visible; max-height: none; }
   details::details-content { content-visibility: visible; display: block; height: auto; }
   .bar { print-color-adjust: exact; -webkit-print-color-adjust: exact; }
