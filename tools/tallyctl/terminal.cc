@@ -48,6 +48,7 @@ Terminal::Terminal() {
   // How wide characters are; texts are UTF-8 wherever they are shown.
   if (std::setlocale(LC_CTYPE, "C.UTF-8") == nullptr) std::setlocale(LC_CTYPE, "");
   if (::isatty(STDOUT_FILENO) == 0) return;
+  isScreen_ = true;
   const bool capable = environment("TERM") != "dumb" && !environment("TERM").empty();
   colour_ = capable && environment("NO_COLOR").empty();
   drawing_ = capable && localeIsUtf8();
@@ -177,25 +178,53 @@ std::string sixDigits(double value) {
   return {buffer.data(), static_cast<std::size_t>(length)};
 }
 
-std::vector<ShownText> Table::lines() const {
+std::vector<std::vector<ShownText>> Table::linesWithin(std::size_t width) const {
+  constexpr std::size_t kIndent = 2, kBetween = 2, kLeastFirst = 8;
   std::vector<std::size_t> widths(columns_.size(), 0);
-  for (const auto& row : rows_) {
-    for (std::size_t i = 0; i < row.size(); ++i) widths[i] = std::max(widths[i], row[i].columns());
-  }
-  std::vector<ShownText> lines;
-  for (const auto& row : rows_) {
-    ShownText text = "  ";
-    for (std::size_t i = 0; i < row.size(); ++i) {
-      const std::string padding(widths[i] - row[i].columns(), ' ');
-      text += (columns_[i] == Align::Right ? padding + row[i] : row[i] + padding) + "  ";
+  std::size_t others = kIndent;
+  for (std::size_t i = columns_.size(); i-- > 0;) {
+    for (const auto& row : rows_) {
+      if (i < row.size()) widths[i] = std::max(widths[i], row[i].columns());
     }
-    lines.push_back(text.withoutTrailingSpaces());
+    if (i > 0) others += widths[i] + kBetween;
+  }
+  const std::size_t room = width > others + kLeastFirst ? width - others : kLeastFirst;
+  if (width != 0 && !widths.empty()) widths[0] = std::min(widths[0], room);
+
+  std::vector<std::vector<ShownText>> lines;
+  for (const auto& row : rows_) {
+    auto& ofRow = lines.emplace_back();
+    ShownText text = std::string(kIndent, ' ');
+    for (std::size_t i = 0; i < row.size(); ++i) {
+      ShownText cell = row[i];
+      if (i == 0 && row.size() > 1 && cell.columns() > widths[0]) {
+        ofRow.push_back(text + cell);
+        cell = {};
+      }
+      const std::string padding(widths[i] - std::min(widths[i], cell.columns()), ' ');
+      text += (columns_[i] == Align::Right ? padding + cell : cell + padding) + std::string(kBetween, ' ');
+    }
+    ofRow.push_back(text.withoutTrailingSpaces());
   }
   return lines;
 }
 
+std::vector<ShownText> Table::lines() const {
+  std::vector<ShownText> all;
+  for (auto& ofRow : linesWithin(0)) all.push_back(std::move(ofRow.front()));
+  return all;
+}
+
 void Table::print(Terminal& out) const {
-  for (const ShownText& text : lines()) out.line(text);
+  print(out, [](std::size_t) {});
+}
+
+void Table::print(Terminal& out, const std::function<void(std::size_t row)>& after) const {
+  const auto all = linesWithin(out.lineWidth());
+  for (std::size_t row = 0; row < all.size(); ++row) {
+    for (const ShownText& text : all[row]) out.line(text);
+    after(row);
+  }
 }
 
 Progress::Progress(std::string label, Of what, std::uint64_t total)

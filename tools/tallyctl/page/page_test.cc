@@ -98,7 +98,7 @@ TEST(ReportPage, HasABarForEachBucketThatIsNotEmptyAndTheSameBytesEachTime) {
   EXPECT_EQ(timesIn(page, "<td class=\"n\"><data value=\"100000\">100,000</data></td>"), 1U);
   EXPECT_EQ(timesIn(page, "<script"), 0U);
   EXPECT_EQ(timesIn(page, "removed"), 1U);
-  EXPECT_NE(page, reportPage(*report, ReportStanding::Preview));
+  EXPECT_NE(page, reportPage(*report, ReportStanding::WouldLeave));
 }
 
 WearDay recorded(DayNumber number, std::int64_t host, std::int64_t flash, std::int64_t hottest) {

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 #include <array>
-#include <cmath>
+#include <limits>
 #include <string_view>
 #include <vector>
 
@@ -20,6 +20,11 @@ namespace {
 // So many rows, and so many distributions, stand openly; more of them in parts.
 constexpr std::size_t kRowsInPart = 500;
 constexpr std::size_t kDistributionsInPart = 50;
+
+// In the order of ReportStanding.
+constexpr std::array<std::string_view, 3> kStandings = {"tbdaily: what this device reports of one day",
+                                                        "Submission is on: this would leave the device now",
+                                                        "Submission is off: no report would be written"};
 
 std::string text(const PlistValue& value) {
   return value.isNone() ? "-" : plistText(value);
@@ -64,10 +69,9 @@ class ReportPage {
 
  private:
   void writeHead(ReportStanding standing) {
-    const bool isPreview = standing == ReportStanding::Preview;
+    const bool isPreview = standing != ReportStanding::Written;
     beginPage(page_, (isPreview ? "Preview of the daily report of " : "Daily report of ") + dayOf(report_),
-              isPreview ? "What would leave this device now; nothing was submitted"
-                        : "tbdaily: what this device reports of one day");
+              kStandings[static_cast<std::size_t>(standing)]);
     const PlistDictionary& root = report_.root();
     const auto created = report_.created();
     page_.markup("<dl class=\"facts\">\n");

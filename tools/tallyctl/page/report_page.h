@@ -8,8 +8,9 @@
 
 namespace tbdaily {
 
-// What becomes of the report: it was written by a run, or it is what a run would write now.
-enum class ReportStanding : std::uint8_t { Written, Preview };
+// A run wrote the report; or it is a preview of what would leave the device now, or of what no run would
+// write because submission is off.
+enum class ReportStanding : std::uint8_t { Written, WouldLeave, WouldNotBeWritten };
 
 // One HTML file that needs nothing else; the same report gives the same bytes. Whatever of the report is of
 // another form than a run writes is shown as its text, or left out where it has none.
