@@ -179,8 +179,8 @@ class WearPage {
             "<table><caption>Day by day, the last one first</caption>\n<thead><tr><th scope=\"col\">Day</th>")
         .markup(head);
     page_.markup("</tr></thead>\n<tbody>\n");
-    for (auto at = history_.days.rbegin(); at != history_.days.rend(); ++at) {
-      const WearDay& day = *at;
+    for (std::size_t i = history_.days.size(); i-- > 0;) {
+      const WearDay& day = history_.days[i];
       page_.markup("<tr><th scope=\"row\" class=\"day\">").text(dayText(day.day)).markup("</th>");
       if (day.wentBack && isComparison) {
         page_.markup("<td class=\"n back\" colspan=\"").markup(columns).markup("\">counters went back</td>");
