@@ -4,12 +4,15 @@
 #include <CLI/CLI.hpp>
 #include <filesystem>
 #include <optional>
+#include <span>
 
 #include "platform/log_submission.h"
 #include "platform/platform.h"
 #include "tools/tallyctl/day_argument.h"
 #include "tools/tallyctl/input_file.h"
 #include "tools/tallyctl/key_selection.h"
+#include "tools/tallyctl/output_file.h"
+#include "tools/tallyctl/page/report_page.h"
 #include "tools/tallyctl/report/daily_report.h"
 #include "tools/tallyctl/report/kept_reports.h"
 #include "tools/tallyctl/report/key_views.h"
@@ -25,6 +28,7 @@ namespace {
 struct ReportArguments {
   std::vector<std::string> words;  // the first may be a file
   std::string day;
+  std::optional<std::string> html;  // a file for the page
   bool preview = false, raw = false, identifiability = false;
 };
 
@@ -106,7 +110,22 @@ std::string titleOf(Tool& tool, const ReportArguments& arguments, const DailyRep
               : "  Submission is off: no report would be written (tallyctl consent on).");
 }
 
+void writePage(Tool& tool, const ReportArguments& arguments, const DailyReport& report) {
+  ReportStanding standing = ReportStanding::Written;
+  if (arguments.preview)
+    standing = tool.platform().services().logSubmission.isDiagnosticLogSubmissionEnabled()
+                   ? ReportStanding::WouldLeave
+                   : ReportStanding::WouldNotBeWritten;
+  const std::string page = reportPage(report, standing);
+  const std::string& file = *arguments.html;
+  const auto written = writeOutputFile(file, std::as_bytes(std::span(page)));
+  if (!written) return tool.fail(written.reason());
+  if (file != "-") tool.out().line("wrote " + std::to_string(page.size()) + " bytes to " + file);
+}
+
 void show(Tool& tool, ReportArguments arguments) {
+  if (arguments.html && tool.options.json)
+    return tool.fail("--html writes a page and does not go with --json", kWrongUsage);
   const bool isOfDevice = arguments.preview || !arguments.day.empty();
   const auto file = isOfDevice ? std::nullopt : takeFile(arguments.words);
   std::optional<DayNumber> day;
@@ -130,6 +149,7 @@ void show(Tool& tool, ReportArguments arguments) {
     return tool.fail("no file and no key of the report has that name or has it in it: " +
                      arguments.words.front());
 
+  if (arguments.html) return writePage(tool, arguments, *report);
   if (!tool.options.json) tool.mayPage();
   if (arguments.raw && tool.options.json) return showStories(tool, *whole, arguments.words);
   if (arguments.identifiability && tool.options.json) return showIdentifiability(tool, *report);
@@ -167,10 +187,19 @@ void addReportCommand(CLI::App& app, Tool& tool) {
       command->add_flag("--raw", arguments->raw,
                         "Show what was recorded beside what is reported, with the rule, and what "
                         "stays here, with the reason");
+  CLI::Option* identifiability =
+      command
+          ->add_flag(
+              "--identifiability", arguments->identifiability,
+              "Show how many different values each key can have at most, and what else the report says")
+          ->excludes(raw);
   command
-      ->add_flag("--identifiability", arguments->identifiability,
-                 "Show how many different values each key can have at most, and what else the report says")
-      ->excludes(raw);
+      ->add_option("--html", arguments->html,
+                   "Write the report to this file, as a page for a browser that needs nothing else; - is "
+                   "standard output")
+      ->type_name("FILE")
+      ->excludes(raw)
+      ->excludes(identifiability);
   command->callback([&tool, arguments] { show(tool, *arguments); });
 }
 
