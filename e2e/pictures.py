@@ -60,8 +60,8 @@ def main(folder, browser=None):
             (folder / f"{name}.svg").write_text(terminal(command, shown[first:last], 80))
         if browser:
             page = device.base / "page.html"
-            device.tally("report", "--html", str(page), "--day", "yesterday", "net.")
-            subprocess.run([browser, "--headless", "--no-sandbox", "--disable-gpu", "--hide-scrollbars", "--window-size=1100,1000",
+            device.tally("report", "--html", str(page), "--day", "yesterday", "wifi")
+            subprocess.run([browser, "--headless", "--no-sandbox", "--disable-gpu", "--hide-scrollbars", "--window-size=1100,1330",
                             f"--screenshot={folder / 'page.png'}", page.as_uri()], check=True, capture_output=True, timeout=120)
         for picture in folder.iterdir():
             assert picture.stat().st_size < 200_000, f"{picture} is larger than 200 KB"
