@@ -13,7 +13,8 @@ TREE = pathlib.Path(__file__).resolve().parent.parent
 INSTEAD = [(r"\[--day DAY\]", "--day yesterday"), (r"\bDAY\b", "yesterday"), (r"\bROOT\b", "{root}"), (r"^sudo ", ""),
            (r"app-info FILE", "app-info {apps}"), (r"\bFILE\b", "{report}"), (r"--interval \d+", "--interval 0.1"),
            (r"--count \d+", "--count 2"), (r"(watch --interval 0.1)$", r"\1 --count 2"), (r"\bhour.jsonl", "{base}/hour.jsonl"),
-           (r"--to laptop", "--to {base}/laptop"), (r"-o (\w+\.\w+)", r"-o {base}/\1")]
+           (r"\breport\.html", "{base}/report.html"), (r"-o (\w+\.\w+)", r"-o {base}/\1"),
+           (r"--to laptop", "--to {base}/laptop")]
 
 
 def commands(page):
@@ -34,7 +35,7 @@ class Pages(DeviceTest):
         apps.write_text("[]")
         names = {"root": device.root, "report": device.pending()[0], "apps": apps, "base": device.base}
         names = {name: shlex.quote(str(place)) for name, place in names.items()}
-        listed = [line for page in ("README.md", "docs/operations.md") for line in commands(page)]
+        listed = [line for page in ("README.md", "docs/operations.md", "docs/privacy.md") for line in commands(page)]
         self.assertGreater(len(listed), 20)
         environment = dict(device.env, PATH=f"{BIN}:/usr/bin:/bin", TBDAILY_LIVE="1", root=str(device.root))
         for line in listed:

@@ -15,8 +15,8 @@ TASKING = {"TaskingID": "t", "TaskingDigest": "d", "TaskingPayload": []}
 # Of what the sample device answers: words, and the schema where the words are not its name.
 COMMANDS = [
     ("record scalar k 3",), ("record distribution d 1 2.5 nan",), ("record import {lines}",), ("record prune --before -9 --dry-run",),
-    ("report",), ("plist {report}",), ("tasking show",), ("tasking schedule {tasking}",), ("tasking clear",), ("usage show",),
-    ("nand",), ("nand --explain HottestCycle", "nand-explain"), ("stats",), ("buffer stats -o {out}",), ("snapshots",), ("wear",),
+    ("report",), ("report --raw", "report-raw"), ("report --preview --identifiability", "report-identifiability"), ("plist {report}",), ("tasking show",), ("tasking schedule {tasking}",), ("tasking clear",), ("usage show",),
+    ("nand",), ("nand --explain HottestCycle", "nand-explain"), ("stats",), ("buffer stats -o {out}",), ("snapshots",), ("wear",), ("wear --history", "wear-history"),
     ("capture --only locale --replace",), ("metrics list",), ("metrics sample",), ("metrics delta --interval 0.01",),
     ("metrics watch --interval 1 --count 1",), ("metrics scale 1 0x0100007600000000 0x0100000000000000",), ("metrics advance",),
     ("metrics --explain disk.busyTime", "metrics-explain"), ("whitelist check cloud.syncErrors none",), ("status",),

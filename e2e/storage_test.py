@@ -5,7 +5,7 @@ import plistlib
 import struct
 import unittest
 
-from harness import NOW, DeviceTest
+from harness import NOW, TODAY, DeviceTest
 
 PREFIX = "com.velmora.NANDInfo."
 
@@ -75,6 +75,28 @@ class Storage(DeviceTest):
             self.assertTrue(device.tally("nand", "--explain", key).endswith(".\n"), key)
         self.assertIn("no figure", device.tally("nand", "--explain", "nonsense", status=1))
         self.assertIn("Host traffic", device.tally("nand"))
+
+    def test_wear_over_the_days_of_the_store(self):
+        device = self.device(sample=True)
+        self.assertEqual(device.tally("wear").splitlines()[0], "healthy")
+        self.assertEqual(device.tally("wear", "--check"), device.tally("wear"))
+        self.assertEqual(device.tally_json("wear", "--history"), [])
+        day = TODAY - 20
+        rows = [(day, 1000, 3000, 10), (day + 1, 1100, 3250, 10), (day + 5, 1200, 3550, 14), (day + 6, 7, 9, 1), (day + 8, 7, 9, 2)]
+        names = ("NumLogicalWrites", "NumPhysicalWrites", "HottestCycle")
+        lines = [f"s\tcom.velmora.NANDInfo.{name}\t{row[0]}\t{value}\n" for row in rows for name, value in zip(names, row[1:])]
+        # A key that begins like one of them.
+        device.tally("record", "import", "-", stdin="".join(lines) + f"s\tcom.velmora.NANDInfo.HottestCycle2\t{day + 2}\t5\n")
+        days = device.tally_json("wear", "--history")
+        self.assertEqual([tuple(entry[k] for k in ("hostWrites", "flashWrites", "hottestCycle")) for entry in days],
+                         [row[1:] for row in rows])
+        self.assertEqual([entry["writeAmplification"] for entry in days], [None, 2.5, 3.0, None, None])
+        self.assertEqual([entry["wentBack"] for entry in days], [False, False, False, True, False])
+        shown = device.tally("wear", "--history", "--endurance", "12")
+        for text in ("3 days missing before", "counters went back", "12 erases on 20", "at the pace of the last 2 days"):
+            self.assertIn(text, shown)
+        self.assertEqual(len(device.tally_json("wear", "--history", "--days", "13")), 1)
+        device.tally("wear", "--days", "3", status=2)
 
     def test_snapshots_from_the_controller_and_from_files(self):
         device = self.device(sample=True)

@@ -22,7 +22,6 @@ namespace {
 constexpr std::string_view kMetaSuffix = ".meta.plist";
 constexpr unsigned kMaximumNumber = 100000;  // of logs with one name and second
 constexpr int kCarewellGenerations = 5;
-constexpr const char* kStructured = "Structured";
 constexpr const char* kCarewell = "Carewell";
 constexpr double kLockPatience = 5.0;  // seconds
 
@@ -156,7 +155,7 @@ int LogSpool::openStructured(int type, const std::string& day) {
   StructuredFile& open = structured_[type];
   open.day = day;
   int error = host_.files().makeFolder(kFolder, spool);
-  if (error == 0) error = spool.makeFolder(kStructured, structured);
+  if (error == 0) error = spool.makeFolder(std::string(kStructured), structured);
   if (error == 0) error = structured.makeFolder(std::to_string(type), folder);
   if (error == 0) error = folder.openForAppending(day + ".jsonl", open.file);
   if (error == 0 && !lockFile_.isOpen()) error = spool.openForLocking(kLockFile, lockFile_);

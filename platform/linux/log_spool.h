@@ -24,6 +24,7 @@ class LogSpool {
   static constexpr std::string_view kPending = "Pending";    // leaves with the next submission
   static constexpr std::string_view kWithheld = "Withheld";  // written without consent: stays
   static constexpr std::string_view kOutbox = "Outbox";
+  static constexpr std::string_view kStructured = "Structured";  // of each type and day: not a log yet
   static constexpr const char* kLockFile = ".lock";  // in kFolder: whoever changes one of these holds it
 
   LogSpool(const Host& host, PropertyListCodec& codec) : host_(host), codec_(codec) {}

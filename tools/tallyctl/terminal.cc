@@ -48,6 +48,7 @@ Terminal::Terminal() {
   // How wide characters are; texts are UTF-8 wherever they are shown.
   if (std::setlocale(LC_CTYPE, "C.UTF-8") == nullptr) std::setlocale(LC_CTYPE, "");
   if (::isatty(STDOUT_FILENO) == 0) return;
+  isScreen_ = true;
   const bool capable = environment("TERM") != "dumb" && !environment("TERM").empty();
   colour_ = capable && environment("NO_COLOR").empty();
   drawing_ = capable && localeIsUtf8();
@@ -150,6 +151,23 @@ std::string Terminal::bar(double value, double maximum, std::size_t width) const
   return repeated("█", eighths / 8).append(kEighths[eighths % 8]);
 }
 
+std::string Terminal::sparkline(const std::vector<std::optional<double>>& values, double lowest,
+                                double highest) const {
+  static constexpr std::array<std::string_view, 8> kBlocks = {"▁", "▂", "▃", "▄", "▅", "▆", "▇", "█"};
+  static constexpr std::array<std::string_view, 8> kPlain = {".", ":", "-", "=", "+", "*", "#", "@"};
+  const auto& marks = drawing_ ? kBlocks : kPlain;
+  std::string line;
+  for (const std::optional<double>& value : values) {
+    if (!value || !std::isfinite(*value)) {
+      line += ' ';
+      continue;
+    }
+    const double share = highest > lowest ? (*value - lowest) / (highest - lowest) : 0;
+    line += marks[static_cast<std::size_t>(std::lround(std::clamp(share, 0.0, 1.0) * 7))];
+  }
+  return line;
+}
+
 void printError(const ShownText& reason) {
   std::fprintf(stderr, "tallyctl: %s\n", reason.bytes().c_str());
 }
@@ -160,25 +178,103 @@ std::string sixDigits(double value) {
   return {buffer.data(), static_cast<std::size_t>(length)};
 }
 
-std::vector<ShownText> Table::lines() const {
-  std::vector<std::size_t> widths(columns_.size(), 0);
-  for (const auto& row : rows_) {
-    for (std::size_t i = 0; i < row.size(); ++i) widths[i] = std::max(widths[i], row[i].columns());
-  }
+namespace {
+
+// The text at its spaces in lines of so many columns; a word that is longer stays whole.
+std::vector<ShownText> atSpaces(const ShownText& text, std::size_t columns) {
   std::vector<ShownText> lines;
-  for (const auto& row : rows_) {
-    ShownText text = "  ";
-    for (std::size_t i = 0; i < row.size(); ++i) {
-      const std::string padding(widths[i] - row[i].columns(), ' ');
-      text += (columns_[i] == Align::Right ? padding + row[i] : row[i] + padding) + "  ";
+  std::string_view rest = text.bytes();
+  std::string line;
+  while (!rest.empty()) {
+    const std::string_view word = rest.substr(0, rest.find(' '));
+    rest.remove_prefix(std::min(rest.size(), word.size() + 1));
+    std::string longer = line.empty() ? std::string(word) : line + " " + std::string(word);
+    if (!line.empty() && ShownText(longer).columns() > columns) {
+      lines.emplace_back(line);
+      longer = word;
     }
-    lines.push_back(text.withoutTrailingSpaces());
+    line = std::move(longer);
+  }
+  lines.emplace_back(line);
+  return lines;
+}
+
+}  // namespace
+
+// How wide the columns are on the screen: what is too long stands in the first column, or in a last one of
+// text.
+std::vector<std::size_t> Table::widthsWithin(std::size_t width) const {
+  constexpr std::size_t kLeastFirst = 12, kLeastLast = 20;
+  std::vector<std::size_t> widths(columns_.size(), 0);
+  std::size_t all = kIndent;
+  for (std::size_t i = 0; i < columns_.size(); ++i) {
+    for (const auto& row : rows_) {
+      if (i < row.size()) widths[i] = std::max(widths[i], row[i].columns());
+    }
+    all += widths[i] + (i > 0 ? kBetween : 0);
+  }
+  const auto narrow = [&](std::size_t column, std::size_t least) {
+    if (width == 0 || all <= width) return;
+    const std::size_t others = all - widths[column];
+    const std::size_t narrowed =
+        std::min(widths[column], std::max(least, width > others ? width - others : 0));
+    all -= widths[column] - narrowed;
+    widths[column] = narrowed;
+  };
+  if (columns_.size() > 1 && columns_.back() == Align::Left) narrow(columns_.size() - 1, kLeastLast);
+  if (columns_.size() > 1) narrow(0, kLeastFirst);
+  return widths;
+}
+
+std::vector<std::vector<ShownText>> Table::linesWithin(std::size_t width) const {
+  const std::vector<std::size_t> widths = widthsWithin(width);
+  const std::string between(kBetween, ' ');
+  std::vector<std::vector<ShownText>> lines;
+  for (const auto& row : rows_) {
+    auto& ofRow = lines.emplace_back();
+    ShownText text = std::string(kIndent, ' ');
+    std::size_t column = kIndent;
+    for (std::size_t i = 0; i < row.size(); ++i) {
+      std::vector<ShownText> cell{row[i]};
+      if (row[i].columns() > widths[i]) {
+        if (i == 0 && row.size() > 1) {
+          ofRow.push_back(text + row[i]);
+          cell = {ShownText()};
+        } else {
+          cell = atSpaces(row[i], widths[i]);
+        }
+      }
+      const std::string padding(widths[i] - std::min(widths[i], cell[0].columns()), ' ');
+      text += columns_[i] == Align::Right ? padding + cell[0] : cell[0] + padding;
+      if (i + 1 < row.size()) {
+        text += between;
+        column += widths[i] + kBetween;
+        continue;
+      }
+      ofRow.push_back(text.withoutTrailingSpaces());
+      for (std::size_t more = 1; more < cell.size(); ++more)
+        ofRow.push_back(std::string(column, ' ') + cell[more]);
+    }
   }
   return lines;
 }
 
+std::vector<ShownText> Table::lines() const {
+  std::vector<ShownText> all;
+  for (auto& ofRow : linesWithin(0)) all.push_back(std::move(ofRow.front()));
+  return all;
+}
+
 void Table::print(Terminal& out) const {
-  for (const ShownText& text : lines()) out.line(text);
+  print(out, [](std::size_t) {});
+}
+
+void Table::print(Terminal& out, const std::function<void(std::size_t row)>& after) const {
+  const auto all = linesWithin(out.lineWidth());
+  for (std::size_t row = 0; row < all.size(); ++row) {
+    for (const ShownText& text : all[row]) out.line(text);
+    after(row);
+  }
 }
 
 Progress::Progress(std::string label, Of what, std::uint64_t total)

@@ -4,6 +4,8 @@
 
 #include <chrono>
 #include <cstdint>
+#include <functional>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -58,11 +60,19 @@ class Terminal {
   // else '#'. A value that is not 0 shows at least one mark.
   std::string bar(double value, double maximum, std::size_t width) const;
 
+  // One column for each value between the two bounds; a space where there is none. Eighths of blocks where
+  // they can be shown, else characters that grow darker.
+  std::string sparkline(const std::vector<std::optional<double>>& values, double lowest,
+                        double highest) const;
+
   std::size_t width() const { return width_; }
+  // Columns that a line may take; 0 where it may be as long as it is, since it goes to no screen.
+  std::size_t lineWidth() const { return isScreen_ ? width_ : 0; }
 
  private:
   void write(std::string_view bytes);
 
+  bool isScreen_ = false;
   bool colour_ = false;
   bool drawing_ = false;
   std::size_t width_ = 80;
@@ -78,17 +88,27 @@ void printError(const ShownText& reason);
 // A number in at most six significant digits, for people.
 std::string sixDigits(double value);
 
-// Rows of cells under each other; numbers to the right.
+// Rows of cells under each other; numbers to the right. On a screen that is too narrow for all of it, text in
+// the last column goes on in the next line, and a first cell that is too long has a line of its own above its
+// row.
 class Table {
  public:
   enum class Align { Left, Right };
   explicit Table(std::vector<Align> columns) : columns_(std::move(columns)) {}
   void add(std::vector<ShownText> cells) { rows_.push_back(std::move(cells)); }
-  // Each row indented by two columns, cells two apart.
+  // Each row indented by two columns, cells two apart: a line for each row, however long.
   std::vector<ShownText> lines() const;
   void print(Terminal& out) const;
+  // The same, and after each row what the function prints.
+  void print(Terminal& out, const std::function<void(std::size_t row)>& after) const;
 
  private:
+  static constexpr std::size_t kIndent = 2, kBetween = 2;
+
+  std::vector<std::size_t> widthsWithin(std::size_t width) const;
+  // The lines of each row, none longer than the width (0: any) where that is possible.
+  std::vector<std::vector<ShownText>> linesWithin(std::size_t width) const;
+
   std::vector<Align> columns_;
   std::vector<std::vector<ShownText>> rows_;
 };

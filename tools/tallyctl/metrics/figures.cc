@@ -132,4 +132,12 @@ std::string humanRate(double perSecond, std::int64_t unit) {
                                            : withPrefix(rate, saying->rate);
 }
 
+std::string humanBytes(double bytes) {
+  return withPrefix(bytes, "B");
+}
+
+std::string humanTime(double seconds) {
+  return duration(seconds);
+}
+
 }  // namespace tbdaily

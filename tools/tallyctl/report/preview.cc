@@ -10,63 +10,17 @@
 #include "platform/kernel.h"
 #include "platform/linux/store/sqlite_analytics_history.h"
 #include "platform/linux/store/store_locator.h"
-#include "platform/log_submission.h"
 #include "platform/platform.h"
-#include "platform/preferences_store.h"
 #include "platform/property_list_codec.h"
 #include "report/tb_report.h"
 #include "tools/tallyctl/captured_log.h"
 #include "tools/tallyctl/day_argument.h"
+#include "tools/tallyctl/report/held_services.h"
 #include "tools/tallyctl/store_copy.h"
 
 namespace tbdaily {
 
 namespace {
-
-class ReadOnlyPreferences : public PreferencesStore {
- public:
-  explicit ReadOnlyPreferences(PreferencesStore& real) : real_(real) {}
-  PlistValue getValue(std::string_view key, std::string_view domain) override {
-    return real_.getValue(key, domain);
-  }
-  void setValue(std::string_view, const PlistValue&, std::string_view) override {}
-  void synchronize(std::string_view) override {}
-
- private:
-  PreferencesStore& real_;
-};
-
-// Keeps the one log that is written, and lets nothing else happen.
-class CapturedSubmission : public LogSubmission {
- public:
-  explicit CapturedSubmission(LogSubmission& real) : real_(real) {}
-  bool writeLogForSubmission(std::string_view, std::string_view, const PlistValue&, const PlistValue&,
-                             const LogWriter& writer) override {
-    return writer(output);
-  }
-  void logStructuredData(int, const PlistDictionary&) override {}
-  bool isDiagnosticLogSubmissionEnabled() override { return real_.isDiagnosticLogSubmissionEnabled(); }
-  void dumpAllOldStructuredDataLogs() override {}
-  void rollCarewellLogs() override {}
-  void submitDiagnosticLogs() override {}
-  PlistValue taskingValue(std::string_view key) override { return real_.taskingValue(key); }
-  std::string currentOSVersion() override { return real_.currentOSVersion(); }
-  std::string systemIdentifier() override { return real_.systemIdentifier(); }
-  std::string hardwareModel() override { return real_.hardwareModel(); }
-  std::string systemVersion() override { return real_.systemVersion(); }
-  std::string incidentIdentifier() override { return real_.incidentIdentifier(); }
-
-  struct Output : LogOutput {
-    bool write(std::span<const std::byte> data) override {
-      bytes.insert(bytes.end(), data.begin(), data.end());
-      return true;
-    }
-    std::vector<std::byte> bytes;
-  } output;
-
- private:
-  LogSubmission& real_;
-};
 
 // What a run would find: the copy has the size of the store with its log written back, as a run does first.
 // Nothing of the device is loaded for the count of damages: it is the preference that the device's library
@@ -108,14 +62,14 @@ Outcome<PlistValue> previewReport(LinuxPlatform& linux, std::optional<DayNumber>
 
   CapturedLog log;
   ReadOnlyPreferences preferences(real.preferences);
-  CapturedSubmission submission(real.logSubmission);
+  HeldSubmission submission(real.logSubmission);
   SqliteAnalyticsHistory history(locate, [&opened](const StorePlace&) { return std::move(opened); });
   Platform preview = platformWith(real, preferences, submission, history, log);
 
   const DayNumber wanted = day ? *day : dayBefore(real.analyticsClient.currentDayNumber());
   TBReport(preview, probesOver(file, real)).writeLogForYesterdayWithAppInfo(wanted, PlistValue());
-  if (submission.output.bytes.empty()) return Failure{whyNothing(log, wanted)};
-  PlistParseResult parsed = real.propertyListCodec.parse(submission.output.bytes);
+  if (submission.logs.empty()) return Failure{whyNothing(log, wanted)};
+  PlistParseResult parsed = real.propertyListCodec.parse(submission.logs.front().bytes);
   if (!parsed.error.empty()) return Failure{std::move(parsed.error)};
   return std::move(parsed.value);
 }

@@ -82,6 +82,7 @@ constexpr KnownStat kKnownStats[] = {
     {125, 611},           // hottestCycle of the user's partition
     {125, 1'304, 1},      // and of the intermediate one
     {129, 32},            // pagesPerVirtualBlockSlc
+    {172, 0},             // ueccReads
     {204, 44'928'540},    // powerOnSeconds
     {367, 37},            // lhotSkipPercent
     {427, 0x4582},        // nandDesc
