@@ -24,7 +24,7 @@ class Companion(DeviceTest):
             self.assertIn("--help", device.tally(*words.split(), "--help"))
         for words in ("", "nonsense", "record scalar k", "record scalar k 1.5", "record scalar k 9223372036854775808",
                       "record distribution k inf", "record scalar k 1 --day 2147483648", "send run x",
-                      "report --day 5", "init --profile x", "wait ../x"):
+                      "report --day x", "report --raw --identifiability", "init --profile x", "wait ../x"):
             device.tally(*words.split(), status=2)
         self.assertIn('no command "nonsense"', device.tally("nonsense", status=2))
         missing = str(device.base / "missing")
@@ -106,7 +106,7 @@ class Companion(DeviceTest):
         self.assertTrue(text.isascii())
         self.assertNotIn("\x1b", text)
         self.assertIn("std. dev.", text)
-        self.assertRegex(text, r"\n    \(90, inf\) +\d+  #+\n")
+        self.assertRegex(text, r"\n      \(90, inf\) +\d+  #+\n")
         self.assertIn("no daily report", device.tally("report", "-", stdin="<plist><string/></plist>", status=1))
 
     def test_a_report_is_written_as_a_page_whole_or_not_at_all(self):
@@ -123,7 +123,7 @@ class Companion(DeviceTest):
         self.assertIn("Preview of the daily report", device.tally("report", "--preview", "--html", "-"))
         self.assertEqual(device.snapshot(), kept)
         self.assertIn("no such file", device.tally("report", "--html", str(device.base / "none/page"), status=1))
-        self.assertIn("no daily report", device.tally("report", "-", "--html", str(page), stdin="{}", status=1))
+        self.assertIn("no daily report", device.tally("report", "-", "--html", str(page), stdin="<plist><string/></plist>", status=1))
         self.assertEqual(sorted(place.name for place in device.base.iterdir()), ["report.html", "root"])
         for words in ("--json report --html x", "report --html x --raw", "report --html x --identifiability"):
             device.tally(*words.split(), status=2)

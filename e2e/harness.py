@@ -1,14 +1,19 @@
 """A device root of its own for one test, and the real programs that work on it."""
 
 import datetime
+import fcntl
 import json
 import os
 import pathlib
 import plistlib
+import pty
+import select
 import shutil
 import sqlite3
+import struct
 import subprocess
 import tempfile
+import termios
 import time
 import unittest
 
@@ -20,6 +25,23 @@ YESTERDAY = TODAY - 1
 NO_CONTROLLER = "Could not get matching KdKit service for exporting classes"  # said by each run without one
 JOB = "com.velmora.tallyd.tbdaily"  # its preferences domain and its endpoint
 LOGGING = JOB + ".logging"
+
+
+def on_screen(device, words, columns, lines=0, **environment):
+    """What tallyctl shows on a terminal of that size, without colours unless asked for; it ends with 0."""
+    master, slave = pty.openpty()
+    fcntl.ioctl(slave, termios.TIOCSWINSZ, struct.pack("HHHH", lines, columns, 0, 0))
+    shown = subprocess.Popen([BIN / "tallyctl", *words], stdin=slave, stdout=slave,
+                             env=dict(device.env, **dict(TERM="xterm", NO_COLOR="1", LC_ALL="C.UTF-8"), **environment))
+    os.close(slave)
+    text = b""
+    try:
+        while select.select([master], [], [], 60)[0]:
+            text += os.read(master, 65536)
+    except OSError:  # nobody writes any more
+        os.close(master)
+    assert shown.wait(timeout=60) == 0, text
+    return text.decode().replace("\r\n", "\n")
 
 
 class Device:

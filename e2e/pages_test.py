@@ -35,7 +35,7 @@ class Pages(DeviceTest):
         apps.write_text("[]")
         names = {"root": device.root, "report": device.pending()[0], "apps": apps, "base": device.base}
         names = {name: shlex.quote(str(place)) for name, place in names.items()}
-        listed = [line for page in ("README.md", "docs/operations.md") for line in commands(page)]
+        listed = [line for page in ("README.md", "docs/operations.md", "docs/privacy.md") for line in commands(page)]
         self.assertGreater(len(listed), 20)
         environment = dict(device.env, PATH=f"{BIN}:/usr/bin:/bin", TBDAILY_LIVE="1", root=str(device.root))
         for line in listed:

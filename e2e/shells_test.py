@@ -1,16 +1,11 @@
 """Completion in the shells themselves, manual pages through their formatter, and the pager on a terminal."""
 
-import fcntl
 import os
 import pathlib
-import pty
-import select
-import struct
 import subprocess
-import termios
 import unittest
 
-from harness import BIN, DeviceTest
+from harness import BIN, DeviceTest, on_screen
 
 PAGES = pathlib.Path(os.environ.get("TBDAILY_PAGES", BIN.parent / "pages"))
 # What has to be among the candidates behind these words, and what must not.
@@ -79,19 +74,8 @@ class Shells(DeviceTest):
     def test_what_is_longer_than_the_screen_goes_to_the_pager(self):
         for words, pager, is_paged in ((["nand"], "sed s/^/PAGED/", True), (["nand", "--no-pager"], "sed s/^/PAGED/", False),
                                        (["consent", "show"], "sed s/^/PAGED/", False), (["nand"], "no-such-pager", False)):
-            master, slave = pty.openpty()
-            fcntl.ioctl(slave, termios.TIOCSWINSZ, struct.pack("HHHH", 24, 80, 0, 0))
-            shown = subprocess.Popen([BIN / "tallyctl", *words], stdin=slave, stdout=slave,
-                                     env=dict(self.sample.env, TERM="xterm", PAGER=pager))
-            os.close(slave)
-            text = b""
-            try:
-                while select.select([master], [], [], 60)[0]:
-                    text += os.read(master, 65536)
-            except OSError:  # nobody writes any more
-                os.close(master)
-            self.assertEqual(shown.wait(timeout=60), 0)
-            self.assertEqual(b"PAGED" in text, is_paged, (words, text[:200]))
+            text = on_screen(self.sample, words, 80, lines=24, PAGER=pager)
+            self.assertEqual("PAGED" in text, is_paged, (words, text[:200]))
             self.assertTrue(text)
 
 

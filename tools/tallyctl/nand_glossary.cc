@@ -2,10 +2,12 @@
 
 #include <algorithm>
 #include <array>
+#include <charconv>
 #include <cstdint>
 #include <cstdio>
 
 #include "storage/nand_key_map.h"
+#include "tools/tallyctl/key_selection.h"
 
 namespace tbdaily {
 
@@ -162,10 +164,6 @@ constexpr NandGlossaryRow kGlossary[] = {
     // clang-format on
 };
 
-std::string_view withoutPrefix(std::string_view key) {
-  return key.starts_with(kKeyPrefix) ? key.substr(kKeyPrefix.size()) : key;
-}
-
 std::string_view numberAtEnd(std::string_view name) {
   const std::size_t last = name.find_last_not_of("0123456789");
   return last == std::string_view::npos ? name : name.substr(last + 1);
@@ -190,7 +188,7 @@ std::string bytesText(double bytes) {
 }  // namespace
 
 const NandGlossaryRow* findNandGlossary(std::string_view key) {
-  const std::string_view name = withoutPrefix(key);
+  const std::string_view name = withoutNandPrefix(key);
   const NandGlossaryRow* best = nullptr;
   for (const NandGlossaryRow& row : kGlossary) {
     if (name.starts_with(row.base) && (best == nullptr || row.base.size() > best->base.size())) best = &row;
@@ -204,17 +202,49 @@ std::vector<std::string> nandGlossaryKeys() {
   return keys;
 }
 
+std::vector<std::string_view> nandGlossaryGroups() {
+  std::vector<std::string_view> groups;
+  for (const NandGlossaryRow& row : kGlossary) {
+    if (std::find(groups.begin(), groups.end(), row.group) == groups.end()) groups.push_back(row.group);
+  }
+  return groups;
+}
+
+std::vector<const NandGlossaryRow*> nandGlossaryGroup(std::string_view name) {
+  std::vector<const NandGlossaryRow*> rows;
+  for (const NandGlossaryRow& row : kGlossary) {
+    if (equalsIgnoringCase(row.group, name)) rows.push_back(&row);
+  }
+  return rows;
+}
+
+std::string_view withoutNandPrefix(std::string_view key) {
+  return key.starts_with(kKeyPrefix) ? key.substr(kKeyPrefix.size()) : key;
+}
+
+std::optional<std::size_t> nandSeriesNumber(const NandGlossaryRow& row, std::string_view key) {
+  const std::string_view rest = withoutNandPrefix(key).substr(row.base.size());
+  std::size_t number = 0;
+  const auto [end, error] = std::from_chars(rest.data(), rest.data() + rest.size(), number);
+  if (error != std::errc() || end != rest.data() + rest.size()) return std::nullopt;
+  return number;
+}
+
+bool isNandHistogram(const NandGlossaryRow& row) {
+  return row.base.ends_with("TempHisto");
+}
+
 std::optional<std::string> explainNandKey(std::string_view key) {
   const NandGlossaryRow* row = findNandGlossary(key);
   if (row == nullptr) return std::nullopt;
   std::string sentence(row->sentence);
-  const std::string_view rest = withoutPrefix(key).substr(row->base.size());
+  const std::string_view rest = withoutNandPrefix(key).substr(row->base.size());
   if (rest.empty()) return sentence;
   const std::string_view number = numberAtEnd(rest);
   const std::string_view part = rest.substr(0, rest.size() - number.size());
   // Rows for several names of one kind answer only for those that there are.
   const bool isListed = std::any_of(keyMap.begin(), keyMap.end(), [key](const KeyMapRow& listed) {
-    return withoutPrefix(listed.key) == withoutPrefix(key);
+    return withoutNandPrefix(listed.key) == withoutNandPrefix(key);
   });
   if (!part.empty() && !isListed) return std::nullopt;
   sentence.pop_back();

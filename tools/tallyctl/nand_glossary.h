@@ -25,6 +25,17 @@ const NandGlossaryRow* findNandGlossary(std::string_view key);
 
 // What findNandGlossary knows, without the numbers at their ends.
 std::vector<std::string> nandGlossaryKeys();
+// The subjects, each once, in their order.
+std::vector<std::string_view> nandGlossaryGroups();
+// The rows of a subject; none for another text. Whatever the case of its letters.
+std::vector<const NandGlossaryRow*> nandGlossaryGroup(std::string_view name);
+
+// The key without "com.velmora.NANDInfo.".
+std::string_view withoutNandPrefix(std::string_view key);
+// The number of a figure within its row's series; none where it stands alone.
+std::optional<std::size_t> nandSeriesNumber(const NandGlossaryRow& row, std::string_view key);
+// Whether the figures of the row are the ranges of one histogram.
+bool isNandHistogram(const NandGlossaryRow& row);
 
 // One sentence, with the place in the series where the key is one of several.
 std::optional<std::string> explainNandKey(std::string_view key);

@@ -178,33 +178,83 @@ std::string sixDigits(double value) {
   return {buffer.data(), static_cast<std::size_t>(length)};
 }
 
-std::vector<std::vector<ShownText>> Table::linesWithin(std::size_t width) const {
-  constexpr std::size_t kIndent = 2, kBetween = 2, kLeastFirst = 8;
+namespace {
+
+// The text at its spaces in lines of so many columns; a word that is longer stays whole.
+std::vector<ShownText> atSpaces(const ShownText& text, std::size_t columns) {
+  std::vector<ShownText> lines;
+  std::string_view rest = text.bytes();
+  std::string line;
+  while (!rest.empty()) {
+    const std::string_view word = rest.substr(0, rest.find(' '));
+    rest.remove_prefix(std::min(rest.size(), word.size() + 1));
+    std::string longer = line.empty() ? std::string(word) : line + " " + std::string(word);
+    if (!line.empty() && ShownText(longer).columns() > columns) {
+      lines.emplace_back(line);
+      longer = word;
+    }
+    line = std::move(longer);
+  }
+  lines.emplace_back(line);
+  return lines;
+}
+
+}  // namespace
+
+// How wide the columns are on the screen: what is too long stands in the first column, or in a last one of
+// text.
+std::vector<std::size_t> Table::widthsWithin(std::size_t width) const {
+  constexpr std::size_t kLeastFirst = 12, kLeastLast = 20;
   std::vector<std::size_t> widths(columns_.size(), 0);
-  std::size_t others = kIndent;
-  for (std::size_t i = columns_.size(); i-- > 0;) {
+  std::size_t all = kIndent;
+  for (std::size_t i = 0; i < columns_.size(); ++i) {
     for (const auto& row : rows_) {
       if (i < row.size()) widths[i] = std::max(widths[i], row[i].columns());
     }
-    if (i > 0) others += widths[i] + kBetween;
+    all += widths[i] + (i > 0 ? kBetween : 0);
   }
-  const std::size_t room = width > others + kLeastFirst ? width - others : kLeastFirst;
-  if (width != 0 && !widths.empty()) widths[0] = std::min(widths[0], room);
+  const auto narrow = [&](std::size_t column, std::size_t least) {
+    if (width == 0 || all <= width) return;
+    const std::size_t others = all - widths[column];
+    const std::size_t narrowed =
+        std::min(widths[column], std::max(least, width > others ? width - others : 0));
+    all -= widths[column] - narrowed;
+    widths[column] = narrowed;
+  };
+  if (columns_.size() > 1 && columns_.back() == Align::Left) narrow(columns_.size() - 1, kLeastLast);
+  if (columns_.size() > 1) narrow(0, kLeastFirst);
+  return widths;
+}
 
+std::vector<std::vector<ShownText>> Table::linesWithin(std::size_t width) const {
+  const std::vector<std::size_t> widths = widthsWithin(width);
+  const std::string between(kBetween, ' ');
   std::vector<std::vector<ShownText>> lines;
   for (const auto& row : rows_) {
     auto& ofRow = lines.emplace_back();
     ShownText text = std::string(kIndent, ' ');
+    std::size_t column = kIndent;
     for (std::size_t i = 0; i < row.size(); ++i) {
-      ShownText cell = row[i];
-      if (i == 0 && row.size() > 1 && cell.columns() > widths[0]) {
-        ofRow.push_back(text + cell);
-        cell = {};
+      std::vector<ShownText> cell{row[i]};
+      if (row[i].columns() > widths[i]) {
+        if (i == 0 && row.size() > 1) {
+          ofRow.push_back(text + row[i]);
+          cell = {ShownText()};
+        } else {
+          cell = atSpaces(row[i], widths[i]);
+        }
       }
-      const std::string padding(widths[i] - std::min(widths[i], cell.columns()), ' ');
-      text += (columns_[i] == Align::Right ? padding + cell : cell + padding) + std::string(kBetween, ' ');
+      const std::string padding(widths[i] - std::min(widths[i], cell[0].columns()), ' ');
+      text += columns_[i] == Align::Right ? padding + cell[0] : cell[0] + padding;
+      if (i + 1 < row.size()) {
+        text += between;
+        column += widths[i] + kBetween;
+        continue;
+      }
+      ofRow.push_back(text.withoutTrailingSpaces());
+      for (std::size_t more = 1; more < cell.size(); ++more)
+        ofRow.push_back(std::string(column, ' ') + cell[more]);
     }
-    ofRow.push_back(text.withoutTrailingSpaces());
   }
   return lines;
 }

@@ -88,8 +88,9 @@ void printError(const ShownText& reason);
 // A number in at most six significant digits, for people.
 std::string sixDigits(double value);
 
-// Rows of cells under each other; numbers to the right. On a screen that is too narrow for all of it, a first
-// cell that is too long stands on a line of its own above the rest of its row.
+// Rows of cells under each other; numbers to the right. On a screen that is too narrow for all of it, text in
+// the last column goes on in the next line, and a first cell that is too long has a line of its own above its
+// row.
 class Table {
  public:
   enum class Align { Left, Right };
@@ -102,7 +103,10 @@ class Table {
   void print(Terminal& out, const std::function<void(std::size_t row)>& after) const;
 
  private:
-  // A line or two for each row, none longer than the width (0: any) where that is possible.
+  static constexpr std::size_t kIndent = 2, kBetween = 2;
+
+  std::vector<std::size_t> widthsWithin(std::size_t width) const;
+  // The lines of each row, none longer than the width (0: any) where that is possible.
   std::vector<std::vector<ShownText>> linesWithin(std::size_t width) const;
 
   std::vector<Align> columns_;

@@ -10,6 +10,7 @@
 #include "platform/platform.h"
 #include "tools/tallyctl/day_argument.h"
 #include "tools/tallyctl/input_file.h"
+#include "tools/tallyctl/key_selection.h"
 #include "tools/tallyctl/output_file.h"
 #include "tools/tallyctl/page/report_page.h"
 #include "tools/tallyctl/report/daily_report.h"

@@ -12,8 +12,34 @@ namespace {
 
 constexpr std::size_t kWidestNames = 26, kMargin = 2;
 
-// The text in lines of at most so many columns, all but the first behind an indentation.
-std::string wrapped(std::string_view text, std::size_t indentation, std::size_t width) {
+using Entries = std::vector<std::pair<std::string, std::string>>;  // names, and what is said of them
+
+void addEntries(std::string& text, const std::string& heading, const Entries& entries, std::size_t width) {
+  if (entries.empty()) return;
+  std::size_t names = 0;
+  for (const auto& [name, says] : entries) {
+    if (name.size() <= kWidestNames) names = std::max(names, name.size());
+  }
+  text += "\n" + heading + ":\n";
+  const std::size_t indentation = kMargin + names + 2;
+  for (const auto& [name, says] : entries) {
+    text.append(kMargin, ' ').append(name);
+    if (name.size() > names)
+      text.append("\n").append(indentation, ' ');
+    else
+      text.append(indentation - kMargin - name.size(), ' ');
+    text += wrappedText(says, indentation, width);
+  }
+}
+
+std::string saysOf(const OptionDeclaration& option) {
+  if (!option.isRequired || option.isPositional) return option.says;
+  return option.says + " (required)";
+}
+
+}  // namespace
+
+std::string wrappedText(std::string_view text, std::size_t indentation, std::size_t width) {
   const std::size_t room = std::max<std::size_t>(width > indentation ? width - indentation : 0, 20);
   std::string lines;
   std::size_t column = 0;
@@ -32,36 +58,9 @@ std::string wrapped(std::string_view text, std::size_t indentation, std::size_t 
   return lines + "\n";
 }
 
-using Entries = std::vector<std::pair<std::string, std::string>>;  // names, and what is said of them
-
-void addEntries(std::string& text, const std::string& heading, const Entries& entries, std::size_t width) {
-  if (entries.empty()) return;
-  std::size_t names = 0;
-  for (const auto& [name, says] : entries) {
-    if (name.size() <= kWidestNames) names = std::max(names, name.size());
-  }
-  text += "\n" + heading + ":\n";
-  const std::size_t indentation = kMargin + names + 2;
-  for (const auto& [name, says] : entries) {
-    text.append(kMargin, ' ').append(name);
-    if (name.size() > names)
-      text.append("\n").append(indentation, ' ');
-    else
-      text.append(indentation - kMargin - name.size(), ' ');
-    text += wrapped(says, indentation, width);
-  }
-}
-
-std::string saysOf(const OptionDeclaration& option) {
-  if (!option.isRequired || option.isPositional) return option.says;
-  return option.says + " (required)";
-}
-
-}  // namespace
-
 std::string helpText(const CLI::App& command, std::size_t width) {
-  std::string text = "Usage: " + wrapped(synopsisOf(command), 7, width);
-  text += "\n" + wrapped(command.get_description() + ".", 0, width);
+  std::string text = "Usage: " + wrappedText(synopsisOf(command), 7, width);
+  text += "\n" + wrappedText(command.get_description() + ".", 0, width);
   Entries positionals, options, common;
   for (const OptionDeclaration& option : optionsOf(command))
     (option.isPositional ? positionals : options).emplace_back(shownNames(option), saysOf(option));
@@ -78,7 +77,7 @@ std::string helpText(const CLI::App& command, std::size_t width) {
   addEntries(text, "Options", options, width);
   addEntries(text, "Options of all commands", common, width);
   if (!order.empty())
-    text += "\n" + wrapped("\"tallyctl help COMMAND\" and \"COMMAND --help\" say more of one.", 0, width);
+    text += "\n" + wrappedText("\"tallyctl help COMMAND\" and \"COMMAND --help\" say more of one.", 0, width);
   return text;
 }
 

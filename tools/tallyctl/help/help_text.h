@@ -3,12 +3,16 @@
 
 #include <CLI/CLI.hpp>
 #include <string>
+#include <string_view>
 
 namespace tbdaily {
 
 // The help of a command: its synopsis, what it does, its commands in groups and its options, wrapped at words
 // for so many columns.
 std::string helpText(const CLI::App& command, std::size_t width);
+
+// The text in lines of at most so many columns, all but the first behind an indentation.
+std::string wrappedText(std::string_view text, std::size_t indentation, std::size_t width);
 
 // Has the parser's --help print that.
 class HelpFormatter : public CLI::FormatterBase {

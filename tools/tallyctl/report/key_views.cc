@@ -92,13 +92,12 @@ void printIdentifiability(Terminal& out, const Identifiability& found) {
                bits ? bitsText(*bits) : "-", key.followsValues ? "the statistics say each value" : ""});
   }
   table.print(out);
-  out.line("  " + std::to_string(bounded) + " keys with a bound: at most " + bitsText(sum) +
-           " bits together, where they do not depend on each other; " +
-           std::to_string(found.keys.size() - bounded) + " without one.");
+  out.line("  " + std::to_string(bounded) + " keys with a bound, at most " + bitsText(sum) +
+           " bits together; " + std::to_string(found.keys.size() - bounded) + " without one");
   printHeading(out, "Beside the whitelisted keys");
   for (const std::string& name : found.outside) out.line("  " + name);
   out.line();
-  out.line("These are upper bounds from the whitelist's rules, for one report; no promise of privacy.");
+  out.line("Upper bounds by the whitelist's rules for one report; no promise of privacy.");
 }
 
 void writeIdentifiability(JsonWriter& json, const Identifiability& found) {

@@ -1,12 +1,12 @@
 #include "tools/tallyctl/report/view.h"
 
 #include <algorithm>
-#include <cctype>
 #include <cmath>
 
 #include "platform/analytics_client.h"
 #include "platform/calendar.h"
 #include "platform/plist_text.h"
+#include "tools/tallyctl/key_selection.h"
 
 namespace tbdaily {
 
@@ -16,12 +16,6 @@ using enum Table::Align;
 
 std::string text(const PlistValue& value) {
   return value.isNone() ? "-" : plistText(value);
-}
-
-std::string inLowerCase(std::string_view text) {
-  std::string lower(text);
-  for (char& c : lower) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return lower;
 }
 
 void printHeading(Terminal& out, const std::string& heading, std::size_t count) {
@@ -41,8 +35,9 @@ void printEntries(Terminal& out, const std::string& heading, const PlistDictiona
     valueWidth = std::max(valueWidth, ShownText(text(value)).columns());
   }
   const std::size_t one = kBeforeKey + keyWidth + kBeforeValue + valueWidth;
-  const std::size_t columns = std::clamp<std::size_t>(out.lineWidth() / one, 1, kMostColumns);
-  const std::size_t rows = (entries.size() + columns - 1) / columns;
+  const std::size_t most = std::clamp<std::size_t>(out.lineWidth() / one, 1, kMostColumns);
+  const std::size_t rows = (entries.size() + most - 1) / most;
+  const std::size_t columns = (entries.size() + rows - 1) / rows;
   std::vector<Table::Align> aligns;
   std::vector<ShownText> head;
   for (std::size_t column = 0; column < columns; ++column) {
@@ -125,14 +120,6 @@ void printAppInfo(Terminal& out, const PlistDictionary& root) {
 }
 
 }  // namespace
-
-bool isSelected(std::string_view key, const std::vector<std::string>& words) {
-  if (words.empty()) return true;
-  const std::string lower = inLowerCase(key);
-  return std::any_of(words.begin(), words.end(), [&lower](const std::string& word) {
-    return lower.find(inLowerCase(word)) != std::string::npos;
-  });
-}
 
 PlistValue selectedKeys(const PlistValue& root, const std::vector<std::string>& words) {
   if (words.empty()) return root;

@@ -2,7 +2,6 @@
 #pragma once
 
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "tools/tallyctl/report/daily_report.h"
@@ -10,8 +9,6 @@
 
 namespace tbdaily {
 
-// Whether the key has one of the words in it, whatever their case; without words every key is meant.
-bool isSelected(std::string_view key, const std::vector<std::string>& words);
 // The report with the keys that are selected, of scalars, distributions and histograms; all else stays.
 PlistValue selectedKeys(const PlistValue& root, const std::vector<std::string>& words);
 

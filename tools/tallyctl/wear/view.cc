@@ -243,13 +243,11 @@ void printRawWear(Terminal& out, const WearMoment& wear) {
 }
 
 std::string paceSentence(const WearPace& pace, std::int64_t endurance) {
-  const std::string subject = "At the pace of the last " + std::to_string(pace.days) +
-                              (pace.days == 1 ? " day" : " days") + " the most worn block ";
-  if (pace.hottestCycle >= endurance)
-    return "The most worn block has met " + std::to_string(endurance) + " erases already.";
+  const std::string erases = std::to_string(endurance) + " erases";
+  if (pace.hottestCycle >= endurance) return "Most worn block: " + erases + " already";
   const auto day = pace.dayOfCycles(endurance);
-  return subject + (day ? "meets " + std::to_string(endurance) + " erases on " + dayText(*day) + "."
-                        : "never meets " + std::to_string(endurance) + " erases.");
+  return "Most worn block: " + (day ? erases + " on " + dayText(*day) : "never " + erases) +
+         ", at the pace of the last " + std::to_string(pace.days) + (pace.days == 1 ? " day" : " days");
 }
 
 void printWearHistory(Terminal& out, const WearHistory& history, const std::optional<WearPace>& pace,
