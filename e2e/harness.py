@@ -32,7 +32,7 @@ def on_screen(device, words, columns, lines=0, **environment):
     master, slave = pty.openpty()
     fcntl.ioctl(slave, termios.TIOCSWINSZ, struct.pack("HHHH", lines, columns, 0, 0))
     shown = subprocess.Popen([BIN / "tallyctl", *words], stdin=slave, stdout=slave,
-                             env=dict(device.env, **dict(TERM="xterm", NO_COLOR="1", LC_ALL="C.UTF-8"), **environment))
+                             env=device.env | {"TERM": "xterm", "NO_COLOR": "1", "LC_ALL": "C.UTF-8"} | environment)
     os.close(slave)
     text = b""
     try:

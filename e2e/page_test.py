@@ -4,11 +4,10 @@ import itertools
 import os
 import pathlib
 import random
-import subprocess
 import unittest
 
 from browser import Browser
-from harness import BIN, TODAY, YESTERDAY, Device
+from harness import TODAY, YESTERDAY, Device
 
 FOLDER = pathlib.Path(os.environ["TBDAILY_PAGE"])  # where the rules are installed, and pictures go
 AXE = (FOLDER / "node_modules/axe-core/axe.min.js").read_text()
@@ -109,10 +108,8 @@ class Pages(unittest.TestCase):
         worn = Device()
         cls.addClassCleanup(worn.close)
         worn.tally("record", "import", stdin="\n".join(wear_lines()) + "\n")
-        for name, first in (("wear", TODAY - 90), ("wear-nothing", TODAY + 1)):
-            page = subprocess.run([BIN / "wear_page_sample", worn.root, str(first), str(TODAY + 1), "3000"], env=worn.env,
-                                  capture_output=True, check=True)
-            cls.pages[name].write_bytes(page.stdout)
+        for name, days in (("wear", "91"), ("wear-nothing", "1")):
+            worn.tally("wear", "--history", "--days", days, "--endurance", "3000", "--html", str(cls.pages[name]))
 
     def test_a_page_asks_for_nothing_and_runs_nothing(self):
         for name, place in self.pages.items():

@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 #include <limits>
+#include <span>
 
 #include "drivermetrics/kd_report.h"
 #include "storage/content_deletion.h"
@@ -11,6 +12,8 @@
 #include "tools/tallyctl/day_argument.h"
 #include "tools/tallyctl/metrics/sampler.h"
 #include "tools/tallyctl/metrics/selection.h"
+#include "tools/tallyctl/output_file.h"
+#include "tools/tallyctl/page/wear_page.h"
 #include "tools/tallyctl/tool.h"
 #include "tools/tallyctl/wear/view.h"
 
@@ -29,6 +32,7 @@ constexpr std::string_view kWearStats[] = {"percentUsed", "slcPercentUsed", "max
 struct WearArguments {
   bool raw = false, check = false, history = false;
   std::optional<std::int64_t> days, endurance;
+  std::optional<std::string> html;  // a file for the page
 };
 
 // The drives that the driver of NVMe drives tells of; a failure has been said then.
@@ -136,6 +140,15 @@ void writeJson(JsonWriter& json, const WearHistory& history) {
   }
 }
 
+void writePage(Tool& tool, const WearArguments& arguments, const WearHistory& history) {
+  const std::string page = wearPage(
+      history, {tool.platform().host().root().native(), wearPace(history, kDaysOfPace), arguments.endurance});
+  const auto written = writeOutputFile(*arguments.html, std::as_bytes(std::span(page)));
+  if (!written) return tool.fail(written.reason());
+  if (*arguments.html != "-")
+    tool.out().line("wrote " + std::to_string(page.size()) + " bytes to " + *arguments.html);
+}
+
 void showHistory(Tool& tool, const WearArguments& arguments) {
   if (!tool.hasUsableRoot()) return;
   LinuxPlatform& platform = tool.platform();
@@ -145,6 +158,7 @@ void showHistory(Tool& tool, const WearArguments& arguments) {
   const auto history = readWearHistory(platform, static_cast<DayNumber>(first), today);
   if (!tool.hasReadAll()) return;
   if (!history) return tool.fail(history.reason());
+  if (arguments.html) return writePage(tool, arguments, *history);
   if (tool.printedAsJson([&history](JsonWriter& json) { writeJson(json, *history); })) return;
   if (history->days.empty()) {
     tool.out().line(arguments.days
@@ -180,7 +194,16 @@ void addWearCommand(CLI::App& app, Tool& tool) {
       ->type_name("CYCLES")
       ->check(CLI::Range(std::int64_t{1}, std::numeric_limits<std::int64_t>::max()))
       ->needs(history);
+  command
+      ->add_option(
+          "--html", arguments->html,
+          "With --history: write it to this file, as a page for a browser that needs nothing else; - is "
+          "standard output")
+      ->type_name("FILE")
+      ->needs(history);
   command->callback([&tool, arguments] {
+    if (arguments->html && tool.options.json)
+      return tool.fail("--html writes a page and does not go with --json", kWrongUsage);
     arguments->history ? showHistory(tool, *arguments) : showWear(tool, *arguments);
   });
 }
