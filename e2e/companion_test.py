@@ -123,7 +123,7 @@ class Companion(DeviceTest):
         self.assertIn("Preview of the daily report", device.tally("report", "--preview", "--html", "-"))
         self.assertEqual(device.snapshot(), kept)
         self.assertIn("no such file", device.tally("report", "--html", str(device.base / "none/page"), status=1))
-        self.assertIn("no daily report", device.tally("report", "-", "--html", str(page), stdin="{}", status=1))
+        self.assertIn("no daily report", device.tally("report", "-", "--html", str(page), stdin="<plist><string/></plist>", status=1))
         self.assertEqual(sorted(place.name for place in device.base.iterdir()), ["report.html", "root"])
         for words in ("--json report --html x", "report --html x --raw", "report --html x --identifiability"):
             device.tally(*words.split(), status=2)

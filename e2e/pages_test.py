@@ -13,7 +13,7 @@ TREE = pathlib.Path(__file__).resolve().parent.parent
 INSTEAD = [(r"\[--day DAY\]", "--day yesterday"), (r"\bDAY\b", "yesterday"), (r"\bROOT\b", "{root}"), (r"^sudo ", ""),
            (r"app-info FILE", "app-info {apps}"), (r"\bFILE\b", "{report}"), (r"--interval \d+", "--interval 0.1"),
            (r"--count \d+", "--count 2"), (r"(watch --interval 0.1)$", r"\1 --count 2"), (r"\bhour.jsonl", "{base}/hour.jsonl"),
-           (r"\breport\.html", "{base}/report.html"), (r"-o (\w+\.\w+)", r"-o {base}/\1"),
+           (r"\b(report|wear)\.html", r"{base}/\1.html"), (r"-o (\w+\.\w+)", r"-o {base}/\1"),
            (r"--to laptop", "--to {base}/laptop")]
 
 

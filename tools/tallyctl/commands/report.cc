@@ -61,12 +61,13 @@ Outcome<FoundReport> readKept(Tool& tool, std::optional<DayNumber> day) {
   const DeviceFiles& files = tool.platform().host().files();
   const auto reports = keptReports(files, ReportFolders::All);
   if (!reports) return Failure{reports.reason()};
-  for (auto kept = reports->rbegin(); kept != reports->rend(); ++kept) {
-    auto root = readKeptReport(files, tool.platform().services().propertyListCodec, kept->path);
+  for (std::size_t i = reports->size(); i-- > 0;) {  // the newest first
+    const std::string& path = (*reports)[i].path;
+    auto root = readKeptReport(files, tool.platform().services().propertyListCodec, path);
     if (!root && !day) return Failure{root.reason()};
     const auto start = root ? root->get("TBStartDate").asDate() : std::nullopt;
     if (!day || (start && dayNumberOf(*start) == *day))
-      return FoundReport{std::move(*root), files.place(kept->path).native()};
+      return FoundReport{std::move(*root), files.place(path).native()};
   }
   if (day) return Failure{"there is no report of " + dayText(*day) + " here"};
   return Failure{"there is no report yet in " + files.root().native() +

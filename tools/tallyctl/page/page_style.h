@@ -120,7 +120,7 @@ svg text.mark { fill: var(--warn); stroke: none; }
   .tiles > div { padding: .6rem .75rem; }
   .tiles dd { font-size: 1.25rem; }
   .stats { display: grid; grid-template-columns: repeat(auto-fill, minmax(6.25rem, 1fr)); gap: .5rem; }
-  th, td { padding-inline: .75rem; }
+  th, td, caption { padding-inline: .75rem; }
   svg text { font-size: 16px; }
   .days text { font-size: 23px; }
 }
