@@ -55,7 +55,8 @@ class Pages(DeviceTest):
             job = device.start() if "send " in typed else None
             done = subprocess.run(["sh", "-c", typed], env=environment, capture_output=True, text=True, timeout=120)
             self.assertEqual(done.returncode, 0, (line, done.stderr))
-            if job:
+            if job:  # it would wait for more
+                job.kill()
                 job.wait(timeout=60)
 
     def test_the_messages_that_are_explained_are_those_of_the_programs(self):

@@ -17,6 +17,7 @@ class Report(DeviceTest):
         job = device.start()
         device.tally("send", "run", str(YESTERDAY - 3))
         device.wait_for(lambda: len(device.pending()) == 2)
+        job.kill()  # it would wait for more
         job.wait(timeout=60)
         both = {device.tally_json("report", "--day", day)["TBScalars"]["k"] for day in ("yesterday", str(YESTERDAY - 3))}
         self.assertEqual(both, {3, 1})
