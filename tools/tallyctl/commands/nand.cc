@@ -47,11 +47,11 @@ void printHistogram(Terminal& out, const NandGlossaryRow& row, const PlistDictio
   const std::size_t barWidth = std::clamp(out.width() > used ? out.width() - used : 0, kLeastBar, kMostBar);
   for (std::size_t i = 0; i < counts.size(); ++i) {
     const std::string label = std::to_string(i), count = std::to_string(counts[i]);
-    const ShownText line =
-        std::string(kIndent, ' ') + "range " + std::string(labelWidth - label.size(), ' ') + label +
-        std::string(2 + countWidth - std::min(countWidth, count.size()), ' ') + count + "  " +
-        out.bar(static_cast<double>(counts[i]), static_cast<double>(largest), barWidth);
-    out.line(line.withoutTrailingSpaces());
+    std::string line(kIndent, ' ');
+    line.append("range ").append(labelWidth - label.size(), ' ').append(label);
+    line.append(2 + countWidth - std::min(countWidth, count.size()), ' ').append(count).append("  ");
+    line += out.bar(static_cast<double>(counts[i]), static_cast<double>(largest), barWidth);
+    out.line(ShownText(line).withoutTrailingSpaces());
   }
 }
 

@@ -95,11 +95,12 @@ std::optional<DayNumber> WearPace::dayOfCycles(std::int64_t cycles) const {
 std::optional<WearPace> wearPace(const WearHistory& history, int mostDays) {
   const WearDay* last = nullptr;
   const WearDay* first = nullptr;
-  for (auto day = history.days.rbegin(); day != history.days.rend(); ++day) {
-    if (day->hottestCycle && last == nullptr) last = &*day;
-    if (last != nullptr && std::int64_t{last->day} - day->day > mostDays) break;
-    if (day->hottestCycle) first = &*day;
-    if (day->wentBack) break;
+  for (std::size_t i = history.days.size(); i-- > 0;) {
+    const WearDay& day = history.days[i];
+    if (day.hottestCycle && last == nullptr) last = &day;
+    if (last != nullptr && std::int64_t{last->day} - day.day > mostDays) break;
+    if (day.hottestCycle) first = &day;
+    if (day.wentBack) break;
   }
   if (last == nullptr || first == last) return std::nullopt;
   WearPace pace;
