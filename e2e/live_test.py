@@ -1,8 +1,10 @@
 """The drivers of the machine that runs the tests, against readings of its own before and after."""
 
 import datetime
+import json
 import os
 import pathlib
+import struct
 import time
 import unittest
 
@@ -110,6 +112,20 @@ class LiveDrivers(unittest.TestCase):
         self.assertNotEqual(self.device.path("System/Device/clock.plist").read_bytes(), recorded)
         self.device.env["TBDAILY_LIVE"] = "0"
         self.device.tally("capture", "--only", "kernel", status=1)
+
+    def test_wear_goes_by_the_health_pages_of_drives_without_a_controller(self):
+        device = self.device
+        bad, good = bytearray(512), bytearray(512)
+        bad[0], bad[3], bad[4], bad[5], good[3] = 4, 8, 10, 83, 100
+        struct.pack_into("<Q", bad, 48, 60_000_000)
+        device.record("nvme", {"controllers": {"nvme0": bytes(bad), "nvme1": bytes(good)}})
+        wear = json.loads(device.tally("--json", "wear", "--check", status=12))
+        self.assertEqual((wear["verdict"], wear["userWriteAmplification"]), ("act now", None))
+        self.assertEqual([(drive["name"], drive["hostWrittenBytes"]) for drive in wear["drives"]],
+                         [("nvme0", 60_000_000 * 512_000), ("nvme1", 0)])
+        self.assertEqual([finding["urgent"] for finding in wear["findings"]], [True, True, False])
+        device.record("nvme", {"controllers": {"nvme1": bytes(good)}})
+        self.assertEqual(device.tally("wear", "--check").splitlines()[0], "healthy")
 
     def test_a_recording_or_live_sources_switched_off_hide_them(self):
         self.assertTrue(self.sample())

@@ -133,10 +133,12 @@ std::string humanRate(double perSecond, std::int64_t unit) {
 }
 
 std::string humanBytes(double bytes) {
+  if (std::fabs(bytes) < 999.5) return withDigits(bytes, 0) + " B";
   return withPrefix(bytes, "B");
 }
 
 std::string humanTime(double seconds) {
+  if (std::fabs(seconds) < 2 * kMinute) return withDigits(seconds, 0) + " s";
   return duration(seconds);
 }
 

@@ -15,10 +15,10 @@ std::string humanFigure(std::int64_t value, std::int64_t unit);
 // of a count. Empty for what no one adds up: temperatures, powers and the like.
 std::string humanRate(double perSecond, std::int64_t unit);
 
-// "8.80 TB", "512 B": three digits, decimal prefixes.
+// "8.80 TB": three digits, decimal prefixes; "512 B" below a thousand.
 std::string humanBytes(double bytes);
 
-// "95.0 s", "12 min 5 s", "520 d 0 h".
+// "95 s", "12 min 5 s", "520 d 0 h".
 std::string humanTime(double seconds);
 
 }  // namespace tbdaily
