@@ -91,19 +91,25 @@ constexpr KnownStat kKnownStats[] = {
     {430, 17},            // percentUsed
 };
 
-std::uint64_t sampleStat(const StatDefinition& stat, std::size_t element) {
+// Those that grow with the device's age: traffic, erases, hours, wear.
+constexpr std::uint32_t kAgingStats[] = {2,  3,  4,  7,  9,  10, 11,  16,  17,  18,  19,  20, 22,
+                                         23, 28, 34, 45, 47, 84, 124, 125, 204, 428, 429, 430};
+
+std::uint64_t sampleStat(const StatDefinition& stat, std::size_t element, const SampleVariation& variation) {
   for (const KnownStat& known : kKnownStats) {
-    if (known.id == stat.id && known.element == element) return known.value;
+    if (known.id != stat.id || known.element != element) continue;
+    const bool ages = std::ranges::find(kAgingStats, stat.id) != std::end(kAgingStats);
+    return ages ? static_cast<std::uint64_t>(static_cast<double>(known.value) * variation.age) : known.value;
   }
   return (stat.id * 2654435761U >> 20) % 500 / (element + 1);
 }
 
-PlistData sampleStatistics() {
+PlistData sampleStatistics(const SampleVariation& variation) {
   BufferBuilder out;
   for (const StatDefinition& stat : kStats) {
     const std::size_t count = std::max<std::size_t>(stat.limit, 1);
     out.u64(std::uint64_t{count} << 32 | stat.id);
-    for (std::size_t i = 0; i < count; ++i) out.u64(sampleStat(stat, i));
+    for (std::size_t i = 0; i < count; ++i) out.u64(sampleStat(stat, i, variation));
   }
   return out.take();
 }
@@ -199,7 +205,8 @@ PlistValue number(std::int64_t n) {
   return PlistValue::int64(n);
 }
 
-PlistArray sampleBuffers(const NandExporter& exporter, std::uint32_t channels) {
+PlistArray sampleBuffers(const NandExporter& exporter, std::uint32_t channels,
+                         const SampleVariation& variation) {
   PlistArray buffers;
   const auto add = [&](SelectorGetter selectors, PlistData bytes, std::uint32_t list = 0) {
     buffers.push_back(PlistValue::dictionary({{"method", number(exporter.dataMethod)},
@@ -207,7 +214,7 @@ PlistArray sampleBuffers(const NandExporter& exporter, std::uint32_t channels) {
                                               {"list", number(list)},
                                               {"data", PlistValue::data(std::move(bytes))}}));
   };
-  add(exporter.statsSelectors, sampleStatistics());
+  add(exporter.statsSelectors, sampleStatistics(variation));
   add(exporter.bandStatsSelectors, sampleBandStatistics());
   for (std::uint32_t list = 0; list < 3; ++list)
     add(exporter.telemetryListSelectors, sampleTelemetry(channels, list), list);
@@ -249,11 +256,11 @@ PlistData sampleStackSnapshot() {
   return out.take();
 }
 
-PlistDictionary sampleRegistry(std::string_view profile) {
+PlistDictionary sampleRegistry(std::string_view profile, const SampleVariation& variation) {
   constexpr std::uint32_t kChannels = 2;
   const NandExporter& exporter = nand_exporters[profile == "stx" ? 0 : 1];
   PlistDictionary client{{"kind", PlistValue::string("storage")},
-                         {"buffers", PlistValue::array(sampleBuffers(exporter, kChannels))}};
+                         {"buffers", PlistValue::array(sampleBuffers(exporter, kChannels, variation))}};
   if (exporter.recommendationMethod != kNoMethod) {
     client.set("recommendation",
                PlistValue::dictionary({{"method", number(exporter.recommendationMethod)},

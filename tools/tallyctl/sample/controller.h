@@ -5,12 +5,13 @@
 #include <string_view>
 
 #include "platform/plist_value.h"
+#include "tools/tallyctl/sample/variation.h"
 
 namespace tbdaily {
 
 // The root of registry.plist. `profile` is "nvme" or "stx": the class of the controller. The write
 // amplification is above its threshold, so that a run writes the NAND log.
-PlistDictionary sampleRegistry(std::string_view profile);
+PlistDictionary sampleRegistry(std::string_view profile, const SampleVariation& variation);
 
 // The bytes of snapshot.kcdata: a kernel task with the thread that freezes memory among its threads.
 PlistData sampleStackSnapshot();

@@ -98,8 +98,8 @@ PlistDictionary sampleTasking() {
 }
 
 // The storage controller's entries, then those of the drivers that publish metrics.
-PlistDictionary sampleDrivers(const SampleProfile& profile) {
-  PlistDictionary registry = sampleRegistry(profile.name);
+PlistDictionary sampleDrivers(const SampleRequest& request) {
+  PlistDictionary registry = sampleRegistry(request.profile->name, request.variation);
   PlistArray entries = *registry.get("entries").asArray();
   for (PlistValue& entry : sampleMetricsEntries()) entries.push_back(std::move(entry));
   registry.set("entries", PlistValue::array(std::move(entries)));
@@ -112,18 +112,19 @@ struct SampleFile {
   PlistDictionary root;
 };
 
-std::vector<SampleFile> sampleFiles(const SampleProfile& profile, DayNumber today) {
+std::vector<SampleFile> sampleFiles(const SampleRequest& request, DayNumber today) {
   const auto preferences = [](std::string_view domain) {
     return "/var/mobile/Library/Preferences/" + std::string(domain) + ".plist";
   };
   return {{std::string(kWhitelistPath), sampleWhitelist()},
-          {recordingPath(recording::kAnswers), sampleAnswers(profile)},
+          {recordingPath(recording::kAnswers), sampleAnswers(*request.profile)},
           {recordingPath(recording::kKernel), sampleKernel()},
           {recordingPath(recording::kLocale), sampleLocale()},
           {recordingPath(recording::kApps), sampleBundles()},
-          {recordingPath(recording::kRegistry), sampleDrivers(profile)},
+          {recordingPath(recording::kRegistry), sampleDrivers(request)},
           {recordingPath(recording::kHub), sampleHub()},
-          {recordingPath(recording::kUsage), {{"records", PlistValue::array(sampleUsageRecords(today))}}},
+          {recordingPath(recording::kUsage),
+           {{"records", PlistValue::array(sampleUsageRecords(today, request.variation))}}},
           {preferences(preference_domain::kLogSubmission),
            {{"DiagnosticLogSubmissionEnabled", PlistValue::boolean(true)},
             {"ScheduledTasking", PlistValue::dictionary(sampleTasking())}}},
@@ -145,15 +146,15 @@ fs::path builtSupportLibrary() {
 
 class SampleDevice {
  public:
-  SampleDevice(LinuxPlatform& platform, const SampleProfile& profile)
-      : platform_(platform), profile_(profile), host_(platform.host()) {}
+  SampleDevice(LinuxPlatform& platform, const SampleRequest& request)
+      : platform_(platform), request_(request), host_(platform.host()) {}
 
   Outcome<Nothing> make() {
     if (const int error = makeRoot(); error != 0) {
       return Failure{host_.root().native() + " cannot be made: " + errorText(error)};
     }
     const DayNumber today = platform_.services().analyticsClient.currentDayNumber();
-    const std::vector<SampleFile> files = sampleFiles(profile_, today);
+    const std::vector<SampleFile> files = sampleFiles(request_, today);
     const StorePlace store = storePlaceOf(host_.files(), analyticsDatabasePath("/var/mobile"));
     if (const std::string taken = firstTaken(files); !taken.empty()) {
       return Failure{
@@ -184,7 +185,9 @@ class SampleDevice {
     for (const std::string& name : {store.name, storeLogOf(store.name), store.name + "-shm"})
       written_.push_back(store.folder + "/" + name);
     AnalyticsStore analytics(store);
-    if (auto reason = addSampleHistory(analytics, yesterday)) return Failure{std::move(*reason)};
+    const DayNumber first = yesterday - request_.days + 1;
+    if (auto reason = addSampleHistory(analytics, first, yesterday, request_.variation))
+      return Failure{std::move(*reason)};
     return Nothing{};
   }
 
@@ -250,7 +253,7 @@ class SampleDevice {
   }
 
   LinuxPlatform& platform_;
-  const SampleProfile& profile_;
+  const SampleRequest& request_;
   const Host& host_;
   std::vector<std::string> written_;  // paths of the device
   bool madeRoot_ = false;
@@ -258,8 +261,8 @@ class SampleDevice {
 
 }  // namespace
 
-Outcome<Nothing> makeSampleDevice(LinuxPlatform& platform, const SampleProfile& profile) {
-  return SampleDevice(platform, profile).make();
+Outcome<Nothing> makeSampleDevice(LinuxPlatform& platform, const SampleRequest& request) {
+  return SampleDevice(platform, request).make();
 }
 
 }  // namespace tbdaily

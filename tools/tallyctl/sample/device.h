@@ -5,6 +5,7 @@
 
 #include "platform/linux/linux_platform.h"
 #include "tools/tallyctl/outcome.h"
+#include "tools/tallyctl/sample/variation.h"
 
 namespace tbdaily {
 
@@ -15,8 +16,14 @@ struct SampleProfile {
 };
 inline constexpr std::array<SampleProfile, 2> kSampleProfiles = {{{"nvme", "TP9,3"}, {"stx", "TP4,1"}}};
 
-// Whitelist, preferences with submission enabled, recordings of every family, the support library, and
-// yesterday's rows. Fails where any of its files is there already; nothing is overwritten.
-Outcome<Nothing> makeSampleDevice(LinuxPlatform& platform, const SampleProfile& profile);
+struct SampleRequest {
+  const SampleProfile* profile = &kSampleProfiles[0];
+  SampleVariation variation;
+  int days = 1;  // of history, up to yesterday; at least 1
+};
+
+// Whitelist, preferences with submission enabled, recordings of every family, the support library, and the
+// rows of the days. Fails where any of its files is there already; nothing is overwritten.
+Outcome<Nothing> makeSampleDevice(LinuxPlatform& platform, const SampleRequest& request);
 
 }  // namespace tbdaily

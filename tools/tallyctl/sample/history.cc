@@ -7,7 +7,6 @@
 #include <vector>
 
 #include "platform/usage_service.h"
-#include "tools/tallyctl/noise.h"
 
 namespace tbdaily {
 
@@ -23,21 +22,25 @@ constexpr std::array<const char*, 16> kSystemApps = {
 
 enum class Shape { Bell, Decay, Percent };
 
+constexpr VariationFactor kAge = &SampleVariation::age, kUse = &SampleVariation::use,
+                          kLatency = &SampleVariation::latency;
+
 struct SampleDistribution {
   const char* key;
   int count;
   Shape shape;
   double middle, spread;
+  VariationFactor countFactor = nullptr, middleFactor = nullptr;
 };
 
 constexpr SampleDistribution kDistributions[] = {
     {"power.batteryLevel", 1440, Shape::Percent, 62, 30},
     {"power.batteryTemperature", 1440, Shape::Bell, 29, 4},
-    {"power.drainRate", 288, Shape::Decay, 3.5, 0},
+    {"power.drainRate", 288, Shape::Decay, 3.5, 0, nullptr, kUse},
     {"power.chargeCurrent", 288, Shape::Bell, 1450, 200},
-    {"net.latency.cell", 2600, Shape::Decay, 68, 0},
-    {"net.latency.wifi", 5200, Shape::Decay, 19, 0},
-    {"net.latency.dns", 4100, Shape::Decay, 11, 0},
+    {"net.latency.cell", 2600, Shape::Decay, 68, 0, kUse, kLatency},
+    {"net.latency.wifi", 5200, Shape::Decay, 19, 0, kUse, kLatency},
+    {"net.latency.dns", 4100, Shape::Decay, 11, 0, kUse, kLatency},
     {"net.wifi.lossShare", 960, Shape::Decay, 0.06, 0},
     {"display.brightness", 720, Shape::Percent, 45, 25},
     {"internal.schedulerDelay", 3000, Shape::Decay, 2, 0},
@@ -46,27 +49,19 @@ constexpr SampleDistribution kDistributions[] = {
 struct SampleScalar {
   const char* key;
   double low, high;
+  VariationFactor factor = nullptr;
 };
 
 constexpr SampleScalar kScalars[] = {
-    {"power.screenOnMinutes", 90, 380},
-    {"power.chargeCycles", 120, 900},
-    {"power.temperatureDelta", -14, 14},
-    {"power.unplugCount", 1, 9},
-    {"net.wifi.bytesIn", 2e7, 4e9},
-    {"net.wifi.bytesOut", 1e6, 3e8},
-    {"net.wifi.associations", 2, 60},
-    {"net.cell.bytesIn", 1e6, 6e8},
-    {"net.cell.bytesOut", 1e5, 8e7},
-    {"net.cell.handovers", 3, 400},
-    {"net.dns.queries", 800, 9000},
-    {"net.vpn.sessions", 0, 4},
-    {"experiment.newKeyboard.uses", 0, 900},
-    {"experiment.newKeyboard.errors", 0, 7},
-    {"internal.assertions", 0, 30},
-    {"internal.watchdogResets", 0, 2},
-    {"location.fixes", 10, 2000},
-    {"contacts.lookups", 5, 300},
+    {"power.screenOnMinutes", 90, 380, kUse}, {"power.chargeCycles", 120, 900, kAge},
+    {"power.temperatureDelta", -14, 14},      {"power.unplugCount", 1, 9},
+    {"net.wifi.bytesIn", 2e7, 4e9, kUse},     {"net.wifi.bytesOut", 1e6, 3e8, kUse},
+    {"net.wifi.associations", 2, 60, kUse},   {"net.cell.bytesIn", 1e6, 6e8, kUse},
+    {"net.cell.bytesOut", 1e5, 8e7, kUse},    {"net.cell.handovers", 3, 400, kUse},
+    {"net.dns.queries", 800, 9000, kUse},     {"net.vpn.sessions", 0, 4},
+    {"experiment.newKeyboard.uses", 0, 900},  {"experiment.newKeyboard.errors", 0, 7},
+    {"internal.assertions", 0, 30},           {"internal.watchdogResets", 0, 2},
+    {"location.fixes", 10, 2000, kUse},       {"contacts.lookups", 5, 300},
 };
 
 double draw(Noise& noise, const SampleDistribution& d) {
@@ -88,13 +83,16 @@ double measured(double value) {
 
 class SampleWriter {
  public:
-  SampleWriter(AnalyticsStore& store, DayNumber day)
-      : store_(store), day_(day), noise_(static_cast<std::uint64_t>(day)) {}
+  SampleWriter(AnalyticsStore& store, DayNumber day, const SampleVariation& variation)
+      : store_(store), day_(day), variation_(variation), noise_(variation.noiseOf(day)) {}
 
-  void scalar(const std::string& key, double low, double high) {
-    keep(store_.setScalar(key, day_, static_cast<std::int64_t>(std::llround(noise_.between(low, high)))));
+  void scalar(const std::string& key, double low, double high, VariationFactor factor = nullptr) {
+    const double value = varied(noise_.between(low, high), factor, variation_);
+    keep(store_.setScalar(key, day_, static_cast<std::int64_t>(std::llround(value))));
   }
-  void distribution(const std::string& key, const SampleDistribution& d) {
+  void distribution(const std::string& key, SampleDistribution d) {
+    d.count = std::max(1, static_cast<int>(varied(d.count, d.countFactor, variation_)));
+    d.middle = varied(d.middle, d.middleFactor, variation_);
     for (int i = 0; i < d.count && result_.ok(); ++i) {
       const auto second = static_cast<std::int32_t>(kSecondsPerDay * i / d.count);
       const double value = measured(draw(noise_, d));
@@ -102,18 +100,18 @@ class SampleWriter {
     }
   }
   void everything() {
-    for (const SampleScalar& s : kScalars) scalar(s.key, s.low, s.high);
+    for (const SampleScalar& s : kScalars) scalar(s.key, s.low, s.high, s.factor);
     for (const SampleDistribution& d : kDistributions) distribution(d.key, d);
     for (const SampleApp& app : sampleApps()) {
-      scalar("app.launches." + app.identifier, 0, 60);
-      scalar("app.foregroundSeconds." + app.identifier, 0, 5400);
+      scalar("app.launches." + app.identifier, 0, 60, kUse);
+      scalar("app.foregroundSeconds." + app.identifier, 0, 5400, kUse);
       scalar("app.notifications." + app.identifier, 0, 40);
       scalar("app.energy." + app.identifier, 1, 900);
       scalar("app.writes." + app.identifier, 0, 1e8);
       if (!app.isUserApp) continue;
       const auto launches = static_cast<int>(noise_.between(1, 60));
       distribution("app.launchTime." + app.identifier,
-                   {"", launches, Shape::Decay, noise_.between(20, 180), 0});
+                   {"", launches, Shape::Decay, noise_.between(20, 180), 0, kUse, nullptr});
     }
   }
   const StoreResult& result() const { return result_; }
@@ -125,6 +123,7 @@ class SampleWriter {
 
   AnalyticsStore& store_;
   DayNumber day_;
+  const SampleVariation& variation_;
   Noise noise_;
   StoreResult result_;
 };
@@ -139,15 +138,15 @@ std::vector<SampleApp> sampleApps() {
   return apps;
 }
 
-PlistArray sampleUsageRecords(DayNumber day) {
+PlistArray sampleUsageRecords(DayNumber day, const SampleVariation& variation) {
   constexpr std::array<const char*, 8> kDaemons = {"mailsyncd", "updated", "pushd", "timesyncd",
                                                    "mapsd",     "cloudd",  "dnsd",  "backupd"};
   constexpr DayNumber kDaysSinceBoot = 3;
-  Noise noise(static_cast<std::uint64_t>(day) + 1);
+  Noise noise = variation.noiseOf(std::int64_t{day} + 1);
   PlistArray records;
   const auto add = [&](const char* nameKey, const std::string& name, double scale, DayNumber since) {
     const auto bytes = [&](double low, double high) {
-      return PlistValue::int64(std::llround(noise.between(low, high) * scale));
+      return PlistValue::int64(std::llround(noise.between(low, high) * scale * variation.use));
     };
     records.push_back(PlistValue::dictionary(
         {{nameKey, PlistValue::string(name)},
@@ -167,13 +166,16 @@ PlistArray sampleUsageRecords(DayNumber day) {
   return records;
 }
 
-std::optional<std::string> addSampleHistory(AnalyticsStore& store, DayNumber day) {
+std::optional<std::string> addSampleHistory(AnalyticsStore& store, DayNumber first, DayNumber last,
+                                            const SampleVariation& variation) {
   if (const StoreResult begun = store.beginLoad(); !begun.ok()) return begun.error;
-  SampleWriter writer(store, day);
-  writer.everything();
-  if (!writer.result().ok()) {
-    store.rollbackLoad();
-    return writer.result().error;
+  for (DayNumber day = first; day <= last; ++day) {
+    SampleWriter writer(store, day, variation);
+    writer.everything();
+    if (!writer.result().ok()) {
+      store.rollbackLoad();
+      return writer.result().error;
+    }
   }
   const StoreResult committed = store.commitLoad();
   return committed.ok() ? std::nullopt : std::optional(committed.error);
