@@ -1,9 +1,9 @@
 -- Quantiles estimated from the merged histogram, those of different whitelists apart: found in the bucket that holds them, as if
--- its values lay evenly in it. A bucket that is open on one side answers with its one bound.
+-- its values lay evenly in it. A bucket that is open on one side (a bound of 1e100 and more is none) answers with its other bound.
 SELECT
     digest AS whitelist_digest,
     quantile,
-    multiIf(isInfinite(low), high, isInfinite(high), low, low + (high - low) * (wanted - (until - within)) / within) AS estimate
+    multiIf(low <= -1e100, high, high >= 1e100, low, low + (high - low) * (wanted - (until - within)) / within) AS estimate
 FROM (
     SELECT digest, quantile, wanted, arrayFirstIndex(x -> x >= wanted, ends) AS place, buckets[place].1 AS low,
            buckets[place].2 AS high, buckets[place].3 AS within, ends[place] AS until
