@@ -12,6 +12,7 @@ loopback ports that were free, or on a socket in their folder; they end with thi
 
 import contextlib
 import csv
+import io
 import json
 import os
 import pathlib
@@ -209,7 +210,7 @@ class PostgreSQL(Engine):
             self.said(filled(self.name, "load", table=table), stdin=rows)
 
     def rows(self, sql):
-        return list(csv.DictReader(self.said(sql, words=["--csv"]).splitlines(keepends=True)))
+        return list(csv.DictReader(io.StringIO(self.said(sql, words=["--csv"]), newline="")))
 
 
 class DuckDB(Engine):
