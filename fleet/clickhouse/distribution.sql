@@ -31,7 +31,7 @@ FROM (
                any(finite) AS is_finite
         FROM distributions WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} GROUP BY report_id
         HAVING is_finite = 1 AND n > 0
-    )
+    ) AS chosen
     CROSS JOIN (
         SELECT
             any(device_pivot) AS report_pivot,
@@ -46,15 +46,15 @@ FROM (
                        any(mean) AS center, any(finite) AS is_finite
                 FROM distributions WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} GROUP BY report_id
                 HAVING is_finite = 1 AND n > 0
-            )
+            ) AS chosen
             CROSS JOIN (
                 SELECT minIf(mean, finite = 1 AND count > 0) AS first_mean, uniqExactIf(report_id, finite = 0) AS reports_not_finite
                 FROM distributions WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}}
-            )
+            ) AS start
             GROUP BY named, unnamed
         )
         HAVING count() >= greatest(toInt64({{devices}}), 1)
-    )
+    ) AS means
     GROUP BY named, unnamed
 )
 HAVING devices > 0

@@ -16,27 +16,27 @@ FROM (
                    minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed
             FROM histograms WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} AND count > 0
             GROUP BY report_id, low, high
-        )
+        ) AS entries
         ALL INNER JOIN (
             SELECT report_id, any(whitelist_digest) AS digest
             FROM reports WHERE day >= {{first}} AND day <= {{last}} GROUP BY report_id
-        ) USING (report_id)
+        ) AS whitelists USING (report_id)
         GROUP BY digest, named, unnamed
     )
-)
+) AS buckets
 ALL INNER JOIN (
     SELECT digest, toInt64(uniqExact(named, unnamed)) AS all_devices
     FROM (
         SELECT report_id, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed
         FROM histograms WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} AND count > 0 GROUP BY report_id
-    )
+    ) AS entries
     ALL INNER JOIN (
         SELECT report_id, any(whitelist_digest) AS digest
         FROM reports WHERE day >= {{first}} AND day <= {{last}} GROUP BY report_id
-    ) USING (report_id)
+    ) AS whitelists USING (report_id)
     GROUP BY digest
     HAVING all_devices >= toInt64({{devices}})
-) USING (digest)
+) AS fleet USING (digest)
 GROUP BY digest, low, high
 ORDER BY digest, low, high
 SETTINGS skip_unavailable_shards = 0

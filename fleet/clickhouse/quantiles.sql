@@ -19,11 +19,11 @@ FROM (
                            minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed
                     FROM histograms WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} AND count > 0
                     GROUP BY report_id, low, high
-                )
+                ) AS entries
                 ALL INNER JOIN (
                     SELECT report_id, any(whitelist_digest) AS digest
                     FROM reports WHERE day >= {{first}} AND day <= {{last}} GROUP BY report_id
-                ) USING (report_id)
+                ) AS whitelists USING (report_id)
                 GROUP BY digest, low, high
             )
             GROUP BY digest

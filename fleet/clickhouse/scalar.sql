@@ -23,7 +23,7 @@ FROM (
     FROM (
         SELECT report_id, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed, any(value) AS report_value
         FROM scalars WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} GROUP BY report_id
-    )
+    ) AS chosen
     CROSS JOIN (
         SELECT
             total / all_reports AS whole,
@@ -48,7 +48,7 @@ FROM (
             )
             HAVING all_devices >= greatest(toInt64({{devices}}), 1)
         )
-    )
+    ) AS means
     GROUP BY named, unnamed
 )
 HAVING devices > 0

@@ -1,6 +1,6 @@
 -- The tables of the fleet, on every server of the cluster called `fleet`, in the database that is current: what a server keeps
 -- (*_local), and the whole over all of them. A report is put by its report_id, so that it lies whole on one server and meets
--- its copies there; the queries count it once, and merges drop the copies as they come by.
+-- its copies there, the queries count it once, and merges drop the copies as they come by.
 -- Days are texts (2026-11-24), in which order and equality are those of the days, for every year: a Date ends in 2105 or 2149.
 
 CREATE TABLE IF NOT EXISTS reports_local (
