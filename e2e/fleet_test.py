@@ -89,14 +89,14 @@ class Engines(unittest.TestCase):
         copies = [written(cls.base, report, device, f"copy{number}")
                   for number, (report, device) in enumerate(((cls.reports[5], "z"), (cls.reports[6], ""), (cls.reports[22], "d04")))]
         cls.reports[22].device = "d04"
-        again = files[3:30] + copies + files[40:50]
+        loads = copies, files, files[3:30] + copies + files[40:50]
         cls.engines = [stack.enter_context(engine()) for engine in (ClickHouseCluster, PostgreSQL)]
         if pathlib.Path(os.environ.get("NODE_PATH", ""), "@duckdb/node-api").exists():
             cls.engines.append(stack.enter_context(DuckDB()))
         for engine in cls.engines:
             engine.make_tables()
             engine.make_tables()
-        for number, (table, names) in enumerate((table, names) for table in TABLES for names in (copies[:1] + files, again)):
+        for number, (table, names) in enumerate((table, names) for table in TABLES for names in loads):
             for form in ("tsv", "ndjson"):
                 rows = cls.base / f"{number} {ODD.splitlines()[0]}.{form}"
                 said_by([TALLYCTL, "export", "--table", table, "--format", form, "-o", rows, *names])
