@@ -196,7 +196,7 @@ class Filling(unittest.TestCase):
         for words, reason in ((["fleet/none"], "none"), ([FLEET / "duckdb/none.sql"], "read"), ([outside], "engine"),
                               ([scalar, *given[1:]], "key has no value"), ([scalar, *given, "more=1"], "more is no parameter"),
                               ([scalar, *given, "key=again"], "twice"), ([scalar, *given[1:], "key"], "NAME=VALUE"),
-                              ([scalar, *given[1:], b"key=\xff"], "UTF-8"), ([load, "table="], "empty")):
+                              ([scalar, *given[1:], b"key=\xff"], "UTF-8"), ([load, "table="], "empty"), ([], "no file")):
             done = subprocess.run([FLEET / "fill", *words], capture_output=True, text=True)
             self.assertEqual((done.returncode, done.stdout, len(done.stderr.splitlines())), (2, "", 1), done.stderr)
             self.assertIn(reason, done.stderr)
