@@ -1,0 +1,1 @@
+INSERT INTO `{{table}}` FORMAT TabSeparatedWithNames

@@ -1,0 +1,17 @@
+-- The tables of the fleet.
+CREATE TABLE IF NOT EXISTS reports (
+    report_id VARCHAR NOT NULL, device VARCHAR NOT NULL, day DATE NOT NULL, created VARCHAR NOT NULL,
+    whitelist_digest VARCHAR NOT NULL, task_id VARCHAR NOT NULL, language VARCHAR NOT NULL,
+    preferred_language VARCHAR NOT NULL, region VARCHAR NOT NULL
+);
+CREATE TABLE IF NOT EXISTS scalars (
+    report_id VARCHAR NOT NULL, device VARCHAR NOT NULL, day DATE NOT NULL, key VARCHAR NOT NULL, value BIGINT NOT NULL
+);
+CREATE TABLE IF NOT EXISTS distributions (
+    report_id VARCHAR NOT NULL, device VARCHAR NOT NULL, day DATE NOT NULL, key VARCHAR NOT NULL, count BIGINT NOT NULL,
+    minimum DOUBLE NOT NULL, maximum DOUBLE NOT NULL, mean DOUBLE NOT NULL, m2 DOUBLE NOT NULL, finite TINYINT NOT NULL
+);
+CREATE TABLE IF NOT EXISTS histograms (
+    report_id VARCHAR NOT NULL, device VARCHAR NOT NULL, day DATE NOT NULL, key VARCHAR NOT NULL, lower DOUBLE NOT NULL,
+    upper DOUBLE NOT NULL, count BIGINT NOT NULL
+);
