@@ -27,9 +27,17 @@ JOB = "com.velmora.tallyd.tbdaily"  # its preferences domain and its endpoint
 LOGGING = JOB + ".logging"
 
 
+def open_terminal():
+    """Both ends of a pseudo terminal; a machine that has none (no /dev/pts) cannot run the test."""
+    try:
+        return pty.openpty()
+    except OSError as error:
+        raise unittest.SkipTest(f"no pseudo terminal: {error}") from error
+
+
 def on_screen(device, words, columns, lines=0, **environment):
     """What tallyctl shows on a terminal of that size, without colours unless asked for; it ends with 0."""
-    master, slave = pty.openpty()
+    master, slave = open_terminal()
     fcntl.ioctl(slave, termios.TIOCSWINSZ, struct.pack("HHHH", lines, columns, 0, 0))
     shown = subprocess.Popen([BIN / "tallyctl", *words], stdin=slave, stdout=slave,
                              env=device.env | {"TERM": "xterm", "NO_COLOR": "1", "LC_ALL": "C.UTF-8"} | environment)

@@ -32,7 +32,7 @@ def independent():
         for name, value in (("readBytes", stat[2] * SECTOR), ("writtenBytes", stat[6] * SECTOR), ("reads", stat[0])):
             found[f"disk.{disk.parent.name}.{name}"] = value
             found["disk." + name] = found.get("disk." + name, 0) + value
-    for card in pathlib.Path("/sys/class/net").iterdir():
+    for card in pathlib.Path("/sys/class/net").glob("*"):  # a machine within another may have no /sys
         if card.name != "lo" and (card / "statistics").exists():
             found[f"net.{card.name}.receivedBytes"] = int((card / "statistics/rx_bytes").read_text())
     return found

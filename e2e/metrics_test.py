@@ -5,7 +5,6 @@ import json
 import os
 import pathlib
 import plistlib
-import pty
 import re
 import select
 import signal
@@ -14,7 +13,7 @@ import subprocess
 import termios
 import unittest
 
-from harness import BIN, Device
+from harness import BIN, Device, open_terminal
 from metrics_model import (CHANNELS, DISK, FAN, FOUND_OUT, HUB, NS, SECONDS, described, display, model, type_of)
 
 
@@ -132,7 +131,7 @@ class Metrics(unittest.TestCase):
         self.assertRegex(output, r"\n\d+ of \d+ channels changed within 2\.\d* s\n\Z")
 
     def test_watch_on_a_screen(self):
-        master, slave = pty.openpty()
+        master, slave = open_terminal()
         self.addCleanup(os.close, master)
         watch = subprocess.Popen([BIN / "tallyctl", "metrics", "watch", "--interval", "0.1"], stdin=slave, stdout=slave,
                                  stderr=subprocess.PIPE, env=dict(self.device.env, TERM="xterm", LC_ALL="C.UTF-8"))
