@@ -61,6 +61,7 @@ class Engine:
 
     name = ""    # of its folder in fleet/
     form = "tsv"  # of the rows that it loads
+    weeks = False  # whether `ask` asks the weeks in place of the days
 
     def __enter__(self):
         self.folder = pathlib.Path(tempfile.mkdtemp(prefix=f"tbdaily-{self.name}-"))
@@ -154,6 +155,14 @@ class ClickHouseCluster(Engine):
         for server in self.servers:
             self.said(filled(self.name, "schema"), server, ["--multiquery"])
 
+    def roll(self, week):
+        self.said(filled(self.name, "week", week=week), words=["--multiquery", "--insert_distributed_sync=1"])
+
+    def drop_days(self, tables):
+        for server in self.servers:
+            for table in tables:
+                self.said(f"TRUNCATE TABLE {table}_local", server)
+
     def load(self, table, file):
         """Into whichever server: rows go where they belong, and are there when it returns."""
         with open(file, "rb") as rows:
@@ -161,7 +170,7 @@ class ClickHouseCluster(Engine):
 
     def rows(self, sql, server=0):
         names, *rows = [line.split("\t") for line in
-                        self.said(sql, server, ["--format", "TabSeparatedWithNames"]).split("\n")[:-1]] or [[]]
+                        self.said(sql, server, ["--format", "TabSeparatedWithNames", "--database", "weeks" if self.weeks else "default"]).split("\n")[:-1]] or [[]]
         return [dict(zip(names, map(unescaped, row), strict=True)) for row in rows]
 
 
@@ -210,7 +219,14 @@ class PostgreSQL(Engine):
             self.said(filled(self.name, "load", table=table), stdin=rows)
 
     def rows(self, sql):
-        return list(csv.DictReader(io.StringIO(self.said(sql, words=["--csv"]), newline="")))
+        path = "SET search_path = weeks, public;" if self.weeks else ""
+        return list(csv.DictReader(io.StringIO(self.said(path + sql, words=["--csv"]), newline="")))
+
+    def roll(self, week):
+        self.said(filled(self.name, "week", week=week))
+
+    def drop_days(self, tables):
+        self.said(f"TRUNCATE {', '.join(tables)}")
 
 
 class DuckDB(Engine):
@@ -242,3 +258,13 @@ class DuckDB(Engine):
 
     def load(self, table, file):
         self.rows(filled(self.name, "load", table=table, file=file))
+
+    def ask(self, query, **parameters):
+        self.rows(f"USE {'weeks' if self.weeks else 'main'}")
+        return super().ask(query, **parameters)
+
+    def roll(self, week):
+        self.rows(filled(self.name, "week", week=week))
+
+    def drop_days(self, tables):
+        self.rows("".join(f"DELETE FROM main.{table};" for table in tables))

@@ -18,17 +18,17 @@ FROM (
         any(report_all_shift) AS all_shift,
         any(report_vote_shift) AS vote_shift,
         any(report_not_finite) AS not_finite,
-        count() AS device_reports,
+        sum(row_reports) AS device_reports,
         sum(toDecimal128(n, 0)) AS device_count,
         sumKahan(toFloat64(n)) AS device_weight,
         min(low) AS device_minimum,
         max(high) AS device_maximum,
-        sumKahan(deviations + n * pow(center - report_pivot - report_all_shift, 2)) AS squares,
-        sumKahan(deviations + n * pow(center - report_pivot - report_vote_shift, 2)) AS vote_squares
+        sumKahan(deviations + toFloat64(n) * pow(center - report_pivot + rest - report_all_shift, 2)) AS squares,
+        sumKahan(deviations + toFloat64(n) * pow(center - report_pivot + rest - report_vote_shift, 2)) AS vote_squares
     FROM (
         SELECT report_id, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed, any(count) AS n,
-               any(minimum) AS low, any(maximum) AS high, any(mean) AS center, greatest(any(m2), 0.) AS deviations,
-               any(finite) AS is_finite
+               any(minimum) AS low, any(maximum) AS high, any(mean) AS center, any(mean_rest) AS rest, greatest(any(m2), 0.) AS deviations,
+               any(finite) AS is_finite, any(reports) AS row_reports
         FROM distributions WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} GROUP BY report_id
         HAVING is_finite = 1 AND n > 0
     ) AS chosen
@@ -40,10 +40,10 @@ FROM (
             any(device_not_finite) AS report_not_finite
         FROM (
             SELECT named, unnamed, any(first_mean) AS device_pivot, any(reports_not_finite) AS device_not_finite,
-                   sumKahan(toFloat64(n)) AS weight, sumKahan(n * (center - first_mean)) AS shift
+                   sumKahan(toFloat64(n)) AS weight, sumKahan(toFloat64(n) * (center - first_mean + rest)) AS shift
             FROM (
                 SELECT report_id, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed, any(count) AS n,
-                       any(mean) AS center, any(finite) AS is_finite
+                       any(mean) AS center, any(mean_rest) AS rest, any(finite) AS is_finite
                 FROM distributions WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} GROUP BY report_id
                 HAVING is_finite = 1 AND n > 0
             ) AS chosen

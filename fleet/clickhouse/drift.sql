@@ -14,8 +14,8 @@ FROM (
                 FROM (
                     SELECT kind, monday, named, unnamed, sumKahan(n * center) AS total, sumKahan(n) AS weight
                     FROM (
-                        SELECT 'scalar' AS kind, report_id, toMonday(toDate(any(day))) AS monday, toFloat64(1) AS n,
-                               toFloat64(any(value)) AS center,
+                        SELECT 'scalar' AS kind, report_id, toMonday(toDate(any(day))) AS monday, toFloat64(any(reports)) AS n,
+                               toFloat64(any(total)) / any(reports) AS center,
                                minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed
                         FROM scalars
                         WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} AND day >= '1970-01-05' AND day <= '2105-12-31'

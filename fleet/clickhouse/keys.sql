@@ -1,16 +1,18 @@
 -- The keys that begin with a prefix, by how many devices report them.
-SELECT kind, metric AS key, uniqExact(named, unnamed) AS devices, count() AS reports
+SELECT kind, metric AS key, uniqExact(named, unnamed) AS devices, sum(row_reports) AS reports
 FROM (
-    SELECT 'scalar' AS kind, metric, named, unnamed
+    SELECT 'scalar' AS kind, metric, named, unnamed, row_reports
     FROM (
-        SELECT report_id, key AS metric, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed
+        SELECT report_id, key AS metric, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed,
+               any(reports) AS row_reports
         FROM scalars WHERE key >= {{prefix}} AND startsWith(key, {{prefix}}) AND day >= {{first}} AND day <= {{last}}
         GROUP BY report_id, metric
     )
     UNION ALL
-    SELECT 'distribution' AS kind, metric, named, unnamed
+    SELECT 'distribution' AS kind, metric, named, unnamed, row_reports
     FROM (
-        SELECT report_id, key AS metric, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed
+        SELECT report_id, key AS metric, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed,
+               any(reports) AS row_reports
         FROM distributions WHERE key >= {{prefix}} AND startsWith(key, {{prefix}}) AND day >= {{first}} AND day <= {{last}}
         GROUP BY report_id, metric
     )

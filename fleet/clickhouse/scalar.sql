@@ -15,33 +15,34 @@ FROM (
         named, unnamed,
         any(toFloat64(whole) + fraction) AS all_mean,
         any(toFloat64(vote_whole) + vote_fraction) AS vote_mean,
-        count() AS device_reports,
-        min(report_value) AS device_minimum,
-        max(report_value) AS device_maximum,
-        sumKahan(pow(toFloat64(toDecimal128(report_value, 0) - whole) - fraction, 2)) AS squares,
-        sumKahan(pow(toFloat64(toDecimal128(report_value, 0) - vote_whole) - vote_fraction, 2)) AS vote_squares
+        sum(n) AS device_reports,
+        min(low) AS device_minimum,
+        max(high) AS device_maximum,
+        sumKahan(deviations + n * pow(toFloat64(s / n - whole) + toFloat64(s - s / n * n) / n - fraction, 2)) AS squares,
+        sumKahan(deviations + n * pow(toFloat64(s / n - vote_whole) + toFloat64(s - s / n * n) / n - vote_fraction, 2)) AS vote_squares
     FROM (
-        SELECT report_id, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed, any(value) AS report_value
+        SELECT report_id, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed, any(reports) AS n,
+               any(total) AS s, any(minimum) AS low, any(maximum) AS high, any(m2) AS deviations
         FROM scalars WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} GROUP BY report_id
     ) AS chosen
     CROSS JOIN (
         SELECT
-            total / all_reports AS whole,
-            toFloat64(total - whole * all_reports) / all_reports AS fraction,
+            all_total / all_reports AS whole,
+            toFloat64(all_total - whole * all_reports) / all_reports AS fraction,
             wholes / all_devices AS vote_whole,
             (toFloat64(wholes - vote_whole * all_devices) + fractions) / all_devices AS vote_fraction
         FROM (
             SELECT
                 toInt64(count()) AS all_devices,
                 toInt64(sum(n)) AS all_reports,
-                sum(s) AS total,
+                sum(s) AS all_total,
                 sum(s / n) AS wholes,
                 sumKahan(toFloat64(s - s / n * n) / n) AS fractions
             FROM (
-                SELECT named, unnamed, toInt64(count()) AS n, sum(toDecimal128(report_value, 0)) AS s
+                SELECT named, unnamed, toInt64(sum(row_reports)) AS n, sum(row_total) AS s
                 FROM (
                     SELECT report_id, minIf(device, device != '') AS named, if(named = '', report_id, '') AS unnamed,
-                           any(value) AS report_value
+                           any(reports) AS row_reports, any(total) AS row_total
                     FROM scalars WHERE key = {{key}} AND day >= {{first}} AND day <= {{last}} GROUP BY report_id
                 )
                 GROUP BY named, unnamed

@@ -3,10 +3,11 @@
 WITH chosen AS MATERIALIZED (
     SELECT report_id, coalesce(min(device) FILTER (device <> ''), '') AS named, if(named = '', report_id, '') AS unnamed,
            any_value(count) AS n, any_value(minimum) AS minimum, any_value(maximum) AS maximum, any_value(mean) AS center,
-           greatest(any_value(m2), 0) AS deviations, any_value(finite) AS finite
-    FROM distributions WHERE key = {{key}} AND day BETWEEN {{first}} AND {{last}} GROUP BY report_id
+           greatest(any_value(m2), 0) AS deviations, any_value(finite) AS finite,
+           any_value(reports) AS reports, any_value(mean_rest) AS rest
+    FROM distribution_states WHERE key = {{key}} AND day BETWEEN {{first}} AND {{last}} GROUP BY report_id
 ), finite_ones AS (
-    SELECT *, n::DOUBLE AS weight, center - min(center) OVER () AS shift, min(center) OVER () AS origin
+    SELECT *, n::DOUBLE AS weight, center - min(center) OVER () + rest AS shift, min(center) OVER () AS origin
     FROM chosen WHERE finite = 1 AND n > 0
 ), device_sums AS (
     SELECT fsum(weight) AS weight, fsum(weight * shift) AS sum FROM finite_ones GROUP BY named, unnamed
@@ -14,7 +15,7 @@ WITH chosen AS MATERIALIZED (
     SELECT fsum(sum) / fsum(weight) AS all_shift, fsum(sum / weight) / count(*) AS vote_shift
     FROM device_sums HAVING count(*) >= {{devices}}::BIGINT
 ), devices AS (
-    SELECT count(*) AS reports, sum(n) AS count, fsum(weight) AS weight, min(minimum) AS minimum, max(maximum) AS maximum,
+    SELECT sum(reports) AS reports, sum(n) AS count, fsum(weight) AS weight, min(minimum) AS minimum, max(maximum) AS maximum,
            any_value(origin + all_shift) AS mean, any_value(origin + vote_shift) AS device_mean,
            fsum(deviations + weight * (shift - all_shift) ** 2) AS squares,
            fsum(deviations + weight * (shift - vote_shift) ** 2) AS vote_squares

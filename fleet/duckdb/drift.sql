@@ -1,10 +1,10 @@
 -- Each week of a key beside the week before it, where both have devices enough: the mean of the devices' own means, and how far it
 -- moved. Weeks begin on Mondays; those that the range cuts are cut. Reckoned in doubles.
 WITH entries AS (
-    SELECT 'scalar' AS kind, day, device, report_id, 1::BIGINT AS n, value::DOUBLE AS center FROM scalars
+    SELECT 'scalar' AS kind, day, device, report_id, reports AS n, total::DOUBLE / reports AS center FROM scalar_states
     WHERE key = {{key}} AND day BETWEEN {{first}} AND {{last}}
     UNION ALL
-    SELECT 'distribution', day, device, report_id, count, mean FROM distributions
+    SELECT 'distribution', day, device, report_id, count, mean FROM distribution_states
     WHERE key = {{key}} AND day BETWEEN {{first}} AND {{last}} AND finite = 1 AND count > 0
 ), chosen AS (
     SELECT kind, report_id, date_trunc('week', any_value(day))::DATE AS week, any_value(n)::DOUBLE AS n, any_value(center) AS center,

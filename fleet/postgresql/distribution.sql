@@ -2,11 +2,11 @@
 -- from a mean that one of the reports has (pivot), so that a large offset takes no digits away.
 WITH chosen AS (
     SELECT *, min(mean) FILTER (WHERE finite = 1 AND count > 0) OVER () AS pivot, count(*) FILTER (WHERE finite = 0) OVER () AS left_out
-    FROM distributions
+    FROM distribution_states
     WHERE key = {{key}} AND md5(key)::uuid = md5({{key}})::uuid AND day BETWEEN {{first}} AND {{last}}
 ), device_states AS (
-    SELECT count(*) AS reports, sum(count) AS count, min(minimum) AS minimum, max(maximum) AS maximum, pivot, left_out,
-           fleet_merged(ARRAY[count, count * (mean - pivot), greatest(m2, 0)]) AS state
+    SELECT sum(reports) AS reports, sum(count) AS count, min(minimum) AS minimum, max(maximum) AS maximum, pivot, left_out,
+           fleet_merged(ARRAY[count, count * (mean - pivot + mean_rest), greatest(m2, 0)]) AS state
     FROM chosen WHERE finite = 1 AND count > 0
     GROUP BY device, CASE WHEN device = '' THEN report_id END, pivot, left_out
 ), fleet AS (

@@ -73,3 +73,42 @@ BEGIN
     RETURN NULL;
 END
 $$;
+
+-- The weeks: a schema of its own, in which week.sql puts one row for the rows that a device's reports of a week have. Its report_id
+-- is made of week and device, its day is the Monday. What such a row has more than that of a report (the number of reports, sums that
+-- outgrow 64 bits, what the double of a mean leaves of it) the views of the days make up, so that one query reads both.
+CREATE SCHEMA IF NOT EXISTS weeks;
+CREATE TABLE IF NOT EXISTS weeks.reports (LIKE reports, reports bigint NOT NULL);
+CREATE UNIQUE INDEX IF NOT EXISTS reports_once ON weeks.reports (day, (md5(report_id)::uuid));
+
+CREATE TABLE IF NOT EXISTS weeks.scalar_states (
+    report_id text NOT NULL, device text NOT NULL, day date NOT NULL, key text NOT NULL, reports bigint NOT NULL, total numeric NOT NULL,
+    minimum bigint NOT NULL, maximum bigint NOT NULL, m2 numeric NOT NULL
+);
+CREATE UNIQUE INDEX IF NOT EXISTS scalars_once ON weeks.scalar_states ((md5(key)::uuid), day, (md5(report_id)::uuid));
+CREATE OR REPLACE VIEW scalar_states AS
+    SELECT report_id, device, day, key, 1::bigint AS reports, value::numeric AS total, value AS minimum, value AS maximum, 0::numeric AS m2
+    FROM scalars;
+
+CREATE TABLE IF NOT EXISTS weeks.distribution_states (
+    report_id text NOT NULL, device text NOT NULL, day date NOT NULL, key text NOT NULL, reports bigint NOT NULL, count numeric NOT NULL,
+    minimum double precision NOT NULL, maximum double precision NOT NULL, mean double precision NOT NULL,
+    mean_rest double precision NOT NULL, m2 double precision NOT NULL, finite smallint NOT NULL
+);
+CREATE UNIQUE INDEX IF NOT EXISTS distributions_once ON weeks.distribution_states ((md5(key)::uuid), day, (md5(report_id)::uuid));
+CREATE OR REPLACE VIEW distribution_states AS
+    SELECT report_id, device, day, key, 1::bigint AS reports, count, minimum, maximum, mean, 0::double precision AS mean_rest, m2, finite
+    FROM distributions;
+
+CREATE TABLE IF NOT EXISTS weeks.histograms (
+    report_id text NOT NULL, device text NOT NULL, day date NOT NULL, key text NOT NULL, lower double precision NOT NULL,
+    upper double precision NOT NULL, count numeric NOT NULL
+);
+CREATE UNIQUE INDEX IF NOT EXISTS histograms_once ON weeks.histograms ((md5(key)::uuid), day, (md5(report_id)::uuid), lower, upper);
+
+-- Ends a statement, and with it the transaction, with a reason.
+CREATE OR REPLACE FUNCTION fleet_refuse(reason text) RETURNS void LANGUAGE plpgsql AS $$
+BEGIN
+    RAISE EXCEPTION '%', reason;
+END
+$$;
