@@ -175,11 +175,9 @@ void addReportCommand(CLI::App& app, Tool& tool) {
   CLI::App* command =
       app.add_subcommand("report", "Show a daily report: the newest one, that of a day or of a file");
   auto arguments = std::make_shared<ReportArguments>();
-  command
-      ->add_option("WORDS", arguments->words,
-                   "A report's file (- is standard input), then words: only keys that have one of them in "
-                   "their names")
-      ->type_name("[FILE] [WORD...]");
+  command->add_option("FILE", arguments->words,
+                      "A report's file (- is standard input), then words: only keys that have one of them in "
+                      "their names");
   command->add_flag("--preview", arguments->preview,
                     "Show what would leave the device now, and the other logs; submits and changes nothing");
   command
