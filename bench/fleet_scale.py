@@ -1,8 +1,9 @@
 """What a fleet costs: bytes a report, rows a second loaded, and the time of the questions, in each engine of fleet/.
 
 The rows are those of real reports (build/fleet-demo/, which scripts/fleet-demo leaves) with other identifiers, devices and days, so that
-their texts and figures are as varied as those; nothing is exported anew. Usage: fleet_scale.py [REPORTS [ENGINE ...]]
-(default: 100000, clickhouse postgresql duckdb)"""
+their texts and figures are as varied as those; nothing is exported anew.
+
+Usage: fleet_scale.py [REPORTS [ENGINE ...] [TABLE ...]]   (default: 100000, all of clickhouse, postgresql, duckdb, and all tables)"""
 
 import datetime
 import os
@@ -14,6 +15,7 @@ import time
 
 TREE = pathlib.Path(__file__).resolve().parent.parent
 sys.path.insert(0, str(TREE / "e2e"))
+import fleet_engines  # noqa: E402
 from fleet_engines import ClickHouseCluster, DuckDB, PostgreSQL  # noqa: E402
 
 TABLES = ("reports", "scalars", "distributions", "histograms")
@@ -23,6 +25,8 @@ KEY, SCALAR = "net.latency.wifi", "net.wifi.bytesIn"
 SIZES = {"clickhouse": "SELECT sum(bytes) AS bytes FROM system.parts WHERE active AND database = 'default'",
          "postgresql": "SELECT sum(pg_total_relation_size(c.oid)) AS bytes FROM pg_class AS c "
                        "JOIN pg_namespace AS n ON n.oid = c.relnamespace WHERE n.nspname = 'public' AND c.relkind = 'r'"}
+QUERIES = (("scalar", SCALAR, "scalars"), ("distribution", KEY, "distributions"), ("histogram", KEY, "histograms"),
+           ("quantiles", KEY, "histograms"))
 ENGINES = {"clickhouse": ClickHouseCluster, "postgresql": PostgreSQL, "duckdb": DuckDB}
 
 
@@ -81,7 +85,7 @@ def measure(name, count, folder, rows):
     with ENGINES[name]() as engine:
         engine.make_tables()
         seconds = 0
-        for table in TABLES:
+        for table in rows:
             file = folder / f"{table}.tsv"
             if engine.form == "ndjson":
                 file = folder / f"{table}.ndjson"
@@ -93,16 +97,18 @@ def measure(name, count, folder, rows):
                 file.unlink()
         span = {"first": FIRST, "last": FIRST + datetime.timedelta(DAYS - 1), "devices": 5}
         print(f"  {name} bytes a report: {size_of(engine) / count:,.0f}; reports a second: {count / seconds:,.0f}")
-        for query, key in (("scalar", SCALAR), ("distribution", KEY), ("histogram", KEY), ("quantiles", KEY)):
+        for query, key, table in QUERIES:
+            if table not in rows:
+                continue
             best = min(timed(lambda query=query, key=key: engine.ask(query, key=key, **span))[0] for _ in range(3))
             print(f"  {name} {query}: {best:.2f} s", flush=True)
 
 
-def main(count, engines):
+def main(count, engines, tables):
     with tempfile.TemporaryDirectory(dir=TREE / "build") as place:
         folder = pathlib.Path(place)
         folder.chmod(0o755)
-        rows = {table: write_rows(table, count, folder / f"{table}.tsv") for table in TABLES}
+        rows = {table: write_rows(table, count, folder / f"{table}.tsv") for table in tables}
         print(f"{count} reports, rows: {rows}", flush=True)
         for name in engines:
             measure(name, count, folder, rows)
@@ -111,4 +117,7 @@ def main(count, engines):
 if __name__ == "__main__":
     os.environ.setdefault("NODE_PATH", str(TREE / "build/fleet/node_modules"))
     subprocess.run([TREE / "scripts/setup", "fleet"], check=True)
-    main(int(sys.argv[1]) if len(sys.argv) > 1 else 100_000, sys.argv[2:] or list(ENGINES))
+    fleet_engines.PATIENCE = 3600
+    words = sys.argv[2:]
+    main(int(sys.argv[1]) if len(sys.argv) > 1 else 100_000, [word for word in words if word in ENGINES] or list(ENGINES),
+         [word for word in words if word in TABLES] or list(TABLES))

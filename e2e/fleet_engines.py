@@ -26,6 +26,7 @@ import time
 TREE = pathlib.Path(__file__).resolve().parent.parent
 FLEET = TREE / "fleet"
 QUIET_SECONDS = 60  # that a server may take until it answers
+PATIENCE = 300  # seconds for a question or a load
 
 
 class EngineError(Exception):
@@ -42,7 +43,7 @@ def filled(engine, name, **parameters):
 
 
 def said_by(command, **options):
-    done = subprocess.run(command, capture_output=True, timeout=300, **options)
+    done = subprocess.run(command, capture_output=True, timeout=PATIENCE, **options)
     if done.returncode != 0:
         raise EngineError(done.stderr.decode(errors="replace"))
     return done.stdout.decode()

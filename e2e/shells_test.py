@@ -17,6 +17,8 @@ CASES = [
     ("--root {root} metrics sample --driver Wire", ["WirelessRadio"], []),
     ("metrics sample --dr", ["--driver"], ["--group"]),
     ("nand --explain Hott", ["HottestCycle"], []),
+    ("nand Hott", ["HottestCycle"], []),
+    ("report {root}/System/Device/cl", ["clock.plist"], []),
     ("group off ", ["Experiments", "Network"], []),
     ("buffer ", ["band-stats", "telemetry"], []),
     ("plist {root}/System/Device/cl", ["clock.plist"], []),

@@ -156,9 +156,8 @@ void addNandCommand(CLI::App& app, Tool& tool) {
                        "Say in one sentence what a figure means, or each figure of a group")
           ->type_name("FIGURE");
   command
-      ->add_option("WORDS", *words,
+      ->add_option("FIGURE", *words,
                    "Only figures that have one of the words in their names, or their group's")
-      ->type_name("WORD...")
       ->excludes(explained);
   command->callback([&tool, key, words] { key->empty() ? showNand(tool, *words) : explain(tool, *key); });
 }

@@ -104,8 +104,10 @@ void showIdentifiability(Tool& tool, const DailyReport& report) {
 
 // What stands above a preview, and the other logs behind it.
 std::string titleOf(Tool& tool, const ReportArguments& arguments, const DailyReport& report) {
-  if (!arguments.preview) return "Daily report of " + reportDayText(report);
-  return "Preview of the daily report of " + reportDayText(report) + "\n" +
+  const std::string selection =
+      arguments.words.empty() ? "" : "\n  Only keys with " + listed(arguments.words) + " are shown.";
+  if (!arguments.preview) return "Daily report of " + reportDayText(report) + selection;
+  return "Preview of the daily report of " + reportDayText(report) + selection + "\n" +
          (tool.platform().services().logSubmission.isDiagnosticLogSubmissionEnabled()
               ? "  Submission is on: this would leave the device."
               : "  Submission is off: no report would be written (tallyctl consent on).");
@@ -117,7 +119,7 @@ void writePage(Tool& tool, const ReportArguments& arguments, const DailyReport& 
     standing = tool.platform().services().logSubmission.isDiagnosticLogSubmissionEnabled()
                    ? ReportStanding::WouldLeave
                    : ReportStanding::WouldNotBeWritten;
-  const std::string page = reportPage(report, standing);
+  const std::string page = reportPage(report, standing, arguments.words);
   const std::string& file = *arguments.html;
   const auto written = writeOutputFile(file, std::as_bytes(std::span(page)));
   if (!written) return tool.fail(written.reason());
@@ -173,11 +175,9 @@ void addReportCommand(CLI::App& app, Tool& tool) {
   CLI::App* command =
       app.add_subcommand("report", "Show a daily report: the newest one, that of a day or of a file");
   auto arguments = std::make_shared<ReportArguments>();
-  command
-      ->add_option("WORDS", arguments->words,
-                   "A report's file (- is standard input), then words: only keys that have one of them in "
-                   "their names")
-      ->type_name("[FILE] [WORD...]");
+  command->add_option("FILE", arguments->words,
+                      "A report's file (- is standard input), then words: only keys that have one of them in "
+                      "their names");
   command->add_flag("--preview", arguments->preview,
                     "Show what would leave the device now, and the other logs; submits and changes nothing");
   command

@@ -12,6 +12,7 @@
 #include "tools/tallyctl/page/figures.h"
 #include "tools/tallyctl/page/frame.h"
 #include "tools/tallyctl/page/histogram.h"
+#include "tools/tallyctl/report/view.h"
 
 namespace tbdaily {
 
@@ -53,8 +54,8 @@ class ReportPage {
     if (const PlistValue* items = report.root().find("TBTasking")) tasking_ = items->asArray();
   }
 
-  std::string write(ReportStanding standing) {
-    writeHead(standing);
+  std::string write(ReportStanding standing, const std::vector<std::string>& words) {
+    writeHead(standing, words);
     writeContents();
     page_.markup("<main id=\"figures\">\n");
     writeSummary();
@@ -68,7 +69,7 @@ class ReportPage {
   }
 
  private:
-  void writeHead(ReportStanding standing) {
+  void writeHead(ReportStanding standing, const std::vector<std::string>& words) {
     const bool isPreview = standing != ReportStanding::Written;
     beginPage(page_, (isPreview ? "Preview of the daily report of " : "Daily report of ") + dayOf(report_),
               kStandings[static_cast<std::size_t>(standing)]);
@@ -83,6 +84,7 @@ class ReportPage {
     writeFact(page_, "Tasking", text(root.get("TBTaskID")));
     writeFact(page_, "Tasking digest", text(root.get("TBTaskDigest")));
     writeFact(page_, "Version of the report", text(root.get("TBCrashLogVersion")));
+    if (!words.empty()) writeFact(page_, "Only keys with", listed(words));
     page_.markup("</dl>\n</header>\n");
   }
 
@@ -289,8 +291,9 @@ class ReportPage {
 
 }  // namespace
 
-std::string reportPage(const DailyReport& report, ReportStanding standing) {
-  return ReportPage(report).write(standing);
+std::string reportPage(const DailyReport& report, ReportStanding standing,
+                       const std::vector<std::string>& words) {
+  return ReportPage(report).write(standing, words);
 }
 
 }  // namespace tbdaily

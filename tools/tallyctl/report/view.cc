@@ -133,6 +133,12 @@ PlistValue selectedKeys(const PlistValue& root, const std::vector<std::string>& 
   return PlistValue::dictionary(std::move(selected));
 }
 
+std::string listed(const std::vector<std::string>& words) {
+  std::string text;
+  for (const std::string& word : words) text.append(text.empty() ? "" : ", ").append(word);
+  return text;
+}
+
 std::string reportDayText(const DailyReport& report) {
   const auto start = report.start();
   if (!start) return "an unknown day";

@@ -12,6 +12,9 @@ namespace tbdaily {
 // The report with the keys that are selected, of scalars, distributions and histograms; all else stays.
 PlistValue selectedKeys(const PlistValue& root, const std::vector<std::string>& words);
 
+// "wifi, cell".
+std::string listed(const std::vector<std::string>& words);
+
 // "2026-11-24 (day 20781)".
 std::string reportDayText(const DailyReport& report);
 
