@@ -1,4 +1,4 @@
-"""What a fleet costs: bytes a report, rows a second loaded, and the time of the questions, in each engine of fleet/.
+"""What a fleet costs: bytes a report, rows a second loaded, and the time of the questions, in each engine of fleet/; then a week rolled.
 
 The rows are those of real reports (build/fleet-demo/, which scripts/fleet-demo leaves) with other identifiers, devices and days, so that
 their texts and figures are as varied as those; nothing is exported anew.
@@ -8,10 +8,12 @@ Usage: fleet_scale.py [REPORTS [ENGINE ...] [TABLE ...]]   (default: 100000, all
 import datetime
 import os
 import pathlib
+import random
 import subprocess
 import sys
 import tempfile
 import time
+import uuid
 
 TREE = pathlib.Path(__file__).resolve().parent.parent
 sys.path.insert(0, str(TREE / "e2e"))
@@ -22,9 +24,11 @@ TABLES = ("reports", "scalars", "distributions", "histograms")
 FIRST = datetime.date(2026, 1, 1)
 DAYS = 100
 KEY, SCALAR = "net.latency.wifi", "net.wifi.bytesIn"
-SIZES = {"clickhouse": "SELECT sum(bytes) AS bytes FROM system.parts WHERE active AND database = 'default'",
+WEEK = datetime.date(2026, 2, 2)  # a Monday whose week is whole
+PLACES = {"clickhouse": ("default", "weeks"), "postgresql": ("public", "weeks")}
+SIZES = {"clickhouse": "SELECT sum(bytes) AS bytes FROM system.parts WHERE active AND database = '{}'",
          "postgresql": "SELECT sum(pg_total_relation_size(c.oid)) AS bytes FROM pg_class AS c "
-                       "JOIN pg_namespace AS n ON n.oid = c.relnamespace WHERE n.nspname = 'public' AND c.relkind = 'r'"}
+                       "JOIN pg_namespace AS n ON n.oid = c.relnamespace WHERE n.nspname = '{}' AND c.relkind = 'r'"}
 QUERIES = (("scalar", SCALAR, "scalars"), ("distribution", KEY, "distributions"), ("histogram", KEY, "histograms"),
            ("quantiles", KEY, "histograms"))
 ENGINES = {"clickhouse": ClickHouseCluster, "postgresql": PostgreSQL, "duckdb": DuckDB}
@@ -44,12 +48,12 @@ def write_rows(table, count, place):
     """Rows of so many reports, a hundred days of each device; answers how many."""
     header, reports = real_rows(table)
     rows = 0
+    draw = random.Random(1)  # identifiers as random as those of real reports, which is most of what a row takes
     with open(place, "w") as out:
         out.write(header + "\n")
         for number in range(count):
             device, day = divmod(number, DAYS)
-            begin = (f"{number * 2654435761 % 2**32:08x}-0000-4000-8000-{number:012x}\tdevice-{device:06}\t"
-                     f"{FIRST + datetime.timedelta(day)}\t")
+            begin = f"{uuid.UUID(int=draw.getrandbits(128), version=4)}\tdevice-{device:06}\t{FIRST + datetime.timedelta(day)}\t"
             of_report = reports[number % len(reports)]
             out.writelines(f"{begin}{row}\n" for row in of_report)
             rows += len(of_report)
@@ -73,12 +77,16 @@ def timed(work):
     return time.monotonic() - begin, answer
 
 
-def size_of(engine):
+def size_of(engine, tables, is_weeks=False):
+    """Bytes on the disks; of DuckDB, which is in memory here, those of the days as Parquet files."""
     if engine.name == "duckdb":
-        return sum(file.stat().st_size for file in engine.folder.rglob("*") if file.is_file())
+        for table in tables:
+            engine.ask("parquet", table=table, file=engine.folder / f"{table}.parquet")
+        return sum(file.stat().st_size for file in engine.folder.glob("*.parquet"))
+    sql = SIZES[engine.name].format(PLACES[engine.name][is_weeks])
     if engine.name == "clickhouse":
-        return sum(int(engine.rows(SIZES["clickhouse"], server)[0]["bytes"]) for server in engine.servers)
-    return int(engine.rows(SIZES[engine.name])[0]["bytes"])
+        return sum(int(engine.rows(sql, server)[0]["bytes"]) for server in engine.servers)
+    return int(engine.rows(sql)[0]["bytes"])
 
 
 def measure(name, count, folder, rows):
@@ -96,12 +104,17 @@ def measure(name, count, folder, rows):
             if engine.form == "ndjson":
                 file.unlink()
         span = {"first": FIRST, "last": FIRST + datetime.timedelta(DAYS - 1), "devices": 5}
-        print(f"  {name} bytes a report: {size_of(engine) / count:,.0f}; reports a second: {count / seconds:,.0f}")
+        print(f"  {name} bytes a report: {size_of(engine, rows) / count:,.0f}; reports a second: {count / seconds:,.0f}")
         for query, key, table in QUERIES:
             if table not in rows:
                 continue
             best = min(timed(lambda query=query, key=key: engine.ask(query, key=key, **span))[0] for _ in range(3))
             print(f"  {name} {query}: {best:.2f} s", flush=True)
+        empty = size_of(engine, rows, True) if name in PLACES else 0
+        took, _ = timed(lambda: engine.roll(WEEK))
+        devices = count // DAYS
+        said = f", bytes a device: {(size_of(engine, rows, True) - empty) / devices:,.0f}" if name in PLACES else ""
+        print(f"  {name} week of {devices} devices rolled: {took:.1f} s{said}", flush=True)
 
 
 def main(count, engines, tables):
