@@ -13,6 +13,8 @@
 #include <vector>
 
 #include "platform/linux/base/host_notes.h"
+#include "platform/linux/store/sqlite_analytics_history.h"
+#include "platform/linux/store/store_locator.h"
 
 namespace tbdaily {
 
@@ -91,6 +93,19 @@ Outcome<StoreCopy> copyStore(const StorePlace& store) {
     std::this_thread::sleep_for(kPause);
   }
   return Failure{shown + " is being written all the time; try again later"};
+}
+
+Outcome<std::unique_ptr<OpenAnalyticsHistory>> openHistoryCopy(LinuxPlatform& platform) {
+  const AnalyticsStoreLocator locate =
+      analyticsStoreLocator(platform.host(), platform.services().analyticsHome);
+  OpenedStore opened;
+  if (const auto place = locate()) {
+    auto copy = copyStore(*place);
+    if (!copy) return Failure{copy.reason()};
+    if (copy->file.isOpen()) opened = openStoreCopy(std::move(copy->file), std::move(copy->log), *place);
+    if (!opened.result.ok()) return Failure{opened.result.error};
+  }
+  return SqliteAnalyticsHistory(locate, [&opened](const StorePlace&) { return std::move(opened); }).open();
 }
 
 }  // namespace tbdaily

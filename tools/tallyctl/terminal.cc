@@ -178,6 +178,12 @@ std::string sixDigits(double value) {
   return {buffer.data(), static_cast<std::size_t>(length)};
 }
 
+std::string withDigits(double value, int behindThePoint) {
+  std::array<char, 400> buffer;  // the longest has 309 digits before the point
+  const int length = std::snprintf(buffer.data(), buffer.size(), "%.*f", behindThePoint, value);
+  return {buffer.data(), static_cast<std::size_t>(length)};
+}
+
 namespace {
 
 // The text at its spaces in lines of so many columns; a word that is longer stays whole.
@@ -274,6 +280,28 @@ void Table::print(Terminal& out, const std::function<void(std::size_t row)>& aft
   for (std::size_t row = 0; row < all.size(); ++row) {
     for (const ShownText& text : all[row]) out.line(text);
     after(row);
+  }
+}
+
+void printBars(Terminal& out, const std::vector<BarRow>& rows) {
+  constexpr std::size_t kIndent = 6, kBetween = 2, kLeastBar = 10, kMostBar = 100;
+  std::int64_t largest = 0;
+  std::size_t labelWidth = 0, countWidth = 0;
+  for (const BarRow& row : rows) {
+    largest = std::max(largest, row.count);
+    labelWidth = std::max(labelWidth, row.label.columns());
+    countWidth = std::max(countWidth, std::to_string(row.count).size());
+  }
+  const std::size_t used = kIndent + labelWidth + kBetween + countWidth + kBetween;
+  const std::size_t barWidth = std::clamp(out.width() > used ? out.width() - used : 0, kLeastBar, kMostBar);
+  for (const BarRow& row : rows) {
+    const std::string count = std::to_string(row.count);
+    ShownText line = std::string(kIndent, ' ');
+    line += row.label;
+    line += std::string(labelWidth - row.label.columns() + kBetween + countWidth - count.size(), ' ') +
+            count + std::string(kBetween, ' ') +
+            out.bar(static_cast<double>(row.count), static_cast<double>(largest), barWidth);
+    out.line(line.withoutTrailingSpaces());
   }
 }
 

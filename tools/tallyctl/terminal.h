@@ -85,8 +85,9 @@ class Terminal {
 // One line on standard error, behind the program's name.
 void printError(const ShownText& reason);
 
-// A number in at most six significant digits, for people.
+// A number in at most six significant digits, and one with so many digits behind the point, for people.
 std::string sixDigits(double value);
+std::string withDigits(double value, int behindThePoint);
 
 // Rows of cells under each other; numbers to the right. On a screen that is too narrow for all of it, text in
 // the last column goes on in the next line, and a first cell that is too long has a line of its own above its
@@ -112,6 +113,13 @@ class Table {
   std::vector<Align> columns_;
   std::vector<std::vector<ShownText>> rows_;
 };
+
+// Rows of a label, a count and a bar of it; the longest bar takes what the screen leaves.
+struct BarRow {
+  ShownText label;
+  std::int64_t count = 0;
+};
+void printBars(Terminal& out, const std::vector<BarRow>& rows);
 
 // A progress bar on standard error, when that is a terminal, for work that takes more than a second. Cleared
 // at the end.

@@ -29,7 +29,6 @@ std::string_view groupOf(std::string_view key) {
 
 // The ranges of one histogram as bars, up to the last one that is not empty.
 void printHistogram(Terminal& out, const NandGlossaryRow& row, const PlistDictionary& info) {
-  constexpr std::size_t kIndent = 6, kLeastBar = 10, kMostBar = 100;
   std::vector<std::int64_t> counts;
   for (const auto& [key, value] : info) {
     const auto number = findNandGlossary(key) == &row ? nandSeriesNumber(row, key) : std::nullopt;
@@ -39,20 +38,15 @@ void printHistogram(Terminal& out, const NandGlossaryRow& row, const PlistDictio
   }
   while (!counts.empty() && counts.back() == 0) counts.pop_back();
   out.line("  " + std::string(row.base));
-  if (counts.empty()) return out.line(std::string(kIndent, ' ') + "all ranges are empty");
-  const std::int64_t largest = *std::max_element(counts.begin(), counts.end());
-  const std::size_t countWidth = std::to_string(largest).size();
-  const std::size_t labelWidth = std::to_string(counts.size() - 1).size();
-  const std::size_t used = kIndent + sizeof("range") + labelWidth + 2 + countWidth + 2;
-  const std::size_t barWidth = std::clamp(out.width() > used ? out.width() - used : 0, kLeastBar, kMostBar);
+  if (counts.empty()) return out.line("      all ranges are empty");
+  const std::size_t width = std::to_string(counts.size() - 1).size();
+  std::vector<BarRow> rows;
+  rows.reserve(counts.size());
   for (std::size_t i = 0; i < counts.size(); ++i) {
-    const std::string label = std::to_string(i), count = std::to_string(counts[i]);
-    std::string line(kIndent, ' ');
-    line.append("range ").append(labelWidth - label.size(), ' ').append(label);
-    line.append(2 + countWidth - std::min(countWidth, count.size()), ' ').append(count).append("  ");
-    line += out.bar(static_cast<double>(counts[i]), static_cast<double>(largest), barWidth);
-    out.line(ShownText(line).withoutTrailingSpaces());
+    const std::string number = std::to_string(i);
+    rows.push_back({"range " + std::string(width - number.size(), ' ') + number, counts[i]});
   }
+  printBars(out, rows);
 }
 
 void printGroup(Terminal& out, std::string_view group, const PlistDictionary& info) {

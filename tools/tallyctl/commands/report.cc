@@ -43,8 +43,10 @@ std::optional<std::string> takeFile(std::vector<std::string>& words) {
   if (words.empty()) return std::nullopt;
   std::error_code ignored;
   const std::string& first = words.front();
-  if (first != "-" && first.find('/') == std::string::npos && !std::filesystem::exists(first, ignored))
-    return std::nullopt;
+  const auto type = std::filesystem::status(first, ignored).type();
+  const bool isThere =
+      type != std::filesystem::file_type::not_found && type != std::filesystem::file_type::directory;
+  if (first != "-" && first.find('/') == std::string::npos && !isThere) return std::nullopt;
   std::string file = first;
   words.erase(words.begin());
   return file;

@@ -8,6 +8,7 @@
 #include <string_view>
 
 #include "drivermetrics/kd_report.h"
+#include "tools/tallyctl/terminal.h"
 
 namespace tbdaily {
 
@@ -56,12 +57,6 @@ std::optional<double> factorOf(std::int64_t unit, const Saying& saying) {
     return std::nullopt;
   const double factor = static_cast<double>(numerator) / static_cast<double>(denominator);
   return saying.quantity == kKdReportInformation ? factor / kBitsOfAByte : factor;
-}
-
-std::string withDigits(double value, int behindThePoint) {
-  std::array<char, 64> buffer;
-  std::snprintf(buffer.data(), buffer.size(), "%.*f", behindThePoint, value);
-  return buffer.data();
 }
 
 // Three digits, as many behind the point as that leaves.

@@ -10,9 +10,12 @@
 #include "tools/tallyctl/page/html.h"
 #include "tools/tallyctl/page/report_page.h"
 #include "tools/tallyctl/page/wear_page.h"
+#include "tools/tallyctl/wear/wear_history_test_support.h"
 
 namespace tbdaily {
 namespace {
+
+using testing::recorded;
 
 constexpr double kInfinity = std::numeric_limits<double>::infinity();
 
@@ -99,15 +102,6 @@ TEST(ReportPage, HasABarForEachBucketThatIsNotEmptyAndTheSameBytesEachTime) {
   EXPECT_EQ(timesIn(page, "<script"), 0U);
   EXPECT_EQ(timesIn(page, "removed"), 1U);
   EXPECT_NE(page, reportPage(*report, ReportStanding::WouldLeave));
-}
-
-WearDay recorded(DayNumber number, std::int64_t host, std::int64_t flash, std::int64_t hottest) {
-  WearDay day;
-  day.day = number;
-  day.hostWrites = host;
-  day.flashWrites = flash;
-  day.hottestCycle = hottest;
-  return day;
 }
 
 TEST(WearPage, BreaksItsLinesAtGapsAndWhereCountersWentBack) {

@@ -3,8 +3,6 @@
 #include <limits>
 #include <map>
 
-#include "platform/linux/store/sqlite_analytics_history.h"
-#include "platform/linux/store/store_locator.h"
 #include "platform/platform.h"
 #include "platform/plist_text.h"
 #include "platform/preferences_store.h"
@@ -40,17 +38,9 @@ struct RecordedKeys {
 // A report takes the rows of the day and of the day before, the later ones last.
 Outcome<RecordedKeys> recordedKeys(LinuxPlatform& platform, DayNumber day) {
   RecordedKeys recorded;
-  const AnalyticsStoreLocator locate =
-      analyticsStoreLocator(platform.host(), platform.services().analyticsHome);
-  const auto place = locate();
-  if (!place) return recorded;
-  auto copy = copyStore(*place);
-  if (!copy) return Failure{copy.reason()};
-  if (!copy->file.isOpen()) return recorded;
-  OpenedStore opened = openStoreCopy(std::move(copy->file), std::move(copy->log), *place);
-  if (!opened.result.ok()) return Failure{opened.result.error};
-  SqliteAnalyticsHistory store(locate, [&opened](const StorePlace&) { return std::move(opened); });
-  const auto history = store.open();
+  const auto opened = openHistoryCopy(platform);
+  if (!opened) return Failure{opened.reason()};
+  OpenAnalyticsHistory* const history = opened->get();
   const DayNumber previous = day == std::numeric_limits<DayNumber>::min() ? day : day - 1;
   history->enumerateScalars("", previous, day,
                             [&](std::string_view key, DayNumber, std::int64_t value, bool&) {
@@ -62,7 +52,7 @@ Outcome<RecordedKeys> recordedKeys(LinuxPlatform& platform, DayNumber day) {
         values.visitValues([&count](double, std::int32_t) { ++count; });
         recorded.distributions.insert_or_assign(std::string(key), count);
       });
-  if (!history->isWhole()) return Failure{"the analytics store is damaged: not all of its rows can be read"};
+  if (!history->isWhole()) return Failure{kPartOfRows};
   return recorded;
 }
 

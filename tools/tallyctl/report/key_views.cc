@@ -1,7 +1,6 @@
 #include "tools/tallyctl/report/key_views.h"
 
 #include <array>
-#include <cstdio>
 
 #include "tools/tallyctl/sizes.h"
 
@@ -29,12 +28,6 @@ std::string change(const KeyStory& story) {
   else
     text += " -> statistics";
   return text + (story.rule.empty() ? ", as it is" : ", " + story.rule);
-}
-
-std::string bitsText(double bits) {
-  std::array<char, 32> text;
-  std::snprintf(text.data(), text.size(), "%.1f", bits);
-  return text.data();
 }
 
 void printHeading(Terminal& out, const std::string& heading) {
@@ -89,10 +82,10 @@ void printIdentifiability(Terminal& out, const Identifiability& found) {
     const auto bits = key.bits();
     if (bits) sum += *bits, ++bounded;
     table.add({key.key, kindName(key.kind), key.values ? std::to_string(*key.values) : "unbounded",
-               bits ? bitsText(*bits) : "-", key.followsValues ? "the statistics say each value" : ""});
+               bits ? withDigits(*bits, 1) : "-", key.followsValues ? "the statistics say each value" : ""});
   }
   table.print(out);
-  out.line("  " + std::to_string(bounded) + " keys with a bound, at most " + bitsText(sum) +
+  out.line("  " + std::to_string(bounded) + " keys with a bound, at most " + withDigits(sum, 1) +
            " bits together; " + std::to_string(found.keys.size() - bounded) + " without one");
   printHeading(out, "Beside the whitelisted keys");
   for (const std::string& name : found.outside) out.line("  " + name);

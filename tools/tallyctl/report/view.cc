@@ -56,24 +56,10 @@ void printEntries(Terminal& out, const std::string& heading, const PlistDictiona
 }
 
 void printHistogram(Terminal& out, const std::vector<HistogramBucket>& buckets) {
-  constexpr std::size_t kIndent = 6, kBetween = 2, kLeastBar = 10, kMostBar = 100;
-  std::int64_t largest = 0;
-  std::size_t labelWidth = 0, countWidth = 0;
-  for (const HistogramBucket& bucket : buckets) {
-    largest = std::max(largest, bucket.count);
-    labelWidth = std::max(labelWidth, ShownText(bucket.label()).columns());
-    countWidth = std::max(countWidth, std::to_string(bucket.count).size());
-  }
-  const std::size_t used = kIndent + labelWidth + kBetween + countWidth + kBetween;
-  const std::size_t barWidth = std::clamp(out.width() > used ? out.width() - used : 0, kLeastBar, kMostBar);
-  for (const HistogramBucket& bucket : buckets) {
-    const std::string count = std::to_string(bucket.count);
-    const ShownText label = bucket.label();
-    ShownText line = std::string(kIndent, ' ');
-    line += label + std::string(labelWidth - label.columns() + kBetween + countWidth - count.size(), ' ') +
-            count + "  " + out.bar(static_cast<double>(bucket.count), static_cast<double>(largest), barWidth);
-    out.line(line.withoutTrailingSpaces());
-  }
+  std::vector<BarRow> rows;
+  rows.reserve(buckets.size());
+  for (const HistogramBucket& bucket : buckets) rows.push_back({bucket.label(), bucket.count});
+  printBars(out, rows);
 }
 
 // Statistics with the histogram below, where there is one. The report carries the sum of squared deviations;

@@ -19,12 +19,6 @@ std::string figure(double value) {
   return realText(static_cast<float>(value));
 }
 
-std::string withDigits(double value, int digits) {
-  std::array<char, 64> text;
-  std::snprintf(text.data(), text.size(), "%.*f", digits, value);
-  return text.data();
-}
-
 std::string bytes(const DriveHealth::Figure& count) {
   return humanBytes(static_cast<double>(*count));
 }

@@ -3,8 +3,6 @@
 #include <cmath>
 #include <map>
 
-#include "platform/linux/store/sqlite_analytics_history.h"
-#include "platform/linux/store/store_locator.h"
 #include "platform/platform.h"
 #include "tools/tallyctl/store_copy.h"
 
@@ -52,17 +50,9 @@ WearHistory wearHistoryOf(std::vector<WearDay> days) {
 }
 
 Outcome<WearHistory> readWearHistory(LinuxPlatform& platform, DayNumber first, DayNumber last) {
-  const AnalyticsStoreLocator locate =
-      analyticsStoreLocator(platform.host(), platform.services().analyticsHome);
-  const auto place = locate();
-  if (!place) return Failure{"the analytics store has no place: record the group container in answers.plist"};
-  auto copy = copyStore(*place);
-  if (!copy) return Failure{copy.reason()};
-  if (!copy->file.isOpen()) return WearHistory{};
-  OpenedStore opened = openStoreCopy(std::move(copy->file), std::move(copy->log), *place);
-  if (!opened.result.ok()) return Failure{opened.result.error};
-  SqliteAnalyticsHistory store(locate, [&opened](const StorePlace&) { return std::move(opened); });
-  const auto rows = store.open();
+  const auto opened = openHistoryCopy(platform);
+  if (!opened) return Failure{opened.reason()};
+  OpenAnalyticsHistory* const rows = opened->get();
 
   std::map<DayNumber, WearDay> days;
   for (const Counter& counter : kCounters) {
@@ -75,7 +65,7 @@ Outcome<WearHistory> readWearHistory(LinuxPlatform& platform, DayNumber first, D
                              days[day].*counter.value = value;
                            });
   }
-  if (!rows->isWhole()) return Failure{"the analytics store is damaged: not all of its rows can be read"};
+  if (!rows->isWhole()) return Failure{kPartOfRows};
   std::vector<WearDay> ascending;
   for (auto& [number, day] : days) {
     day.day = number;

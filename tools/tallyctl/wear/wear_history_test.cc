@@ -4,17 +4,12 @@
 
 #include <limits>
 
+#include "tools/tallyctl/wear/wear_history_test_support.h"
+
 namespace tbdaily {
 namespace {
 
-WearDay recorded(DayNumber number, std::int64_t host, std::int64_t flash, std::int64_t hottest) {
-  WearDay day;
-  day.day = number;
-  day.hostWrites = host;
-  day.flashWrites = flash;
-  day.hottestCycle = hottest;
-  return day;
-}
+using testing::recorded;
 
 TEST(WearHistory, EachDayIsComparedWithTheOneBeforeIt) {
   WearDay partial;
