@@ -1,7 +1,7 @@
 """A fleet in small: devices of different age and use do their days' work, their reports are exported into a cluster of two ClickHouse
 servers, and what it answers stands beside what the devices' own values come to, in exact fractions. Then a server is stopped.
 
-Usage: fleet_demo.py FOLDER DEVICES DAYS   (the folder is emptied; the devices stay in it)"""
+Usage: fleet.py FOLDER DEVICES DAYS   (the folder is emptied; the devices stay in it)"""
 
 import datetime
 import math
