@@ -9,7 +9,7 @@ import subprocess
 import sys
 
 from harness import Device, on_screen
-from views_test import wear_rows
+from wear_days import wear_rows
 
 COLUMN, LINE, MARGIN, BAR = 8.4, 18, 16, 30  # pixels
 COLOURS = {"1": 'font-weight="bold" fill="#ffffff"', "2": 'fill="#8b95a5"', "32": 'font-weight="bold" fill="#6cc48b"', "31": 'fill="#ff8a80"'}

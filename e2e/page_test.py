@@ -7,7 +7,8 @@ import random
 import unittest
 
 from browser import Browser
-from harness import TODAY, YESTERDAY, Device
+from harness import YESTERDAY, Device
+from wear_days import wear_rows
 
 FOLDER = pathlib.Path(os.environ["TBDAILY_PAGE"])  # where the rules are installed, and pictures go
 AXE = (FOLDER / "node_modules/axe-core/axe.min.js").read_text()
@@ -73,22 +74,6 @@ def planted_report(device):
     return report
 
 
-def wear_lines():
-    """Ninety days of the controller's counters: a gap, a day that lacks one, and another drive from the fiftieth day on."""
-    generator = random.Random(5)
-    host, flash, erases = 40_000_000, 70_000_000, 131.0
-    for number, day in enumerate(range(TODAY - 90, TODAY)):
-        written = int(generator.uniform(3e6, 9e6) * (3 if number == 71 else 1))
-        host, flash, erases = host + written, flash + int(written * generator.uniform(1.4, 2.2)), erases + generator.uniform(.1, .6)
-        if number == 50:
-            host, flash, erases = 900_000, 2_000_000, 4.0
-        if number in (20, 21, 22, 70):
-            continue
-        for name, value in (("NumLogicalWrites", host), ("NumPhysicalWrites", flash), ("HottestCycle", int(erases))):
-            if number != 80 or name != "NumLogicalWrites":
-                yield f"s\tcom.velmora.NANDInfo.{name}\t{day}\t{value}"
-
-
 class Pages(unittest.TestCase):
     @classmethod
     def setUpClass(cls):
@@ -107,8 +92,8 @@ class Pages(unittest.TestCase):
         sample.tally("report", "--html", str(cls.pages["report"]))
         worn = Device()
         cls.addClassCleanup(worn.close)
-        worn.tally("record", "import", stdin="\n".join(wear_lines()) + "\n")
-        for name, days in (("wear", "91"), ("wear-nothing", "1")):
+        worn.tally("record", "import", stdin="".join(wear_rows()))
+        for name, days in (("wear", "41"), ("wear-nothing", "1")):
             worn.tally("wear", "--history", "--days", days, "--endurance", "3000", "--html", str(cls.pages[name]))
 
     def test_a_page_asks_for_nothing_and_runs_nothing(self):

@@ -6,7 +6,8 @@ import os
 import pathlib
 import unittest
 
-from harness import TODAY, Device, on_screen
+from harness import Device, on_screen
+from wear_days import wear_rows
 
 GOLDEN = pathlib.Path(__file__).resolve().parent / "golden"
 VIEWS = {
@@ -20,20 +21,6 @@ VIEWS = {
     "nand-explain": ("nand", "--explain", "Temperature"),
     "usage": ("usage", "show"),
 }
-
-
-def wear_rows():
-    """40 days, three of them missing, of another drive at first; the run adds the sample device's figures for today."""
-    host, flash, cycles = 9_000_000_000, 20_000_000_000, 2_400
-    for day in range(TODAY - 40, TODAY):
-        if day == TODAY - 30:
-            host, flash, cycles = 1_990_000_000, 5_010_000_000, 600
-        written = 2_000_000 + 1_500_000 * (day * 7 % 5)
-        host, flash, cycles = host + written, flash + written * (18 + day % 9) // 10, cycles + (day % 3 == 0)
-        if day in (TODAY - 22, TODAY - 21, TODAY - 20):
-            continue
-        for name, value in (("NumLogicalWrites", host), ("NumPhysicalWrites", flash), ("HottestCycle", cycles)):
-            yield f"s\tcom.velmora.NANDInfo.{name}\t{day}\t{value}\n"
 
 
 class Views(unittest.TestCase):
